@@ -1,0 +1,67 @@
+#pragma once
+
+#include <cstddef>
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include "parvel/foundation/PVExport.h"
+
+namespace parvel {
+
+/// A URL, nearly always a file URL (RFC 8089). It keeps the text that it was made from. A file
+/// URL's path is bytes and need not be valid UTF-8. No operation asks the disk.
+class PV_EXPORT URL {
+public:
+    /// The URL of a path as it stands; a trailing slash is dropped. A NUL, which no path can hold,
+    /// becomes U+FFFD. A relative path stays relative.
+    static URL fileURLWithPath(std::string_view path);
+    /// Parses absolute URL text. None where it is empty, holds white space or a control character,
+    /// has no scheme, or is a file URL whose path is empty, has a NUL or a broken percent escape,
+    /// or whose host is neither empty nor "localhost".
+    static std::optional<URL> fromString(std::string_view text);
+
+    /// The text that the URL was made from; for one made from a path, "file://" and the path with
+    /// all but `A-Z a-z 0-9 - . _ ~ ! $ & ' ( ) * + , ; = : @ /` percent-encoded.
+    [[nodiscard]] const std::string& absoluteString() const { return m_text; }
+    [[nodiscard]] bool isFileURL() const { return m_isFile; }
+    /// A file URL's decoded path; another URL's path component as it stands.
+    [[nodiscard]] const std::string& path() const { return m_path; }
+
+    /// The last component of the path; "/" for the root.
+    [[nodiscard]] std::string_view lastPathComponent() const;
+    /// The text after the last dot of the last component, also where the name begins with that dot;
+    /// empty where there is none.
+    [[nodiscard]] std::string_view pathExtension() const;
+
+    [[nodiscard]] URL deletingLastPathComponent() const;
+    /// Appends with exactly one slash between.
+    [[nodiscard]] URL appendingPathComponent(std::string_view component) const;
+    /// Makes the path absolute and removes `.`, `..` and repeated slashes from its text; `..` above
+    /// the root is dropped. Symbolic links are not followed.
+    [[nodiscard]] URL standardized() const;
+
+    [[nodiscard]] std::size_t hash() const;
+    /// File URLs are equal when their paths are; others when their texts are.
+    PV_EXPORT friend bool operator==(const URL& left, const URL& right);
+
+private:
+    URL(std::string text, std::string path, bool isFile)
+        : m_text(std::move(text)), m_path(std::move(path)), m_isFile(isFile) {}
+
+    std::string m_text;
+    std::string m_path;
+    bool m_isFile;
+};
+
+/// The same rules over the text of a path or file name.
+PV_EXPORT std::string_view lastComponentOfPath(std::string_view path);
+PV_EXPORT std::string_view extensionOfPath(std::string_view path);
+/// The path without its last extension and the dot before it.
+PV_EXPORT std::string_view pathWithoutExtension(std::string_view path);
+/// The path without its last component; empty for a single component.
+PV_EXPORT std::string_view pathWithoutLastComponent(std::string_view path);
+/// The two joined with exactly one slash; the component alone where the path is empty.
+PV_EXPORT std::string pathAppending(std::string_view path, std::string_view component);
+
+}  // namespace parvel

@@ -1,0 +1,55 @@
+#pragma once
+
+#include <memory>
+#include <optional>
+
+#include "parvel/foundation/ErrorOut.h"
+#include "parvel/foundation/PVExport.h"
+#include "parvel/foundation/URL.h"
+#include "parvel/metadata/PVAssetMetadata.h"
+
+namespace parvel {
+
+/// Turns an asset on disk into its record. It keeps nothing between calls, reads the disk afresh
+/// each time, and may be called from any thread. One malformed asset never brings the caller down.
+///
+/// Reading prefers, from the least to the most: the package document, the store metadata file (but
+/// for a preview), the asset's extended attributes, the caller's extra metadata.
+class PV_EXPORT PVAssetMetadataInspector {
+public:
+    PVAssetMetadataInspector() = delete;
+
+    /// The record, without cover bytes. Errors: -1002 for an absent URL, that of the host where the
+    /// asset is unreachable, -1001 for an extension of no kind, -1003 for a record without asset
+    /// ID, else the reader's; none at all for input that is malformed within. The error is assigned
+    /// in every case, on success too.
+    static AssetPtr metadataForAssetAtURL_error(const std::optional<URL>& url,
+                                                ErrorOut error = nullptr);
+    /// The same with the cover bytes.
+    static AssetPtr metadataIncludingCoverForAssetAtURL_error(const std::optional<URL>& url,
+                                                              ErrorOut error = nullptr);
+    /// The record without cover, with the extra metadata's entries over what was read.
+    static AssetPtr metadataForAssetAtURL_extraMetadata_error(const std::optional<URL>& url,
+                                                              const AssetPtr& extraMetadata,
+                                                              ErrorOut error = nullptr);
+    /// The store metadata file at the URL itself as a record; none for a package.
+    static AssetPtr bazaarMetadataForBookAssetAtURL_error(const std::optional<URL>& url,
+                                                          ErrorOut error = nullptr);
+
+    // For the library's own use and its tests.
+
+    static AssetPtr _metadataForAssetAtURL_includeCover_error(const std::optional<URL>& url,
+                                                              bool includeCover, ErrorOut error);
+    /// The misspelling is the operation's name.
+    static AssetPtr _typeSpecificMetadtaForAssetAtURL_includeCover_error(const URL& url,
+                                                                         bool includeCover,
+                                                                         ErrorOut error);
+    static MutableAssetPtr _eBook_metadataForAssetAtURL_preloadedMetadata_includeCover_error(
+        const URL& url, const AssetPtr& preloadedMetadata, bool includeCover, ErrorOut error);
+    /// The record that the asset's extended attributes hold: with little but its URL where it has
+    /// none. None for an extension of no kind. A failed attribute read leaves the record without
+    /// them.
+    static MutableAssetPtr _xAttrMetadataForAssetAtURL_error(const URL& url, ErrorOut error);
+};
+
+}  // namespace parvel

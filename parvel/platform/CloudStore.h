@@ -1,0 +1,36 @@
+#pragma once
+
+#include <optional>
+
+#include "parvel/foundation/ErrorOut.h"
+#include "parvel/foundation/URL.h"
+
+namespace parvel {
+
+/// What an item in cloud-synchronised storage has on this device.
+enum class DownloadingStatus { Current, Downloaded, NotDownloaded };
+
+/// Cloud-synchronised storage, as far as the disk shows it.
+class CloudStore {
+public:
+    virtual ~CloudStore() = default;
+
+    /// Whether the item lies in storage that a sync client keeps in step; none when that can't be
+    /// told.
+    [[nodiscard]] virtual std::optional<bool> isUbiquitous(const URL& url,
+                                                           ErrorOut error = nullptr) = 0;
+    /// Whether the item, or what stands for it until it is downloaded, exists.
+    [[nodiscard]] virtual bool isPromisedItemReachable(const URL& url,
+                                                       ErrorOut error = nullptr) = 0;
+    /// False when the query fails. The status is none for an item that is in no such storage.
+    [[nodiscard]] virtual bool downloadingStatus(const URL& url,
+                                                 std::optional<DownloadingStatus>& status,
+                                                 ErrorOut error = nullptr) = 0;
+    /// The file that stands for an item whose content is not on this device; none for any other
+    /// item.
+    [[nodiscard]] virtual std::optional<URL> placeholderFile(const URL& url) = 0;
+
+    static CloudStore& host();
+};
+
+}  // namespace parvel

@@ -1,0 +1,81 @@
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <string>
+
+#include "parvel/foundation/ErrorOut.h"
+#include "parvel/foundation/PVExport.h"
+#include "parvel/foundation/URL.h"
+
+namespace parvel {
+
+/// What a replacement keeps of the item that it replaces.
+enum class ReplaceOptions {
+    Default = 0,          ///< its mode and those of its attributes that the new item lacks
+    NewMetadataOnly = 1,  ///< nothing: the new item's metadata alone
+};
+
+/// The host's file operations on whole items, files and folders alike. A symbolic link is an item
+/// of its own. A caller of the file manager can give it another. All errors are those of
+/// makeServiceError. After a failure each item is whole at its old place or whole at its new one,
+/// and nothing half-made has a final name.
+class PV_EXPORT FileSystemService {
+public:
+    virtual ~FileSystemService() = default;
+
+    /// Whether anything stands at the path, a dangling link included.
+    [[nodiscard]] virtual bool itemExistsAtPath(const std::string& path) = 0;
+    /// Renames, or copies across file systems (synced before the source goes). Fails where anything
+    /// stands at the destination, also against a competitor in the same instant. Within one trash
+    /// folder the item's info file follows.
+    virtual bool moveItem(const URL& source, const URL& destination, ErrorOut error = nullptr) = 0;
+    /// Puts the replacement at the existing item's place in one atomic step and removes the old
+    /// item; moves it there when nothing stands there. The resulting URL is the existing item's.
+    virtual bool replaceItem(const URL& existing, const URL& replacement, ReplaceOptions options,
+                             std::optional<URL>* resulting = nullptr, ErrorOut error = nullptr) = 0;
+    /// Copies data, attributes, mode and times; the copy appears whole or not at all. Fails where
+    /// anything stands at the destination.
+    virtual bool copyItem(const URL& source, const URL& destination, ErrorOut error = nullptr) = 0;
+    /// Removes a file, a link or a whole folder; links are not followed.
+    virtual bool removeItem(const URL& item, ErrorOut error = nullptr) = 0;
+    /// Moves the item to the user's trash (freedesktop.org Trash specification 1.0): the home
+    /// trash, or its volume's own. `resulting` is its place there.
+    virtual bool trashItem(const URL& item, std::optional<URL>* resulting,
+                           ErrorOut error = nullptr) = 0;
+
+    /// A new default service.
+    static std::shared_ptr<FileSystemService> makeDefault();
+};
+
+/// Passes every operation on to another service; derive from it to change some of them.
+class PV_EXPORT ForwardingFileSystemService : public FileSystemService {
+public:
+    explicit ForwardingFileSystemService(std::shared_ptr<FileSystemService> target)
+        : m_target(std::move(target)) {}
+
+    bool itemExistsAtPath(const std::string& path) override {
+        return m_target->itemExistsAtPath(path);
+    }
+    bool moveItem(const URL& source, const URL& destination, ErrorOut error) override {
+        return m_target->moveItem(source, destination, error);
+    }
+    bool replaceItem(const URL& existing, const URL& replacement, ReplaceOptions options,
+                     std::optional<URL>* resulting, ErrorOut error) override {
+        return m_target->replaceItem(existing, replacement, options, resulting, error);
+    }
+    bool copyItem(const URL& source, const URL& destination, ErrorOut error) override {
+        return m_target->copyItem(source, destination, error);
+    }
+    bool removeItem(const URL& item, ErrorOut error) override {
+        return m_target->removeItem(item, error);
+    }
+    bool trashItem(const URL& item, std::optional<URL>* resulting, ErrorOut error) override {
+        return m_target->trashItem(item, resulting, error);
+    }
+
+private:
+    std::shared_ptr<FileSystemService> m_target;
+};
+
+}  // namespace parvel

@@ -1,0 +1,26 @@
+#pragma once
+
+#include <cstddef>
+#include <string>
+#include <string_view>
+
+namespace parvel {
+
+/// Unicode rules for UTF-8 text.
+class TextRules {
+public:
+    virtual ~TextRules() = default;
+
+    /// Lower case by the Unicode rules of no particular language. Bytes that are no UTF-8 stay.
+    [[nodiscard]] virtual std::string lowercased(std::string_view text) = 0;
+
+    static TextRules& host();
+};
+
+[[nodiscard]] bool isValidUTF8(std::string_view text);
+/// The text with U+FFFD for each byte that is no part of valid UTF-8.
+[[nodiscard]] std::string withReplacedInvalidUTF8(std::string_view text);
+/// The length in UTF-16 units of valid UTF-8 text.
+[[nodiscard]] std::size_t utf16Length(std::string_view text);
+
+}  // namespace parvel

@@ -28,6 +28,9 @@ public:
     /// within the accessor to an item that this thread holds does not wait for itself.
     virtual bool coordinateWriting(const URL& url, WritingIntent intent, ErrorOut error,
                                    const Accessor& accessor) = 0;
+    /// Tells, from within an accessor, that the item that it holds was moved: whoever waits for it,
+    /// or comes later and finds nothing there, is handed the new place.
+    virtual void itemDidMove(const URL& from, const URL& to) = 0;
 
     /// A new default coordinator. A killed holder leaves no lock behind.
     static std::shared_ptr<FileCoordinator> makeDefault();
@@ -43,6 +46,7 @@ public:
                            const Accessor& accessor) override {
         return m_target->coordinateWriting(url, intent, error, accessor);
     }
+    void itemDidMove(const URL& from, const URL& to) override { m_target->itemDidMove(from, to); }
 
 private:
     std::shared_ptr<FileCoordinator> m_target;

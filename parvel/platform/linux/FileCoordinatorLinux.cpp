@@ -1,0 +1,206 @@
+// Coordination by one lock file an item, named after the item's real folder and name, in a private
+// folder that no client synchronises. The lock belongs to the open file description, so threads of
+// one process exclude each other too, and the kernel drops it when its holder dies. A holder that
+// has moved the item leaves the new path in the lock file for whoever waits.
+
+#include <fcntl.h>
+#include <openssl/evp.h>
+#include <stdlib.h>
+#include <sys/stat.h>
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <filesystem>
+#include <string>
+#include <vector>
+
+#include "parvel/platform/FileCoordinator.h"
+#include "parvel/platform/linux/FileDescriptor.h"
+
+namespace parvel {
+
+namespace {
+
+using host::FileDescriptor;
+
+constexpr const char* kFolderName = "parvel-coord";
+constexpr std::size_t kMaximumNote = 1 << 16;
+
+/// An item that this thread holds.
+struct HeldItem {
+    std::string lockPath;
+    int lock;
+    bool hasNote;
+};
+thread_local std::vector<HeldItem> t_held;
+
+HeldItem* findHeld(const std::string& lockPath) {
+    const auto found = std::find_if(t_held.begin(), t_held.end(), [&](const HeldItem& item) {
+        return item.lockPath == lockPath;
+    });
+    return found == t_held.end() ? nullptr : &*found;
+}
+
+bool isPrivateFolder(const std::string& path) {
+    struct stat status {};
+    return ::lstat(path.c_str(), &status) == 0 && S_ISDIR(status.st_mode) &&
+           status.st_uid == ::geteuid() && (status.st_mode & 0077) == 0;
+}
+
+/// The folder of lock files; empty with errno set where none is safe.
+std::string lockFolder() {
+    std::string path;
+    if (const char* runtime = ::getenv("XDG_RUNTIME_DIR"); runtime && *runtime == '/') {
+        path = pathAppending(runtime, kFolderName);
+        if ((::mkdir(path.c_str(), 0700) == 0 || errno == EEXIST) && isPrivateFolder(path))
+            return path;
+    }
+    std::error_code ignored;
+    const std::string temporary = std::filesystem::temp_directory_path(ignored).string();
+    path = pathAppending(temporary.empty() ? "/tmp" : temporary,
+                         std::string(kFolderName) + "-" + std::to_string(::geteuid()));
+    if (::mkdir(path.c_str(), 0700) != 0 && errno != EEXIST)
+        return {};
+    if (isPrivateFolder(path))
+        return path;
+    errno = EPERM;
+    return {};
+}
+
+std::string hexSHA256(std::string_view text) {
+    std::array<unsigned char, EVP_MAX_MD_SIZE> digest{};
+    unsigned length = 0;
+    if (EVP_Digest(text.data(), text.size(), digest.data(), &length, EVP_sha256(), nullptr) != 1)
+        return {};
+    static constexpr std::string_view digits = "0123456789abcdef";
+    std::string hex;
+    for (unsigned i = 0; i < length; ++i) {
+        hex += digits[digest[i] >> 4];
+        hex += digits[digest[i] & 15];
+    }
+    return hex;
+}
+
+std::string folderOf(const std::string& path) {
+    const std::string_view parent = pathWithoutLastComponent(path);
+    return parent.empty() ? std::string(path.starts_with('/') ? "/" : ".") : std::string(parent);
+}
+
+/// One name an item, by whatever links its folder is reached.
+std::string lockName(const URL& url) {
+    const std::string folder = folderOf(url.path());
+    char* real = ::realpath(folder.c_str(), nullptr);
+    const std::string key = pathAppending(real ? real : folder, url.lastPathComponent());
+    ::free(real);
+    return hexSHA256(key);
+}
+
+bool exists(const std::string& path) {
+    struct stat status {};
+    return ::lstat(path.c_str(), &status) == 0;
+}
+
+std::string readNote(int lock) {
+    std::string note(kMaximumNote, '\0');
+    const ssize_t length = ::pread(lock, note.data(), note.size(), 0);
+    note.resize(length > 0 ? static_cast<std::size_t>(length) : 0);
+    return note;
+}
+
+/// Whether the note was left; without it a waiter is handed the old place.
+bool writeNote(int lock, const std::string& note) {
+    return ::ftruncate(lock, 0) == 0 &&
+           ::pwrite(lock, note.data(), note.size(), 0) == static_cast<ssize_t>(note.size());
+}
+
+/// The opened and locked lock file; closed with errno set on a failure.
+FileDescriptor lockFile(const std::string& path) {
+    for (;;) {
+        FileDescriptor file(::open(path.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600));
+        if (!file)
+            return {};
+        struct flock request {};
+        request.l_type = F_WRLCK;
+        request.l_whence = SEEK_SET;
+        while (::fcntl(file.get(), F_OFD_SETLKW, &request) != 0) {
+            if (errno != EINTR)
+                return {};
+        }
+        struct stat locked {};
+        struct stat named {};
+        if (::fstat(file.get(), &locked) != 0)
+            return {};
+        // A lock on a file that was cleared away meanwhile guards nothing.
+        if (::lstat(path.c_str(), &named) == 0 && named.st_ino == locked.st_ino &&
+            named.st_dev == locked.st_dev)
+            return file;
+    }
+}
+
+class LinuxFileCoordinator : public FileCoordinator {
+public:
+    bool coordinateWriting(const URL& url, WritingIntent /*intent*/, ErrorOut error,
+                           const Accessor& accessor) override {
+        const std::string folder = lockFolder();
+        if (folder.empty())
+            return fail(error, makeServiceError(errno, url));
+        const std::string path = pathAppending(folder, lockName(url));
+        if (findHeld(path)) {
+            accessor(placeToUse(url, {}));
+            return true;
+        }
+        const FileDescriptor lock = lockFile(path);
+        if (!lock)
+            return fail(error, makeServiceError(errno, url));
+        hold(path, lock.get(), url, accessor);
+        return true;
+    }
+
+    void itemDidMove(const URL& from, const URL& to) override {
+        const std::string path = pathAppending(lockFolder(), lockName(from));
+        HeldItem* held = findHeld(path);
+        if (held)
+            held->hasNote = writeNote(held->lock, to.standardized().path());
+    }
+
+private:
+    /// Marks the item as held by this thread while the accessor runs. The lock file goes with it,
+    /// unless there is a note in it.
+    static void hold(const std::string& path, int lock, const URL& url, const Accessor& accessor) {
+        struct Holding {
+            Holding(const std::string& lockPath, int descriptor, bool hasNote) {
+                t_held.push_back({lockPath, descriptor, hasNote});
+            }
+            ~Holding() {
+                if (!t_held.back().hasNote)
+                    ::unlink(t_held.back().lockPath.c_str());
+                t_held.pop_back();
+            }
+        };
+        std::string note = readNote(lock);
+        // An item that stands at its place again makes an older move's note untrue.
+        if (!note.empty() && exists(url.path()) && ::ftruncate(lock, 0) == 0)
+            note.clear();
+        const Holding holding(path, lock, !note.empty());
+        accessor(placeToUse(url, note));
+    }
+
+    static std::optional<URL> placeToUse(const URL& url, const std::string& note) {
+        if (exists(url.path()))
+            return url;
+        if (!note.empty() && exists(note))
+            return URL::fileURLWithPath(note);
+        if (!exists(folderOf(url.path())))
+            return std::nullopt;
+        return url;
+    }
+};
+
+}  // namespace
+
+std::shared_ptr<FileCoordinator> FileCoordinator::makeDefault() {
+    return std::make_shared<LinuxFileCoordinator>();
+}
+
+}  // namespace parvel

@@ -1,0 +1,73 @@
+#include <sys/stat.h>
+
+#include "parvel/platform/FileSystemService.h"
+#include "parvel/platform/linux/ItemMoves.h"
+#include "parvel/platform/linux/ItemTree.h"
+#include "parvel/platform/linux/StagingFolder.h"
+#include "parvel/platform/linux/Trash.h"
+
+namespace parvel {
+
+namespace {
+
+bool exists(const std::string& path) {
+    struct stat status {};
+    return ::lstat(path.c_str(), &status) == 0;
+}
+
+/// Which of the two items a failed move or copy is about: the source where that is missing, the
+/// destination where the new item can't be made.
+Error makeTransferError(int errnoValue, const URL& source, const URL& destination) {
+    return makeServiceError(errnoValue, exists(source.path()) ? destination : source);
+}
+
+class LinuxFileSystemService : public FileSystemService {
+public:
+    bool itemExistsAtPath(const std::string& path) override { return exists(path); }
+
+    bool moveItem(const URL& source, const URL& destination, ErrorOut error) override {
+        const std::string& from = source.path();
+        const std::string& to = destination.path();
+        const int failure = host::isRenameWithinTrash(from, to) ? host::renameWithinTrash(from, to)
+                                                                : host::moveExclusively(from, to);
+        return failure == 0 || fail(error, makeTransferError(failure, source, destination));
+    }
+
+    bool replaceItem(const URL& existing, const URL& replacement, ReplaceOptions options,
+                     std::optional<URL>* resulting, ErrorOut error) override {
+        const int failure = host::replace(existing.path(), replacement.path(), options);
+        if (failure != 0)
+            return fail(error, makeTransferError(failure, replacement, existing));
+        if (resulting)
+            *resulting = existing;
+        return true;
+    }
+
+    bool copyItem(const URL& source, const URL& destination, ErrorOut error) override {
+        const int failure = host::copyExclusively(source.path(), destination.path());
+        return failure == 0 || fail(error, makeTransferError(failure, source, destination));
+    }
+
+    bool removeItem(const URL& item, ErrorOut error) override {
+        const int failure = host::discardItem(item.path());
+        return failure == 0 || fail(error, makeServiceError(failure, item));
+    }
+
+    bool trashItem(const URL& item, std::optional<URL>* resulting, ErrorOut error) override {
+        std::string place;
+        const int failure = host::trashItem(item.path(), place);
+        if (failure != 0)
+            return fail(error, makeServiceError(failure, item));
+        if (resulting)
+            *resulting = URL::fileURLWithPath(place);
+        return true;
+    }
+};
+
+}  // namespace
+
+std::shared_ptr<FileSystemService> FileSystemService::makeDefault() {
+    return std::make_shared<LinuxFileSystemService>();
+}
+
+}  // namespace parvel

@@ -1,0 +1,258 @@
+// How items move. Across file systems, and wherever an item is made anew, in this order:
+//   1. the item is copied into a hidden, locked folder beside the target and written to the disk;
+//   2. one rename gives it its final name, and the folder is written to the disk;
+//   3. only then the source goes. Where it can't, the new item is taken back.
+// A failure or a kill before step 2 leaves the source whole and nothing under the final name; after
+// it, the new item is whole. What a kill leaves in the hidden folder is cleared by the next
+// operation there.
+
+#include "parvel/platform/linux/ItemMoves.h"
+
+#include <fcntl.h>
+#include <stdio.h>
+#include <sys/stat.h>
+
+#include <cerrno>
+
+#include "parvel/foundation/URL.h"
+#include "parvel/platform/linux/ItemTree.h"
+#include "parvel/platform/linux/StagingFolder.h"
+
+namespace parvel::host {
+
+namespace {
+
+std::string parentOf(const std::string& path) {
+    const std::string_view parent = pathWithoutLastComponent(path);
+    return parent.empty() ? std::string(path.starts_with('/') ? "/" : ".") : std::string(parent);
+}
+
+int status(const std::string& path, struct stat& result) {
+    return ::lstat(path.c_str(), &result) == 0 ? 0 : errno;
+}
+
+int plainRename(const std::string& source, const std::string& destination) {
+    return ::rename(source.c_str(), destination.c_str()) == 0 ? 0 : errno;
+}
+
+int renameWithFlags(const std::string& source, const std::string& destination, unsigned flags) {
+    return ::renameat2(AT_FDCWD, source.c_str(), AT_FDCWD, destination.c_str(), flags) == 0 ? 0
+                                                                                            : errno;
+}
+
+bool isFlagUnsupported(int error) {
+    return error == EINVAL || error == ENOSYS || error == ENOTSUP;
+}
+
+/// Takes a free name by an exclusively made file, which the rename then replaces in one step.
+int renameOntoPlaceholder(const std::string& source, const std::string& destination) {
+    const FileDescriptor placeholder(
+        ::open(destination.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600));
+    if (!placeholder)
+        return errno;
+    const int error = plainRename(source, destination);
+    if (error != 0)
+        ::unlink(destination.c_str());
+    return error;
+}
+
+/// For file systems whose rename can't refuse a taken name.
+int renameExclusivelyWithoutFlag(const std::string& source, const std::string& destination) {
+    struct stat item {};
+    if (const int error = status(source, item))
+        return error;
+    if (S_ISDIR(item.st_mode)) {
+        if (::mkdir(destination.c_str(), 0700) != 0)
+            return errno;
+        const int error = plainRename(source, destination);
+        if (error != 0)
+            ::rmdir(destination.c_str());
+        return error;
+    }
+    if (::linkat(AT_FDCWD, source.c_str(), AT_FDCWD, destination.c_str(), 0) != 0)
+        return errno == EPERM || errno == ENOTSUP || errno == ENOSYS
+                   ? renameOntoPlaceholder(source, destination)
+                   : errno;
+    if (::unlink(source.c_str()) == 0)
+        return 0;
+    const int error = errno;
+    ::unlink(destination.c_str());
+    return error;
+}
+
+int syncParents(const std::string& source, const std::string& destination) {
+    const std::string from = parentOf(source);
+    const std::string to = parentOf(destination);
+    if (const int error = syncFolder(to))
+        return error;
+    return from == to ? 0 : syncFolder(from);
+}
+
+/// A staging folder beside the target with a synced copy of the source in it.
+struct StagedCopy {
+    StagingFolder folder;
+    std::string path;
+};
+
+std::optional<StagedCopy> stageCopy(const std::string& source, const std::string& target,
+                                    int& error) {
+    auto folder = StagingFolder::makeIn(stagingParentFor(parentOf(target)), error);
+    if (!folder)
+        return std::nullopt;
+    std::string path = pathAppending(folder->path(), "item");
+    error = copyTree(source, path);
+    if (error == 0)
+        error = syncItem(path);
+    if (error == 0)
+        error = syncFolder(folder->path());
+    if (error != 0)
+        return std::nullopt;
+    return StagedCopy{std::move(*folder), std::move(path)};
+}
+
+int publish(const StagedCopy& staged, const std::string& destination) {
+    if (const int error = renameExclusively(staged.path, destination))
+        return error;
+    const int error = syncFolder(parentOf(destination));
+    if (error != 0)
+        (void)discardItem(destination);
+    return error;
+}
+
+int moveAcrossFileSystems(const std::string& source, const std::string& destination) {
+    if (const int error = copyExclusively(source, destination))
+        return error;
+    const int error = discardItem(source);
+    if (error != 0)
+        (void)discardItem(destination);
+    return error;
+}
+
+/// For file systems that can't exchange two names: the old item steps aside, and back on a failure.
+int exchangeWithoutFlag(const std::string& replacement, const std::string& existing) {
+    struct stat oldItem {};
+    struct stat newItem {};
+    if (const int error = status(existing, oldItem))
+        return error;
+    if (const int error = status(replacement, newItem))
+        return error;
+    if (!S_ISDIR(oldItem.st_mode) && !S_ISDIR(newItem.st_mode))
+        return plainRename(replacement, existing);
+    int error = 0;
+    const auto folder = StagingFolder::makeIn(stagingParentFor(parentOf(existing)), error);
+    if (!folder)
+        return error;
+    const std::string aside = pathAppending(folder->path(), "item");
+    if ((error = plainRename(existing, aside)) != 0)
+        return error;
+    if ((error = renameExclusively(replacement, existing)) == 0)
+        return 0;
+    (void)renameExclusively(aside, existing);
+    return error;
+}
+
+/// After it the new item stands at `existing`, and the old one, if anywhere, at `replacement`.
+int exchange(const std::string& replacement, const std::string& existing) {
+    const int error = renameWithFlags(replacement, existing, RENAME_EXCHANGE);
+    return isFlagUnsupported(error) ? exchangeWithoutFlag(replacement, existing) : error;
+}
+
+int inheritIfAsked(const std::string& existing, const std::string& replacement,
+                   ReplaceOptions options) {
+    return options == ReplaceOptions::Default ? inheritMetadata(existing, replacement) : 0;
+}
+
+int replaceAcrossFileSystems(const std::string& existing, const std::string& replacement,
+                             ReplaceOptions options) {
+    int error = 0;
+    const auto staged = stageCopy(replacement, existing, error);
+    if (!staged)
+        return error;
+    if ((error = inheritIfAsked(existing, staged->path, options)) != 0)
+        return error;
+    if ((error = exchange(staged->path, existing)) != 0)
+        return error;
+    error = syncFolder(parentOf(existing));
+    if (error == 0)
+        error = discardItem(replacement);
+    // The old item, where it still stands in the staging folder, comes back after a failure.
+    if (error != 0)
+        (void)renameWithFlags(staged->path, existing, RENAME_EXCHANGE);
+    return error;
+}
+
+/// Two names of one file: a rename of one onto the other would do nothing and leave both.
+int replaceByOtherName(const std::string& existing, const std::string& replacement) {
+    struct stat oldParent {};
+    struct stat newParent {};
+    if (::stat(parentOf(existing).c_str(), &oldParent) != 0 ||
+        ::stat(parentOf(replacement).c_str(), &newParent) != 0)
+        return errno;
+    const bool isSameName = isSameItem(oldParent, newParent) &&
+                            lastComponentOfPath(existing) == lastComponentOfPath(replacement);
+    if (isSameName)
+        return 0;
+    return ::unlink(replacement.c_str()) == 0 ? 0 : errno;
+}
+
+}  // namespace
+
+int renameExclusively(const std::string& source, const std::string& destination) {
+    const int error = renameWithFlags(source, destination, RENAME_NOREPLACE);
+    return isFlagUnsupported(error) ? renameExclusivelyWithoutFlag(source, destination) : error;
+}
+
+int moveExclusively(const std::string& source, const std::string& destination) {
+    int error = renameExclusively(source, destination);
+    if (error == EXDEV)
+        return moveAcrossFileSystems(source, destination);
+    if (error != 0)
+        return error;
+    if ((error = syncParents(source, destination)) != 0)
+        (void)renameExclusively(destination, source);
+    return error;
+}
+
+int copyExclusively(const std::string& source, const std::string& destination) {
+    struct stat taken {};
+    if (status(destination, taken) == 0)
+        return EEXIST;
+    int error = 0;
+    const auto staged = stageCopy(source, destination, error);
+    return staged ? publish(*staged, destination) : error;
+}
+
+int replace(const std::string& existing, const std::string& replacement, ReplaceOptions options) {
+    struct stat oldItem {};
+    struct stat newItem {};
+    if (const int error = status(replacement, newItem))
+        return error;
+    const int existingError = status(existing, oldItem);
+    if (existingError == ENOENT)
+        return moveExclusively(replacement, existing);
+    if (existingError != 0)
+        return existingError;
+    if (isSameItem(oldItem, newItem))
+        return replaceByOtherName(existing, replacement);
+
+    // What stands under the final name after a power cut is to be whole, whoever wrote it.
+    if (const int error = syncItem(replacement))
+        return error;
+    if (const int error = inheritIfAsked(existing, replacement, options))
+        return error;
+    int error = exchange(replacement, existing);
+    if (error == EXDEV)
+        return replaceAcrossFileSystems(existing, replacement, options);
+    if (error != 0)
+        return error;
+    if ((error = syncParents(replacement, existing)) != 0) {
+        (void)renameWithFlags(replacement, existing, RENAME_EXCHANGE);
+        return error;
+    }
+    // The old item that can't go stays under the replacement's old name; the replacement stands.
+    if (status(replacement, oldItem) == 0)
+        (void)discardItem(replacement);
+    return 0;
+}
+
+}  // namespace parvel::host

@@ -1,0 +1,25 @@
+#pragma once
+
+#include <string>
+
+#include "parvel/platform/FileSystemService.h"
+
+namespace parvel::host {
+
+/// Moves and replacements of whole items by path. Every function gives 0 or the errno value, and
+/// has synced what it published when it gives 0.
+
+/// Moves to a name where nothing stands, EEXIST otherwise, whatever the two file systems can do.
+[[nodiscard]] int moveExclusively(const std::string& source, const std::string& destination);
+
+/// Only the rename of it: EXDEV where the two lie on different file systems.
+[[nodiscard]] int renameExclusively(const std::string& source, const std::string& destination);
+
+/// Copies to a name where nothing stands; the copy appears whole or not at all.
+[[nodiscard]] int copyExclusively(const std::string& source, const std::string& destination);
+
+/// Puts the replacement in the existing item's place, and moves it there when nothing stands there.
+[[nodiscard]] int replace(const std::string& existing, const std::string& replacement,
+                          ReplaceOptions options);
+
+}  // namespace parvel::host

@@ -1,0 +1,375 @@
+#include "parvel/platform/linux/ItemTree.h"
+
+#include <dirent.h>
+#include <fcntl.h>
+#include <sys/vfs.h>
+#include <sys/xattr.h>
+
+#include <array>
+#include <climits>
+#include <memory>
+#include <optional>
+#include <string_view>
+#include <vector>
+
+#include "parvel/foundation/URL.h"
+#include "parvel/platform/linux/FileDescriptor.h"
+#include "parvel/platform/linux/StagingFolder.h"
+
+namespace parvel::host {
+
+namespace {
+
+constexpr int kMaximumDepth = 400;
+constexpr std::size_t kCopyPiece = std::size_t{1} << 20;
+constexpr long kFuseMagic = 0x65735546;
+constexpr std::string_view kUserAttributes = "user.";
+
+int lastError() {
+    return errno;
+}
+
+using Listing = std::unique_ptr<DIR, int (*)(DIR*)>;
+
+/// A listing over a descriptor of its own; null with errno set.
+Listing listFolder(int folder) {
+    FileDescriptor own(::openat(folder, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    DIR* listing = own ? ::fdopendir(own.get()) : nullptr;
+    if (listing)
+        (void)own.release();
+    return {listing, &::closedir};
+}
+
+/// The next entry's name but `.` and `..`; none at the end or, with errno not 0, after a failure.
+const char* nextName(DIR* listing) {
+    for (;;) {
+        errno = 0;
+        const dirent* entry = ::readdir(listing);
+        if (!entry)
+            return nullptr;
+        const std::string_view name = entry->d_name;
+        if (name != "." && name != "..")
+            return entry->d_name;
+    }
+}
+
+// Attributes
+
+std::optional<std::vector<std::string>> userAttributeNames(int file) {
+    const ssize_t size = ::flistxattr(file, nullptr, 0);
+    if (size < 0)
+        return std::nullopt;
+    std::string list(static_cast<std::size_t>(size), '\0');
+    const ssize_t length = ::flistxattr(file, list.data(), list.size());
+    if (length < 0)
+        return std::nullopt;
+    std::vector<std::string> names;
+    for (std::size_t at = 0; at < static_cast<std::size_t>(length);) {
+        const std::string name = list.c_str() + at;
+        at += name.size() + 1;
+        if (name.starts_with(kUserAttributes))
+            names.push_back(name);
+    }
+    return names;
+}
+
+/// File systems without attributes lose them silently; some FUSE mounts say EIO for that.
+bool isLossTolerated(int error, int file) {
+    if (error == ENOTSUP || error == EPERM || error == EACCES)
+        return true;
+    struct statfs system {};
+    return error == EIO && ::fstatfs(file, &system) == 0 && system.f_type == kFuseMagic;
+}
+
+int copyAttribute(int from, int to, const std::string& name, int flags) {
+    const ssize_t size = ::fgetxattr(from, name.c_str(), nullptr, 0);
+    if (size < 0)
+        return errno == ENODATA ? 0 : errno;
+    std::string value(static_cast<std::size_t>(size), '\0');
+    const ssize_t length = ::fgetxattr(from, name.c_str(), value.data(), value.size());
+    if (length < 0)
+        return errno == ENODATA ? 0 : errno;
+    if (::fsetxattr(to, name.c_str(), value.data(), static_cast<std::size_t>(length), flags) == 0)
+        return 0;
+    const int error = errno;
+    return isLossTolerated(error, to) ? 0 : error;
+}
+
+int copyAttributes(int from, int to, bool onlyMissing) {
+    const auto names = userAttributeNames(from);
+    if (!names)
+        return errno == ENOTSUP || isLossTolerated(errno, from) ? 0 : errno;
+    for (const std::string& name : *names) {
+        const int error = copyAttribute(from, to, name, onlyMissing ? XATTR_CREATE : 0);
+        if (error != 0 && !(onlyMissing && error == EEXIST))
+            return error;
+    }
+    return 0;
+}
+
+// Copying
+
+/// Owner and group first, since a change of owner drops mode bits; times last.
+int copyStatus(const struct stat& status, int to) {
+    if (::fchown(to, status.st_uid, status.st_gid) != 0 &&
+        ::fchown(to, static_cast<uid_t>(-1), status.st_gid) != 0 && errno == EIO)
+        return EIO;
+    if (::fchmod(to, status.st_mode & 01777) != 0 && errno != EPERM && errno != ENOTSUP)
+        return errno;
+    const std::array<timespec, 2> times{status.st_atim, status.st_mtim};
+    if (::futimens(to, times.data()) != 0 && errno != EPERM && errno != ENOTSUP)
+        return errno;
+    return 0;
+}
+
+int copyByBuffer(int from, int to, std::uint64_t& copied) {
+    std::vector<char> buffer(kCopyPiece);
+    for (;;) {
+        const ssize_t length = ::read(from, buffer.data(), buffer.size());
+        if (length == 0)
+            return 0;
+        if (length < 0) {
+            if (errno == EINTR)
+                continue;
+            return errno;
+        }
+        for (ssize_t at = 0; at < length;) {
+            const ssize_t written =
+                ::write(to, buffer.data() + at, static_cast<std::size_t>(length - at));
+            if (written < 0 && errno != EINTR)
+                return errno;
+            if (written > 0)
+                at += written;
+        }
+        copied += static_cast<std::uint64_t>(length);
+    }
+}
+
+int copyData(int from, int to, std::uint64_t& copied) {
+    for (;;) {
+        const ssize_t length = ::copy_file_range(from, nullptr, to, nullptr, kCopyPiece, 0);
+        if (length > 0) {
+            copied += static_cast<std::uint64_t>(length);
+            continue;
+        }
+        if (length < 0 && errno == EINTR)
+            continue;
+        const bool canFallBack = length == 0 || errno == EXDEV || errno == EINVAL ||
+                                 errno == ENOSYS || errno == EOPNOTSUPP || errno == EBADF;
+        // What is left, nothing as a rule, is read the plain way: some file systems answer 0 early.
+        return canFallBack ? copyByBuffer(from, to, copied) : errno;
+    }
+}
+
+int copyFile(int from, const struct stat& status, int toFolder, const char* name) {
+    FileDescriptor to(
+        ::openat(toFolder, name, O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600));
+    if (!to)
+        return lastError();
+    std::uint64_t copied = 0;
+    if (const int error = copyData(from, to.get(), copied))
+        return error;
+    if (copied != static_cast<std::uint64_t>(status.st_size))
+        return EIO;  // cut short, or grown, while it was copied
+    if (const int error = copyAttributes(from, to.get(), /*onlyMissing=*/false))
+        return error;
+    if (const int error = copyStatus(status, to.get()))
+        return error;
+    return to.close();
+}
+
+int copyLink(int fromFolder, const char* fromName, const struct stat& status, int toFolder,
+             const char* toName) {
+    std::string target(PATH_MAX, '\0');
+    const ssize_t length = ::readlinkat(fromFolder, fromName, target.data(), target.size());
+    if (length < 0)
+        return errno;
+    target.resize(static_cast<std::size_t>(length));
+    if (::symlinkat(target.c_str(), toFolder, toName) != 0)
+        return errno;
+    const std::array<timespec, 2> times{status.st_atim, status.st_mtim};
+    (void)::utimensat(toFolder, toName, times.data(), AT_SYMLINK_NOFOLLOW);
+    return 0;
+}
+
+int copyEntry(int fromFolder, const char* fromName, int toFolder, const char* toName, int depth);
+
+int copyFolder(int from, const struct stat& status, int toFolder, const char* name, int depth) {
+    if (depth >= kMaximumDepth)
+        return ELOOP;
+    if (::mkdirat(toFolder, name, 0700) != 0)
+        return errno;
+    const FileDescriptor to(
+        ::openat(toFolder, name, O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+    if (!to)
+        return lastError();
+    const Listing listing = listFolder(from);
+    if (!listing)
+        return lastError();
+    while (const char* entry = nextName(listing.get())) {
+        if (const int error = copyEntry(from, entry, to.get(), entry, depth + 1))
+            return error;
+    }
+    if (errno != 0)
+        return errno;
+    if (const int error = copyAttributes(from, to.get(), /*onlyMissing=*/false))
+        return error;
+    return copyStatus(status, to.get());
+}
+
+int copyEntry(int fromFolder, const char* fromName, int toFolder, const char* toName, int depth) {
+    struct stat status {};
+    if (::fstatat(fromFolder, fromName, &status, AT_SYMLINK_NOFOLLOW) != 0)
+        return errno;
+    if (S_ISLNK(status.st_mode))
+        return copyLink(fromFolder, fromName, status, toFolder, toName);
+    if (!S_ISREG(status.st_mode) && !S_ISDIR(status.st_mode))
+        return EOPNOTSUPP;
+    const FileDescriptor from(
+        ::openat(fromFolder, fromName, O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
+    if (!from || ::fstat(from.get(), &status) != 0)
+        return lastError();
+    if (S_ISDIR(status.st_mode))
+        return copyFolder(from.get(), status, toFolder, toName, depth);
+    return S_ISREG(status.st_mode) ? copyFile(from.get(), status, toFolder, toName) : EOPNOTSUPP;
+}
+
+// Removing
+
+/// One folder on the way down: its name in the folder above, and which item that folder is.
+struct Descent {
+    std::string name;
+    struct stat above;
+};
+
+/// Steps back up to the folder that the descent came from; closed when that is another folder now.
+FileDescriptor folderAbove(int folder, const struct stat& expected) {
+    FileDescriptor above(::openat(folder, "..", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    struct stat status {};
+    if (above && ::fstat(above.get(), &status) == 0 && !isSameItem(status, expected)) {
+        errno = ENOENT;
+        return {};
+    }
+    return above;
+}
+
+/// Empties a folder with one descriptor at a time, however deep it is.
+int emptyFolder(FileDescriptor folder, bool& removedAny) {
+    std::vector<Descent> path;
+    for (;;) {
+        const Listing listing = listFolder(folder.get());
+        if (!listing)
+            return lastError();
+        bool isDescending = false;
+        while (const char* name = nextName(listing.get())) {
+            if (::unlinkat(folder.get(), name, 0) == 0) {
+                removedAny = true;
+                continue;
+            }
+            if (errno != EISDIR && errno != EPERM)
+                return errno;
+            const int error = errno;
+            FileDescriptor below(
+                ::openat(folder.get(), name, O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+            if (!below)
+                return errno == ENOTDIR || errno == ELOOP ? error : errno;
+            struct stat status {};
+            if (::fstat(folder.get(), &status) != 0)
+                return errno;
+            path.push_back({name, status});
+            folder = std::move(below);
+            isDescending = true;
+            break;
+        }
+        if (isDescending)
+            continue;
+        if (errno != 0)
+            return errno;
+        if (path.empty())
+            return 0;
+        folder = folderAbove(folder.get(), path.back().above);
+        if (!folder || ::unlinkat(folder.get(), path.back().name.c_str(), AT_REMOVEDIR) != 0)
+            return lastError();
+        removedAny = true;
+        path.pop_back();
+    }
+}
+
+}  // namespace
+
+int copyTree(const std::string& source, const std::string& destination) {
+    return copyEntry(AT_FDCWD, source.c_str(), AT_FDCWD, destination.c_str(), 0);
+}
+
+int removeTree(const std::string& path, bool* removedAny) {
+    bool any = false;
+    struct stat status {};
+    if (::lstat(path.c_str(), &status) != 0)
+        return errno;
+    if (!S_ISDIR(status.st_mode))
+        return ::unlink(path.c_str()) == 0 ? 0 : errno;
+    FileDescriptor folder(::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+    int error = folder ? emptyFolder(std::move(folder), any) : lastError();
+    if (error == 0 && ::rmdir(path.c_str()) != 0)
+        error = errno;
+    if (removedAny)
+        *removedAny = any;
+    return error;
+}
+
+int discardItem(const std::string& path) {
+    struct stat status {};
+    if (::lstat(path.c_str(), &status) != 0)
+        return errno;
+    if (!S_ISDIR(status.st_mode))
+        return ::unlink(path.c_str()) == 0 ? 0 : errno;
+    const std::string parent(pathWithoutLastComponent(path));
+    int error = 0;
+    const auto staging = StagingFolder::makeIn(stagingParentFor(parent), error);
+    if (!staging)
+        return error;
+    const std::string aside = pathAppending(staging->path(), "discarded");
+    return ::rename(path.c_str(), aside.c_str()) == 0 ? 0 : errno;
+}
+
+int syncItem(const std::string& path) {
+    struct stat status {};
+    if (::lstat(path.c_str(), &status) != 0)
+        return errno;
+    if (!S_ISREG(status.st_mode) && !S_ISDIR(status.st_mode))
+        return 0;
+    const FileDescriptor item(::open(path.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
+    if (!item)
+        return errno == EACCES ? 0 : errno;  // a file that its owner may not read syncs by itself
+    const int result = S_ISDIR(status.st_mode) ? ::syncfs(item.get()) : ::fsync(item.get());
+    return result == 0 || errno == EINVAL || errno == ENOSYS ? 0 : errno;
+}
+
+int syncFolder(const std::string& path) {
+    const FileDescriptor folder(
+        ::open(path.empty() ? "." : path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    if (!folder)
+        return errno == EACCES ? 0 : errno;
+    return ::fsync(folder.get()) == 0 || errno == EINVAL || errno == ENOSYS ? 0 : errno;
+}
+
+int inheritMetadata(const std::string& oldItem, const std::string& newItem) {
+    const int flags = O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
+    const FileDescriptor from(::open(oldItem.c_str(), flags));
+    const FileDescriptor to(::open(newItem.c_str(), flags));
+    struct stat oldStatus {};
+    struct stat newStatus {};
+    if (!from || !to)
+        return errno == ELOOP || errno == EACCES ? 0
+                                                 : errno;  // a link carries no metadata of its own
+    if (::fstat(from.get(), &oldStatus) != 0 || ::fstat(to.get(), &newStatus) != 0)
+        return errno;
+    if (const int error = copyAttributes(from.get(), to.get(), /*onlyMissing=*/true))
+        return error;
+    // A file's mode on a folder would close it, a folder's on a file would open it to be run.
+    if (S_ISDIR(oldStatus.st_mode) != S_ISDIR(newStatus.st_mode))
+        return 0;
+    return ::fchmod(to.get(), oldStatus.st_mode & 01777) == 0 || errno == EPERM ? 0 : errno;
+}
+
+}  // namespace parvel::host

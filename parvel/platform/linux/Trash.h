@@ -1,0 +1,20 @@
+#pragma once
+
+#include <string>
+
+namespace parvel::host {
+
+/// The freedesktop.org Trash, specification 1.0. Every function gives 0 or the errno value.
+
+/// Moves an item to the home trash when it lies on that trash's file system, else to its volume's
+/// own trash, else by copy to the home trash; `resulting` is its place there. The info file is made
+/// first, exclusively, and goes again when the move fails. ENOENT for a missing item.
+[[nodiscard]] int trashItem(const std::string& item, std::string& resulting);
+
+/// Whether both names lie in one trash's "files" folder and the first has its info file there.
+[[nodiscard]] bool isRenameWithinTrash(const std::string& source, const std::string& destination);
+
+/// Renames a trashed item and, before it, its info file, which comes back when the move fails.
+[[nodiscard]] int renameWithinTrash(const std::string& source, const std::string& destination);
+
+}  // namespace parvel::host

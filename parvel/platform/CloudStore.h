@@ -10,19 +10,22 @@ namespace parvel {
 /// What an item in cloud-synchronised storage has on this device.
 enum class DownloadingStatus { Current, Downloaded, NotDownloaded };
 
-/// Cloud-synchronised storage, as far as the disk shows it.
+/// Cloud-synchronised storage, as far as the disk shows it: the marks of Nextcloud's client and of
+/// Syncthing in a folder above, and Nextcloud's placeholder files. No client is asked, so no item
+/// is known to be Current. All errors are those of makeServiceError.
 class CloudStore {
 public:
     virtual ~CloudStore() = default;
 
-    /// Whether the item lies in storage that a sync client keeps in step; none when that can't be
-    /// told.
+    /// Whether the item lies in storage that a sync client keeps in step; none when the folder that
+    /// it stands in can't be reached.
     [[nodiscard]] virtual std::optional<bool> isUbiquitous(const URL& url,
                                                            ErrorOut error = nullptr) = 0;
     /// Whether the item, or what stands for it until it is downloaded, exists.
     [[nodiscard]] virtual bool isPromisedItemReachable(const URL& url,
                                                        ErrorOut error = nullptr) = 0;
-    /// False when the query fails. The status is none for an item that is in no such storage.
+    /// False when the query fails, also for an item that is not reachable even as a promise. The
+    /// status is none for an item that is in no such storage.
     [[nodiscard]] virtual bool downloadingStatus(const URL& url,
                                                  std::optional<DownloadingStatus>& status,
                                                  ErrorOut error = nullptr) = 0;

@@ -11,7 +11,8 @@
 namespace parvel {
 
 /// Reads whole files into memory. All errors are those of makeServiceError; a file over the limit,
-/// or one that is no regular file, counts as corrupt (EBADMSG).
+/// or one that is no regular file, counts as corrupt (EBADMSG), but for a folder in the place of a
+/// whole file (EISDIR).
 class FileReader {
 public:
     virtual ~FileReader() = default;
@@ -20,8 +21,8 @@ public:
     [[nodiscard]] virtual std::optional<Data> readFile(const URL& url, std::uint64_t limit,
                                                        ErrorOut error = nullptr) = 0;
     /// The file at a path below a package directory. No link is followed below the package, and a
-    /// path that leaves it names no readable file; one leading slash of the path is dropped. The
-    /// error's URL is the member's.
+    /// path that leaves it names no readable file (corrupt); one leading slash of the path is
+    /// dropped. The error's URL is the member's.
     [[nodiscard]] virtual std::optional<Data> readMember(const URL& package, std::string_view path,
                                                          std::uint64_t limit,
                                                          ErrorOut error = nullptr) = 0;

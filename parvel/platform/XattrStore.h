@@ -31,7 +31,8 @@ public:
     /// ENODATA when there is no such attribute.
     [[nodiscard]] virtual int remove(const std::string& path, const std::string& name) = 0;
     /// The names that stand there, as the other operations take them; in one or two calls to the
-    /// host.
+    /// host. No read permission is needed where there are any, so one who wants to know whether a
+    /// missing name could have been read asks for it.
     [[nodiscard]] virtual int list(const std::string& path, std::vector<std::string>& names) = 0;
 
     static XattrStore& host();

@@ -13,7 +13,12 @@ struct PV_EXPORT Date {
 
     static Date now();
 
-    friend bool operator==(const Date&, const Date&) = default;
+    /// By value; NaN equals NaN, so that every date equals itself.
+    friend bool operator==(const Date& left, const Date& right) {
+        const double a = left.secondsSinceReferenceDate;
+        const double b = right.secondsSinceReferenceDate;
+        return a == b || (a != a && b != b);
+    }
 };
 
 /// Seconds from 1970-01-01 to 2001-01-01, both 00:00:00 UTC.

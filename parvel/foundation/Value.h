@@ -20,6 +20,9 @@ namespace parvel {
 class Array;
 class Dictionary;
 
+/// The run-time kind of a Value; the four kinds of Number are one.
+enum class TypeID { Null, Number, String, Date, Data, Array, Dictionary };
+
 /// Text in UTF-8. Lengths and cuts are counted in UTF-16 units throughout the library.
 using String = std::string;
 
@@ -27,9 +30,6 @@ using String = std::string;
 struct Null {
     friend bool operator==(const Null&, const Null&) = default;
 };
-
-/// The run-time kind of a Value; the four kinds of Number are one.
-enum class TypeID { Null, Number, String, Date, Data, Array, Dictionary };
 
 /// One property-list value, or the null marker. Arrays and dictionaries are immutable behind a
 /// shared pointer, so a copy is cheap. `as<T>()` looks at the value; absent values are null

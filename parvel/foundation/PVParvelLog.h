@@ -24,6 +24,9 @@ inline std::string logText(std::string_view text) {
 inline std::string logText(const std::string& text) {
     return text;
 }
+inline std::string logText(const char* text) {
+    return text ? text : "(null)";
+}
 inline std::string logText(bool flag) {
     return flag ? "1" : "0";
 }
@@ -63,12 +66,8 @@ public:
 private:
     static consteval std::size_t placeholders(std::string_view text) {
         std::size_t count = 0;
-        for (std::size_t i = 0; i < text.size(); ++i) {
-            if (text[i] != '%')
-                continue;
-            if (i + 1 < text.size() && text[i + 1] == '%')
-                ++i;
-            else
+        for (; !text.empty(); text.remove_prefix(text.starts_with("%%") ? 2 : 1)) {
+            if (placeholderLength(text) > 0)
                 ++count;
         }
         return count;

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <span>
 #include <string>
 #include <string_view>
@@ -10,6 +11,16 @@ namespace parvel {
 
 /// Levels from the least telling to the most; Off is above every line.
 enum class LogLevel { Debug, Default, Error, Fault, Off };
+
+/// The length of the placeholder that a log text begins with (%@ %d %ld %lu %llu %s), 0 for any
+/// other beginning.
+constexpr std::size_t placeholderLength(std::string_view text) {
+    for (std::string_view placeholder : {"%@", "%d", "%ld", "%lu", "%llu", "%s"}) {
+        if (text.starts_with(placeholder))
+            return placeholder.size();
+    }
+    return 0;
+}
 
 /// One argument of a log line, described only when somebody asks for the message.
 struct LogArgument {

@@ -1,0 +1,29 @@
+#include "parvel/foundation/PVDigest.h"
+
+#include <memory>
+
+#include "parvel/platform/Digest.h"
+#include "parvel/platform/Service.h"
+
+namespace parvel {
+
+std::optional<String> parvel_MD5String(const Data& data) {
+    const std::unique_ptr<Digest::Running> running = Service<Digest>::current().beginMD5();
+    if (!running)
+        return std::nullopt;
+    for (Data::Bytes range : data.ranges())
+        running->update(range);
+    const std::optional<Digest::MD5> digest = running->finish();
+    if (!digest)
+        return std::nullopt;
+
+    String text;
+    text.reserve(2 * digest->size());
+    for (std::uint8_t byte : *digest) {
+        text += "0123456789ABCDEF"[byte >> 4];
+        text += "0123456789ABCDEF"[byte & 15];
+    }
+    return text;
+}
+
+}  // namespace parvel

@@ -1,0 +1,350 @@
+// The tags of an MP4 file stand in moov/udta/meta/ilst or moov/meta/ilst: one atom an item, its
+// value in the item's first "data" atom. Only atom heads are read on the way there, through a small
+// window.
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <cstring>
+#include <map>
+#include <string_view>
+#include <vector>
+
+#include "parvel/platform/MediaTags.h"
+#include "parvel/platform/TextRules.h"
+#include "parvel/platform/linux/FileDescriptor.h"
+
+namespace parvel {
+
+namespace {
+
+using host::FileDescriptor;
+
+constexpr std::uint64_t kTextLimit = 1ULL << 20;
+constexpr std::size_t kFirstWindow = 4096;
+constexpr std::size_t kLargestWindow = 65536;
+
+constexpr std::uint32_t atomName(const char (&name)[5]) {
+    return static_cast<std::uint32_t>(static_cast<unsigned char>(name[0])) << 24 |
+           static_cast<std::uint32_t>(static_cast<unsigned char>(name[1])) << 16 |
+           static_cast<std::uint32_t>(static_cast<unsigned char>(name[2])) << 8 |
+           static_cast<std::uint32_t>(static_cast<unsigned char>(name[3]));
+}
+
+std::uint32_t bigEndian32(const std::uint8_t* bytes) {
+    return static_cast<std::uint32_t>(bytes[0]) << 24 | static_cast<std::uint32_t>(bytes[1]) << 16 |
+           static_cast<std::uint32_t>(bytes[2]) << 8 | bytes[3];
+}
+
+std::uint64_t bigEndian64(const std::uint8_t* bytes) {
+    return static_cast<std::uint64_t>(bigEndian32(bytes)) << 32 | bigEndian32(bytes + 4);
+}
+
+void appendUTF8(std::string& text, std::uint32_t codePoint) {
+    const auto trail = [&](int shift) {
+        text += static_cast<char>(0x80 | ((codePoint >> shift) & 0x3F));
+    };
+    if (codePoint < 0x80) {
+        text += static_cast<char>(codePoint);
+    } else if (codePoint < 0x800) {
+        text += static_cast<char>(0xC0 | (codePoint >> 6));
+        trail(0);
+    } else if (codePoint < 0x10000) {
+        text += static_cast<char>(0xE0 | (codePoint >> 12));
+        trail(6);
+        trail(0);
+    } else {
+        text += static_cast<char>(0xF0 | (codePoint >> 18));
+        trail(12);
+        trail(6);
+        trail(0);
+    }
+}
+
+/// Big-endian UTF-16 as UTF-8; none for an odd length or a lone surrogate.
+std::optional<std::string> utf8FromUTF16(const std::string& bytes) {
+    const auto unitAt = [&](std::size_t at) {
+        return static_cast<std::uint32_t>(static_cast<unsigned char>(bytes[at])) << 8 |
+               static_cast<unsigned char>(bytes[at + 1]);
+    };
+    if (bytes.size() % 2 != 0)
+        return std::nullopt;
+    std::string text;
+    for (std::size_t at = 0; at < bytes.size(); at += 2) {
+        std::uint32_t unit = unitAt(at);
+        if (unit >= 0xD800 && unit <= 0xDFFF) {
+            const bool hasLow =
+                unit <= 0xDBFF && at + 2 < bytes.size() && (unitAt(at + 2) & 0xFC00) == 0xDC00;
+            if (!hasLow)
+                return std::nullopt;
+            at += 2;
+            unit = 0x10000 + ((unit - 0xD800) << 10) + (unitAt(at) - 0xDC00);
+        }
+        appendUTF8(text, unit);
+    }
+    return text;
+}
+
+/// A file seen through a window that grows while it is read in order.
+class WindowedFile {
+public:
+    WindowedFile(FileDescriptor file, std::uint64_t size) : m_file(std::move(file)), m_size(size) {}
+
+    [[nodiscard]] std::uint64_t size() const { return m_size; }
+
+    /// `length` bytes at an offset, at most a window's; null when the file has no such bytes. Good
+    /// until the next call.
+    const std::uint8_t* peek(std::uint64_t offset, std::size_t length) {
+        if (offset < m_start || offset + length > m_start + m_window.size())
+            fill(offset, length);
+        const bool isThere = offset >= m_start && offset + length <= m_start + m_window.size();
+        return isThere ? m_window.data() + (offset - m_start) : nullptr;
+    }
+
+    /// Bytes past the window, whole or not at all.
+    [[nodiscard]] bool read(std::uint64_t offset, std::uint8_t* bytes, std::uint64_t length) const {
+        for (std::uint64_t at = 0; at < length;) {
+            const ssize_t got =
+                ::pread(m_file.get(), bytes + at, length - at, static_cast<off_t>(offset + at));
+            if (got < 0 && errno == EINTR)
+                continue;
+            if (got <= 0)
+                return false;
+            at += static_cast<std::uint64_t>(got);
+        }
+        return true;
+    }
+
+private:
+    void fill(std::uint64_t offset, std::size_t length) {
+        const bool isNext = offset >= m_start && offset <= m_start + m_window.size() + 64;
+        m_nextWindow = isNext ? std::min(m_nextWindow * 2, kLargestWindow) : kFirstWindow;
+        m_start = offset;
+        m_window.resize(std::max(length, m_nextWindow));
+        ssize_t got = 0;
+        do {
+            got =
+                ::pread(m_file.get(), m_window.data(), m_window.size(), static_cast<off_t>(offset));
+        } while (got < 0 && errno == EINTR);
+        m_window.resize(got > 0 ? static_cast<std::size_t>(got) : 0);
+    }
+
+    FileDescriptor m_file;
+    std::uint64_t m_size;
+    std::uint64_t m_start = 0;
+    std::size_t m_nextWindow = kFirstWindow;
+    std::vector<std::uint8_t> m_window;
+};
+
+/// One atom's content.
+struct Atom {
+    std::uint32_t name;
+    std::uint64_t begin;  ///< of the content
+    std::uint64_t end;    ///< of the atom, at most its container's
+    bool isCut;           ///< whether it claims more than its container has
+};
+
+/// The atom whose head stands at an offset of a container that ends at `end`; none for no sound
+/// head.
+std::optional<Atom> atomAt(WindowedFile& file, std::uint64_t offset, std::uint64_t end) {
+    if (offset > end || end - offset < 8)
+        return std::nullopt;
+    const std::uint8_t* head = file.peek(offset, 8);
+    if (!head)
+        return std::nullopt;
+    const std::uint32_t name = bigEndian32(head + 4);
+    std::uint64_t size = bigEndian32(head);
+    std::uint64_t headSize = 8;
+    if (size == 1) {
+        head = end - offset >= 16 ? file.peek(offset, 16) : nullptr;
+        if (!head)
+            return std::nullopt;
+        size = bigEndian64(head + 8);
+        headSize = 16;
+    }
+    if (size == 0)
+        size = end - offset;  // to the end of what holds it
+    if (size < headSize)
+        return std::nullopt;
+    const bool isCut = size > end - offset;
+    return Atom{name, offset + headSize, isCut ? end : offset + size, isCut};
+}
+
+/// "meta" stands with four bytes of version and flags before its children, or without.
+std::uint64_t metaChildren(WindowedFile& file, const Atom& meta) {
+    const std::uint8_t* head = meta.end - meta.begin >= 8 ? file.peek(meta.begin, 8) : nullptr;
+    const bool isPlain = head && bigEndian32(head + 4) == atomName("hdlr");
+    return isPlain ? meta.begin : std::min(meta.begin + 4, meta.end);
+}
+
+class MP4Asset : public MediaAsset {
+public:
+    explicit MP4Asset(WindowedFile file) : m_file(std::move(file)) { findTags(); }
+
+    std::optional<std::string> text(MediaTag tag) override {
+        const auto value = valueOf(tag);
+        if (!value || value->size > kTextLimit)
+            return std::nullopt;
+        std::string bytes(value->size, '\0');
+        if (!m_file.read(value->offset, reinterpret_cast<std::uint8_t*>(bytes.data()), value->size))
+            return std::nullopt;
+        return textOf(tag, value->type, bytes);
+    }
+
+    std::optional<Data> bytes(MediaTag tag, std::uint64_t limit) override {
+        const auto value = valueOf(tag);
+        if (!value || value->type == kUTF8 || value->size > limit)
+            return std::nullopt;
+        auto buffer = std::make_unique_for_overwrite<std::uint8_t[]>(value->size);
+        if (!m_file.read(value->offset, buffer.get(), value->size))
+            return std::nullopt;
+        return Data::adopt(std::move(buffer), value->size);
+    }
+
+private:
+    static constexpr std::uint32_t kUTF8 = 1;
+    static constexpr std::uint32_t kUTF16 = 2;
+
+    struct TagValue {
+        std::uint32_t type;
+        std::uint64_t offset;
+        std::uint64_t size;
+    };
+
+    void findTags() {
+        for (std::uint64_t at = 0;;) {
+            const auto atom = atomAt(m_file, at, m_file.size());
+            if (!atom)
+                return;
+            if (atom->name == atomName("moov"))
+                return findTagsInMovie(*atom);
+            at = atom->end;
+        }
+    }
+
+    void findTagsInMovie(const Atom& movie) {
+        forEachChild(movie.begin, movie.end, [&](const Atom& child) {
+            if (child.name == atomName("meta"))
+                findTagsInMeta(child);
+            if (child.name != atomName("udta"))
+                return;
+            forEachChild(child.begin, child.end, [&](const Atom& below) {
+                if (below.name == atomName("meta"))
+                    findTagsInMeta(below);
+            });
+        });
+    }
+
+    void findTagsInMeta(const Atom& meta) {
+        forEachChild(metaChildren(m_file, meta), meta.end, [&](const Atom& child) {
+            if (child.name != atomName("ilst"))
+                return;
+            forEachChild(child.begin, child.end, [&](const Atom& item) { noteItem(item); });
+        });
+    }
+
+    /// The first item of a key counts.
+    void noteItem(const Atom& item) {
+        static const std::map<std::uint32_t, MediaTag> tags{{atomName("cnID"), MediaTag::SongID},
+                                                            {atomName("\xA9"
+                                                                      "ART"),
+                                                             MediaTag::Artist},
+                                                            {atomName("\xA9"
+                                                                      "nam"),
+                                                             MediaTag::SongName},
+                                                            {atomName("covr"), MediaTag::CoverArt}};
+        if (const auto found = tags.find(item.name); found != tags.end())
+            m_items.emplace(found->second, item);
+    }
+
+    template <class Visitor>
+    void forEachChild(std::uint64_t begin, std::uint64_t end, Visitor visit) {
+        for (std::uint64_t at = begin; const auto atom = atomAt(m_file, at, end);) {
+            visit(*atom);
+            at = atom->end;
+        }
+    }
+
+    /// The item's first "data" atom: four bytes of type, four of locale, the value.
+    std::optional<TagValue> valueOf(MediaTag tag) {
+        const auto item = m_items.find(tag);
+        if (item == m_items.end())
+            return std::nullopt;
+        for (std::uint64_t at = item->second.begin;
+             const auto atom = atomAt(m_file, at, item->second.end);) {
+            if (atom->name == atomName("data")) {
+                const std::uint8_t* head =
+                    atom->end - atom->begin >= 8 ? m_file.peek(atom->begin, 8) : nullptr;
+                if (!head || atom->isCut)
+                    return std::nullopt;
+                return TagValue{bigEndian32(head) & 0xFFFFFF, atom->begin + 8,
+                                atom->end - atom->begin - 8};
+            }
+            at = atom->end;
+        }
+        return std::nullopt;
+    }
+
+    static std::optional<std::string> textOf(MediaTag tag, std::uint32_t type,
+                                             const std::string& bytes) {
+        const bool isInteger = type == 21 || type == 22 || (type >= 65 && type <= 67) ||
+                               (type >= 74 && type <= 78) || (type == 0 && tag == MediaTag::SongID);
+        if (isInteger)
+            return integerText(bytes);
+        if (type == kUTF16)
+            return utf8FromUTF16(bytes);
+        if (type == kUTF8 && isValidUTF8(bytes))
+            return bytes;
+        return std::nullopt;
+    }
+
+    /// Up to four bytes are unsigned, so that store IDs above 2^31 stay positive; eight are signed.
+    static std::optional<std::string> integerText(const std::string& bytes) {
+        if (bytes.empty() || (bytes.size() > 4 && bytes.size() != 8))
+            return std::nullopt;
+        std::uint64_t value = 0;
+        for (const char byte : bytes)
+            value = value << 8 | static_cast<unsigned char>(byte);
+        return bytes.size() == 8 ? std::to_string(static_cast<std::int64_t>(value))
+                                 : std::to_string(value);
+    }
+
+    WindowedFile m_file;
+    std::map<MediaTag, Atom> m_items;
+};
+
+bool beginsLikeMP4(WindowedFile& file) {
+    const std::uint8_t* head = file.peek(0, 8);
+    if (!head)
+        return false;
+    static constexpr std::array known{atomName("ftyp"), atomName("moov"), atomName("mdat"),
+                                      atomName("free"), atomName("skip"), atomName("wide")};
+    return std::find(known.begin(), known.end(), bigEndian32(head + 4)) != known.end();
+}
+
+class MP4Tags : public MediaTags {
+public:
+    std::unique_ptr<MediaAsset> open(const URL& url) override {
+        FileDescriptor file(::open(url.path().c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
+        struct stat status {};
+        if (!file || ::fstat(file.get(), &status) != 0 || !S_ISREG(status.st_mode))
+            return nullptr;
+        WindowedFile window(std::move(file), static_cast<std::uint64_t>(status.st_size));
+        if (!beginsLikeMP4(window))
+            return nullptr;
+        return std::make_unique<MP4Asset>(std::move(window));
+    }
+};
+
+}  // namespace
+
+MediaTags& MediaTags::host() {
+    static MP4Tags tags;
+    return tags;
+}
+
+}  // namespace parvel

@@ -1,0 +1,469 @@
+#include "parvel/platform/FileSystemService.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <sys/xattr.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <atomic>
+#include <cstring>
+#include <filesystem>
+#include <thread>
+
+#include <gtest/gtest.h>
+
+#include "tests/support/TemporaryDirectory.h"
+
+namespace parvel::testing {
+namespace {
+
+namespace fs = std::filesystem;
+
+std::optional<Error> generalError(PVFileErrorCode code, const URL& url) {
+    return makeFileError(code, url);
+}
+
+/// All names in a folder, hidden ones included, so that no staging folder goes unseen.
+std::vector<std::string> namesIn(const fs::path& folder) {
+    std::vector<std::string> names;
+    for (const auto& entry : fs::directory_iterator(folder))
+        names.push_back(entry.path().filename().string());
+    std::sort(names.begin(), names.end());
+    return names;
+}
+
+using Names = std::vector<std::string>;
+
+void setAttribute(const std::string& path, const char* name, std::string_view value) {
+    ASSERT_EQ(setxattr(path.c_str(), name, value.data(), value.size(), 0), 0) << strerror(errno);
+}
+
+std::string attribute(const std::string& path, const char* name) {
+    char value[256];
+    const ssize_t length = getxattr(path.c_str(), name, value, sizeof value);
+    return length < 0 ? "(none)" : std::string(value, static_cast<std::size_t>(length));
+}
+
+/// A second file system to move to; skipped where the machine has none.
+class AcrossFileSystems : public ::testing::Test {
+protected:
+    void SetUp() override {
+        struct stat here {};
+        struct stat there {};
+        std::string pattern = "/dev/shm/parvel-XXXXXX";
+        if (!mkdtemp(pattern.data()))
+            GTEST_SKIP() << "no memory file system";
+        m_other = pattern;
+        ASSERT_EQ(stat(m_other.c_str(), &there), 0);
+        ASSERT_EQ(stat(m_folder.path().c_str(), &here), 0);
+        if (here.st_dev == there.st_dev)
+            GTEST_SKIP() << "only one file system";
+    }
+    void TearDown() override {
+        if (!m_other.empty())
+            fs::remove_all(m_other);
+    }
+    [[nodiscard]] URL otherURL(const char* name) const {
+        return URL::fileURLWithPath((m_other / name).string());
+    }
+
+    TemporaryDirectory m_folder;
+    fs::path m_other;
+    std::shared_ptr<FileSystemService> m_service = FileSystemService::makeDefault();
+};
+
+class FileSystem : public ::testing::Test {
+protected:
+    TemporaryDirectory m_folder;
+    std::shared_ptr<FileSystemService> m_service = FileSystemService::makeDefault();
+    std::optional<Error> m_error;
+};
+
+TEST_F(FileSystem, ADanglingLinkOccupiesItsName) {
+    fs::create_symlink("nowhere", m_folder / "link");
+
+    EXPECT_TRUE(m_service->itemExistsAtPath(m_folder / "link"));
+    EXPECT_FALSE(m_service->itemExistsAtPath(m_folder / "nowhere"));
+}
+
+TEST_F(FileSystem, AFileMovesToAFreeName) {
+    m_folder.write("a.pdf", "one");
+
+    EXPECT_TRUE(m_service->moveItem(m_folder.url("a.pdf"), m_folder.url("b.pdf"), &m_error));
+
+    EXPECT_EQ(namesIn(m_folder.path()), Names{"b.pdf"});
+    EXPECT_EQ(m_folder.read("b.pdf"), "one");
+    EXPECT_FALSE(m_error);
+}
+
+TEST_F(FileSystem, AFolderMovesWithItsContent) {
+    m_folder.write("a.epub/OPS/x", "x");
+
+    EXPECT_TRUE(m_service->moveItem(m_folder.url("a.epub"), m_folder.url("b.epub")));
+
+    EXPECT_EQ(namesIn(m_folder.path()), Names{"b.epub"});
+    EXPECT_EQ(m_folder.read("b.epub/OPS/x"), "x");
+}
+
+TEST_F(FileSystem, AMoveOntoATakenNameFailsAndLeavesBoth) {
+    m_folder.write("a", "one");
+    m_folder.write("b", "two");
+
+    EXPECT_FALSE(m_service->moveItem(m_folder.url("a"), m_folder.url("b"), &m_error));
+
+    EXPECT_EQ(m_error, generalError(PVFileErrorCode::FileExists, m_folder.url("b")));
+    EXPECT_EQ(m_folder.read("a"), "one");
+    EXPECT_EQ(m_folder.read("b"), "two");
+}
+
+TEST_F(FileSystem, AMoveOntoADanglingLinkFails) {
+    m_folder.write("a", "one");
+    fs::create_symlink("nowhere", m_folder / "b");
+
+    EXPECT_FALSE(m_service->moveItem(m_folder.url("a"), m_folder.url("b"), &m_error));
+
+    EXPECT_EQ(m_error, generalError(PVFileErrorCode::FileExists, m_folder.url("b")));
+    EXPECT_EQ(namesIn(m_folder.path()), (Names{"a", "b"}));
+}
+
+TEST_F(FileSystem, AMoveOfNothingNamesTheMissingItem) {
+    EXPECT_FALSE(m_service->moveItem(m_folder.url("a"), m_folder.url("b"), &m_error));
+
+    EXPECT_EQ(m_error, generalError(PVFileErrorCode::NoSuchFile, m_folder.url("a")));
+}
+
+TEST_F(FileSystem, AMoveIntoAMissingFolderNamesTheDestination) {
+    m_folder.write("a", "one");
+
+    EXPECT_FALSE(m_service->moveItem(m_folder.url("a"), m_folder.url("no/b"), &m_error));
+
+    EXPECT_EQ(m_error, generalError(PVFileErrorCode::NoSuchFile, m_folder.url("no/b")));
+    EXPECT_EQ(m_folder.read("a"), "one");
+}
+
+TEST_F(FileSystem, ALinkItselfMoves) {
+    m_folder.write("target", "t");
+    fs::create_symlink("target", m_folder / "link");
+
+    EXPECT_TRUE(m_service->moveItem(m_folder.url("link"), m_folder.url("moved")));
+
+    EXPECT_TRUE(fs::is_symlink(m_folder / "moved"));
+    EXPECT_EQ(m_folder.read("target"), "t");
+}
+
+TEST_F(FileSystem, ATooLongNameIsThePlatformsError) {
+    m_folder.write("a", "one");
+    const URL destination = m_folder.url(std::string(300, 'x'));
+
+    EXPECT_FALSE(m_service->moveItem(m_folder.url("a"), destination, &m_error));
+
+    EXPECT_EQ(m_error, makePOSIXError(ENAMETOOLONG, destination));
+}
+
+TEST_F(FileSystem, AReplacedFileGivesWayAndTheOldNameGoes) {
+    m_folder.write("old", "1");
+    m_folder.write("new", "2");
+    std::optional<URL> resulting;
+
+    EXPECT_TRUE(m_service->replaceItem(m_folder.url("old"), m_folder.url("new"),
+                                       ReplaceOptions::NewMetadataOnly, &resulting, &m_error));
+
+    EXPECT_EQ(namesIn(m_folder.path()), Names{"old"});
+    EXPECT_EQ(m_folder.read("old"), "2");
+    EXPECT_EQ(resulting, m_folder.url("old"));
+    EXPECT_FALSE(m_error);
+}
+
+TEST_F(FileSystem, AFolderReplacesAFolderThatIsNotEmpty) {
+    m_folder.write("old/a", "1");
+    m_folder.write("new/b", "2");
+
+    EXPECT_TRUE(m_service->replaceItem(m_folder.url("old"), m_folder.url("new"),
+                                       ReplaceOptions::NewMetadataOnly));
+
+    EXPECT_EQ(namesIn(m_folder.path()), Names{"old"});
+    EXPECT_EQ(namesIn(m_folder.path() / "old"), Names{"b"});
+}
+
+TEST_F(FileSystem, AFolderReplacesAFileAndAFileAFolder) {
+    m_folder.write("file", "1");
+    m_folder.write("folder/b", "2");
+
+    EXPECT_TRUE(m_service->replaceItem(m_folder.url("file"), m_folder.url("folder"),
+                                       ReplaceOptions::NewMetadataOnly));
+    EXPECT_EQ(m_folder.read("file/b"), "2");
+
+    m_folder.write("again", "3");
+    EXPECT_TRUE(m_service->replaceItem(m_folder.url("file"), m_folder.url("again"),
+                                       ReplaceOptions::NewMetadataOnly));
+    EXPECT_EQ(m_folder.read("file"), "3");
+    EXPECT_EQ(namesIn(m_folder.path()), Names{"file"});
+}
+
+TEST_F(FileSystem, AReplacementOfNothingIsAMove) {
+    m_folder.write("new", "2");
+    std::optional<URL> resulting;
+
+    EXPECT_TRUE(m_service->replaceItem(m_folder.url("old"), m_folder.url("new"),
+                                       ReplaceOptions::Default, &resulting));
+
+    EXPECT_EQ(namesIn(m_folder.path()), Names{"old"});
+    EXPECT_EQ(resulting, m_folder.url("old"));
+}
+
+TEST_F(FileSystem, AMissingReplacementLeavesTheExistingItem) {
+    m_folder.write("old", "1");
+
+    EXPECT_FALSE(m_service->replaceItem(m_folder.url("old"), m_folder.url("new"),
+                                        ReplaceOptions::Default, nullptr, &m_error));
+
+    EXPECT_EQ(m_error, generalError(PVFileErrorCode::NoSuchFile, m_folder.url("new")));
+    EXPECT_EQ(m_folder.read("old"), "1");
+}
+
+TEST_F(FileSystem, AnItemReplacedByItselfStays) {
+    m_folder.write("old", "1");
+
+    EXPECT_TRUE(
+        m_service->replaceItem(m_folder.url("old"), m_folder.url("old"), ReplaceOptions::Default));
+
+    EXPECT_EQ(m_folder.read("old"), "1");
+}
+
+TEST_F(FileSystem, AnotherNameOfTheSameFileGoesWhenItReplaces) {
+    m_folder.write("old", "1");
+    fs::create_hard_link(m_folder / "old", m_folder / "new");
+
+    EXPECT_TRUE(
+        m_service->replaceItem(m_folder.url("old"), m_folder.url("new"), ReplaceOptions::Default));
+
+    EXPECT_EQ(namesIn(m_folder.path()), Names{"old"});
+    EXPECT_EQ(m_folder.read("old"), "1");
+}
+
+TEST_F(FileSystem, TheDefaultReplacementKeepsTheOldModeAndTheAttributesThatTheNewItemLacks) {
+    const std::string old = m_folder.write("old", "1");
+    const std::string replacement = m_folder.write("new", "2");
+    setAttribute(old, "user.kept", "old");
+    setAttribute(old, "user.title", "old title");
+    setAttribute(replacement, "user.title", "new title");
+    fs::permissions(old, fs::perms{0640});
+
+    EXPECT_TRUE(
+        m_service->replaceItem(m_folder.url("old"), m_folder.url("new"), ReplaceOptions::Default));
+
+    EXPECT_EQ(attribute(old, "user.kept"), "old");
+    EXPECT_EQ(attribute(old, "user.title"), "new title");
+    EXPECT_EQ(fs::status(old).permissions(), fs::perms{0640});
+}
+
+TEST_F(FileSystem, AReplacementOfNewMetadataOnlyKeepsNothingOfTheOldItem) {
+    const std::string old = m_folder.write("old", "1");
+    const std::string replacement = m_folder.write("new", "2");
+    setAttribute(old, "user.kept", "old");
+    fs::permissions(old, fs::perms{0640});
+    fs::permissions(replacement, fs::perms{0600});
+
+    EXPECT_TRUE(m_service->replaceItem(m_folder.url("old"), m_folder.url("new"),
+                                       ReplaceOptions::NewMetadataOnly));
+
+    EXPECT_EQ(attribute(old, "user.kept"), "(none)");
+    EXPECT_EQ(fs::status(old).permissions(), fs::perms{0600});
+}
+
+TEST_F(FileSystem, ACopyKeepsDataAttributesModeAndTime) {
+    const std::string source = m_folder.write("a.epub/OPS/x", "content");
+    setAttribute(source, "user.t", "v");
+    fs::permissions(source, fs::perms{0640});
+    const auto time = fs::file_time_type::clock::now() - std::chrono::hours(1000);
+    fs::last_write_time(source, time);
+    fs::create_symlink("OPS/x", m_folder / "a.epub/link");
+
+    EXPECT_TRUE(m_service->copyItem(m_folder.url("a.epub"), m_folder.url("b.epub"), &m_error));
+
+    const std::string copy = m_folder / "b.epub/OPS/x";
+    EXPECT_EQ(m_folder.read("b.epub/OPS/x"), "content");
+    EXPECT_EQ(attribute(copy, "user.t"), "v");
+    EXPECT_EQ(fs::status(copy).permissions(), fs::perms{0640});
+    EXPECT_EQ(fs::last_write_time(copy), time);
+    EXPECT_EQ(fs::read_symlink(m_folder / "b.epub/link"), "OPS/x");
+    EXPECT_EQ(namesIn(m_folder.path()), (Names{"a.epub", "b.epub"}));
+}
+
+TEST_F(FileSystem, ACopyOntoATakenNameFails) {
+    m_folder.write("a", "1");
+    m_folder.write("b", "2");
+
+    EXPECT_FALSE(m_service->copyItem(m_folder.url("a"), m_folder.url("b"), &m_error));
+
+    EXPECT_EQ(m_error, generalError(PVFileErrorCode::FileExists, m_folder.url("b")));
+    EXPECT_EQ(m_folder.read("b"), "2");
+}
+
+TEST_F(FileSystem, ACopyOfAPipeIsRefusedAndLeavesNothing) {
+    fs::create_directory(m_folder / "a");
+    ASSERT_EQ(mkfifo((m_folder / "a/pipe").c_str(), 0600), 0);
+
+    EXPECT_FALSE(m_service->copyItem(m_folder.url("a"), m_folder.url("b"), &m_error));
+
+    EXPECT_EQ(m_error, makePOSIXError(EOPNOTSUPP, m_folder.url("b")));
+    EXPECT_EQ(namesIn(m_folder.path()), Names{"a"});
+}
+
+TEST_F(FileSystem, ACopyDropsSetIdBits) {
+    const std::string source = m_folder.write("a", "1");
+    ASSERT_EQ(chmod(source.c_str(), 06755), 0);
+
+    EXPECT_TRUE(m_service->copyItem(m_folder.url("a"), m_folder.url("b")));
+
+    EXPECT_EQ(fs::status(m_folder / "b").permissions(), fs::perms{0755});
+}
+
+TEST_F(FileSystem, AFolderOfAnyDepthIsRemoved) {
+    const int depth = 3000;
+    std::string path = m_folder / "deep";
+    fs::create_directory(path);
+    const int start = open(path.c_str(), O_RDONLY | O_DIRECTORY);
+    int folder = start;
+    for (int i = 0; i < depth; ++i) {
+        ASSERT_EQ(mkdirat(folder, "d", 0700), 0);
+        const int below = openat(folder, "d", O_RDONLY | O_DIRECTORY);
+        close(folder);
+        folder = below;
+    }
+    close(folder);
+
+    EXPECT_TRUE(m_service->removeItem(m_folder.url("deep"), &m_error));
+
+    EXPECT_FALSE(m_error);
+    EXPECT_EQ(namesIn(m_folder.path()), Names{});
+}
+
+TEST_F(FileSystem, RemovingDoesNotFollowALinkOutOfTheItem) {
+    m_folder.write("outside/kept", "1");
+    fs::create_directory(m_folder / "a");
+    fs::create_directory_symlink(m_folder / "outside", m_folder / "a/link");
+
+    EXPECT_TRUE(m_service->removeItem(m_folder.url("a")));
+
+    EXPECT_EQ(m_folder.read("outside/kept"), "1");
+    EXPECT_EQ(namesIn(m_folder.path()), Names{"outside"});
+}
+
+TEST_F(FileSystem, RemovingALinkLeavesItsTarget) {
+    m_folder.write("target", "t");
+    fs::create_symlink("target", m_folder / "link");
+
+    EXPECT_TRUE(m_service->removeItem(m_folder.url("link")));
+
+    EXPECT_EQ(namesIn(m_folder.path()), Names{"target"});
+}
+
+TEST_F(FileSystem, RemovingNothingIsAnError) {
+    EXPECT_FALSE(m_service->removeItem(m_folder.url("a"), &m_error));
+
+    EXPECT_EQ(m_error, generalError(PVFileErrorCode::NoSuchFile, m_folder.url("a")));
+}
+
+TEST_F(FileSystem, AStagingFolderThatNobodyHoldsIsClearedByTheNextOperation) {
+    m_folder.write(".parvel-stage-left/item/x", "1");
+    m_folder.write("a", "1");
+
+    EXPECT_TRUE(m_service->copyItem(m_folder.url("a"), m_folder.url("b")));
+
+    EXPECT_EQ(namesIn(m_folder.path()), (Names{"a", "b"}));
+}
+
+TEST_F(FileSystem, ManyCompetitorsForOneNameLeaveOneWinnerAndTheOthersWhole) {
+    constexpr int competitors = 8;
+    const char* rounds = getenv("PARVEL_TEST_ROUNDS");
+    for (int round = 0; round < (rounds ? atoi(rounds) : 20); ++round) {
+        const std::string target = "won-" + std::to_string(round);
+        std::vector<std::thread> threads;
+        std::atomic<int> winners{0};
+        for (int i = 0; i < competitors; ++i)
+            m_folder.write("from-" + std::to_string(i), std::to_string(i));
+        for (int i = 0; i < competitors; ++i) {
+            threads.emplace_back([&, i] {
+                if (m_service->moveItem(m_folder.url("from-" + std::to_string(i)),
+                                        m_folder.url(target)))
+                    ++winners;
+            });
+        }
+        for (std::thread& thread : threads)
+            thread.join();
+        EXPECT_EQ(winners, 1);
+        EXPECT_EQ(namesIn(m_folder.path()).size(), static_cast<std::size_t>(competitors + round));
+    }
+}
+
+TEST_F(AcrossFileSystems, AMovedFolderArrivesWholeAndTheSourceGoes) {
+    const std::string file = m_folder.write("a.epub/OPS/x", "content");
+    setAttribute(m_folder / "a.epub", "user.com.kestrel.Folium.assetID", "42");
+    setAttribute(file, "user.t", "v");
+
+    EXPECT_TRUE(m_service->moveItem(m_folder.url("a.epub"), otherURL("b.epub")));
+
+    EXPECT_EQ(namesIn(m_folder.path()), Names{});
+    EXPECT_EQ(namesIn(m_other), Names{"b.epub"});
+    EXPECT_EQ(attribute(m_other / "b.epub", "user.com.kestrel.Folium.assetID"), "42");
+    EXPECT_EQ(attribute(m_other / "b.epub/OPS/x", "user.t"), "v");
+}
+
+TEST_F(AcrossFileSystems, AMoveOntoATakenNameLeavesBothWhole) {
+    m_folder.write("a", "1");
+    std::ofstream(m_other / "b") << "2";
+    std::optional<Error> error;
+
+    EXPECT_FALSE(m_service->moveItem(m_folder.url("a"), otherURL("b"), &error));
+
+    EXPECT_EQ(error, generalError(PVFileErrorCode::FileExists, otherURL("b")));
+    EXPECT_EQ(m_folder.read("a"), "1");
+    EXPECT_EQ(namesIn(m_other), Names{"b"});
+    EXPECT_EQ(fs::file_size(m_other / "b"), 1U);
+}
+
+TEST_F(AcrossFileSystems, AReplacementTakesThePlaceAndTheOldNameGoes) {
+    m_folder.write("new/x", "2");
+    fs::create_directory(m_other / "old");
+    std::ofstream(m_other / "old/y") << "1";
+
+    EXPECT_TRUE(m_service->replaceItem(otherURL("old"), m_folder.url("new"),
+                                       ReplaceOptions::NewMetadataOnly));
+
+    EXPECT_EQ(namesIn(m_folder.path()), Names{});
+    EXPECT_EQ(namesIn(m_other), Names{"old"});
+    EXPECT_EQ(namesIn(m_other / "old"), Names{"x"});
+}
+
+TEST_F(AcrossFileSystems, TheDefaultReplacementKeepsWhatTheNewItemLacks) {
+    m_folder.write("new", "2");
+    std::ofstream(m_other / "old") << "1";
+    setAttribute(m_other / "old", "user.kept", "old");
+
+    EXPECT_TRUE(
+        m_service->replaceItem(otherURL("old"), m_folder.url("new"), ReplaceOptions::Default));
+
+    EXPECT_EQ(attribute(m_other / "old", "user.kept"), "old");
+    EXPECT_EQ(namesIn(m_folder.path()), Names{});
+}
+
+TEST_F(FileSystem, AForwardingServicePassesEveryOperationOn) {
+    ForwardingFileSystemService service(m_service);
+    m_folder.write("a", "1");
+    std::optional<URL> resulting;
+
+    EXPECT_TRUE(service.itemExistsAtPath(m_folder / "a"));
+    EXPECT_TRUE(service.copyItem(m_folder.url("a"), m_folder.url("b"), nullptr));
+    EXPECT_TRUE(service.moveItem(m_folder.url("a"), m_folder.url("c"), nullptr));
+    EXPECT_TRUE(service.replaceItem(m_folder.url("c"), m_folder.url("b"), ReplaceOptions::Default,
+                                    &resulting, nullptr));
+    EXPECT_EQ(resulting, m_folder.url("c"));
+    EXPECT_TRUE(service.removeItem(m_folder.url("c"), nullptr));
+    EXPECT_FALSE(service.trashItem(m_folder.url("c"), &resulting, &m_error));
+    EXPECT_EQ(m_error, generalError(PVFileErrorCode::NoSuchFile, m_folder.url("c")));
+}
+
+}  // namespace
+}  // namespace parvel::testing

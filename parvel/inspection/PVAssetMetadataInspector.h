@@ -32,6 +32,16 @@ public:
     static AssetPtr metadataForAssetAtURL_extraMetadata_error(const std::optional<URL>& url,
                                                               const AssetPtr& extraMetadata,
                                                               ErrorOut error = nullptr);
+    /// What can be known without a download: the whole record, without cover, where synchronised
+    /// storage says that the content is on this device, else what the extended attributes hold. So
+    /// a plain local file's content is not read either. Deliberate. None, with the host's error,
+    /// when not even a promise of the asset is there; none when its state can't be told.
+    static AssetPtr immediatelyAvailableMetadataForAssetAtURL_error(const std::optional<URL>& url,
+                                                                    ErrorOut error = nullptr);
+    /// The encoded cover image: the store's artwork file in a package, else the cover bytes of
+    /// `metadataIncludingCoverForAssetAtURL_error`, whose errors it has.
+    static std::optional<Data> coverImageDataForAssetAtURL_error(const std::optional<URL>& url,
+                                                                 ErrorOut error = nullptr);
     /// The store metadata file at the URL itself as a record; none for a package.
     static AssetPtr bazaarMetadataForBookAssetAtURL_error(const std::optional<URL>& url,
                                                           ErrorOut error = nullptr);

@@ -17,6 +17,7 @@
 
 #include "parvel/platform/FileCoordinator.h"
 #include "parvel/platform/linux/FileDescriptor.h"
+#include "parvel/platform/linux/Paths.h"
 
 namespace parvel {
 
@@ -82,23 +83,13 @@ std::string hexSHA256(std::string_view text) {
     return hex;
 }
 
-std::string folderOf(const std::string& path) {
-    const std::string_view parent = pathWithoutLastComponent(path);
-    return parent.empty() ? std::string(path.starts_with('/') ? "/" : ".") : std::string(parent);
-}
-
 /// One name an item, by whatever links its folder is reached.
 std::string lockName(const URL& url) {
-    const std::string folder = folderOf(url.path());
+    const std::string folder = host::parentFolderOf(url.path());
     char* real = ::realpath(folder.c_str(), nullptr);
     const std::string key = pathAppending(real ? real : folder, url.lastPathComponent());
     ::free(real);
     return hexSHA256(key);
-}
-
-bool exists(const std::string& path) {
-    struct stat status {};
-    return ::lstat(path.c_str(), &status) == 0;
 }
 
 std::string readNote(int lock) {
@@ -180,18 +171,18 @@ private:
         };
         std::string note = readNote(lock);
         // An item that stands at its place again makes an older move's note untrue.
-        if (!note.empty() && exists(url.path()) && ::ftruncate(lock, 0) == 0)
+        if (!note.empty() && host::itemStandsAt(url.path()) && ::ftruncate(lock, 0) == 0)
             note.clear();
         const Holding holding(path, lock, !note.empty());
         accessor(placeToUse(url, note));
     }
 
     static std::optional<URL> placeToUse(const URL& url, const std::string& note) {
-        if (exists(url.path()))
+        if (host::itemStandsAt(url.path()))
             return url;
-        if (!note.empty() && exists(note))
+        if (!note.empty() && host::itemStandsAt(note))
             return URL::fileURLWithPath(note);
-        if (!exists(folderOf(url.path())))
+        if (!host::itemStandsAt(host::parentFolderOf(url.path())))
             return std::nullopt;
         return url;
     }

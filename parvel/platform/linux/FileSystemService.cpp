@@ -1,29 +1,22 @@
-#include <sys/stat.h>
-
 #include "parvel/platform/FileSystemService.h"
 #include "parvel/platform/linux/ItemMoves.h"
 #include "parvel/platform/linux/ItemTree.h"
-#include "parvel/platform/linux/StagingFolder.h"
+#include "parvel/platform/linux/Paths.h"
 #include "parvel/platform/linux/Trash.h"
 
 namespace parvel {
 
 namespace {
 
-bool exists(const std::string& path) {
-    struct stat status {};
-    return ::lstat(path.c_str(), &status) == 0;
-}
-
 /// Which of the two items a failed move or copy is about: the source where that is missing, the
 /// destination where the new item can't be made.
 Error makeTransferError(int errnoValue, const URL& source, const URL& destination) {
-    return makeServiceError(errnoValue, exists(source.path()) ? destination : source);
+    return makeServiceError(errnoValue, host::itemStandsAt(source.path()) ? destination : source);
 }
 
 class LinuxFileSystemService : public FileSystemService {
 public:
-    bool itemExistsAtPath(const std::string& path) override { return exists(path); }
+    bool itemExistsAtPath(const std::string& path) override { return host::itemStandsAt(path); }
 
     bool moveItem(const URL& source, const URL& destination, ErrorOut error) override {
         const std::string& from = source.path();

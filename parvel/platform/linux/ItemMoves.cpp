@@ -16,16 +16,12 @@
 
 #include "parvel/foundation/URL.h"
 #include "parvel/platform/linux/ItemTree.h"
+#include "parvel/platform/linux/Paths.h"
 #include "parvel/platform/linux/StagingFolder.h"
 
 namespace parvel::host {
 
 namespace {
-
-std::string parentOf(const std::string& path) {
-    const std::string_view parent = pathWithoutLastComponent(path);
-    return parent.empty() ? std::string(path.starts_with('/') ? "/" : ".") : std::string(parent);
-}
 
 int status(const std::string& path, struct stat& result) {
     return ::lstat(path.c_str(), &result) == 0 ? 0 : errno;
@@ -81,8 +77,8 @@ int renameExclusivelyWithoutFlag(const std::string& source, const std::string& d
 }
 
 int syncParents(const std::string& source, const std::string& destination) {
-    const std::string from = parentOf(source);
-    const std::string to = parentOf(destination);
+    const std::string from = parentFolderOf(source);
+    const std::string to = parentFolderOf(destination);
     if (const int error = syncFolder(to))
         return error;
     return from == to ? 0 : syncFolder(from);
@@ -96,7 +92,7 @@ struct StagedCopy {
 
 std::optional<StagedCopy> stageCopy(const std::string& source, const std::string& target,
                                     int& error) {
-    auto folder = StagingFolder::makeIn(stagingParentFor(parentOf(target)), error);
+    auto folder = StagingFolder::makeIn(parentFolderOf(target), error);
     if (!folder)
         return std::nullopt;
     std::string path = pathAppending(folder->path(), "item");
@@ -113,7 +109,7 @@ std::optional<StagedCopy> stageCopy(const std::string& source, const std::string
 int publish(const StagedCopy& staged, const std::string& destination) {
     if (const int error = renameExclusively(staged.path, destination))
         return error;
-    const int error = syncFolder(parentOf(destination));
+    const int error = syncFolder(parentFolderOf(destination));
     if (error != 0)
         (void)discardItem(destination);
     return error;
@@ -139,7 +135,7 @@ int exchangeWithoutFlag(const std::string& replacement, const std::string& exist
     if (!S_ISDIR(oldItem.st_mode) && !S_ISDIR(newItem.st_mode))
         return plainRename(replacement, existing);
     int error = 0;
-    const auto folder = StagingFolder::makeIn(stagingParentFor(parentOf(existing)), error);
+    const auto folder = StagingFolder::makeIn(parentFolderOf(existing), error);
     if (!folder)
         return error;
     const std::string aside = pathAppending(folder->path(), "item");
@@ -172,7 +168,7 @@ int replaceAcrossFileSystems(const std::string& existing, const std::string& rep
         return error;
     if ((error = exchange(staged->path, existing)) != 0)
         return error;
-    error = syncFolder(parentOf(existing));
+    error = syncFolder(parentFolderOf(existing));
     if (error == 0)
         error = discardItem(replacement);
     // The old item, where it still stands in the staging folder, comes back after a failure.
@@ -185,8 +181,8 @@ int replaceAcrossFileSystems(const std::string& existing, const std::string& rep
 int replaceByOtherName(const std::string& existing, const std::string& replacement) {
     struct stat oldParent {};
     struct stat newParent {};
-    if (::stat(parentOf(existing).c_str(), &oldParent) != 0 ||
-        ::stat(parentOf(replacement).c_str(), &newParent) != 0)
+    if (::stat(parentFolderOf(existing).c_str(), &oldParent) != 0 ||
+        ::stat(parentFolderOf(replacement).c_str(), &newParent) != 0)
         return errno;
     const bool isSameName = isSameItem(oldParent, newParent) &&
                             lastComponentOfPath(existing) == lastComponentOfPath(replacement);
@@ -214,8 +210,7 @@ int moveExclusively(const std::string& source, const std::string& destination) {
 }
 
 int copyExclusively(const std::string& source, const std::string& destination) {
-    struct stat taken {};
-    if (status(destination, taken) == 0)
+    if (itemStandsAt(destination))
         return EEXIST;
     int error = 0;
     const auto staged = stageCopy(source, destination, error);
@@ -250,7 +245,7 @@ int replace(const std::string& existing, const std::string& replacement, Replace
         return error;
     }
     // The old item that can't go stays under the replacement's old name; the replacement stands.
-    if (status(replacement, oldItem) == 0)
+    if (itemStandsAt(replacement))
         (void)discardItem(replacement);
     return 0;
 }

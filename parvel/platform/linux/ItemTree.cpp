@@ -14,6 +14,7 @@
 
 #include "parvel/foundation/URL.h"
 #include "parvel/platform/linux/FileDescriptor.h"
+#include "parvel/platform/linux/Paths.h"
 #include "parvel/platform/linux/StagingFolder.h"
 
 namespace parvel::host {
@@ -323,9 +324,8 @@ int discardItem(const std::string& path) {
         return errno;
     if (!S_ISDIR(status.st_mode))
         return ::unlink(path.c_str()) == 0 ? 0 : errno;
-    const std::string parent(pathWithoutLastComponent(path));
     int error = 0;
-    const auto staging = StagingFolder::makeIn(stagingParentFor(parent), error);
+    const auto staging = StagingFolder::makeIn(parentFolderOf(path), error);
     if (!staging)
         return error;
     const std::string aside = pathAppending(staging->path(), "discarded");

@@ -69,10 +69,6 @@ bool isStagingName(std::string_view name) {
     return name.starts_with(kStagingPrefix);
 }
 
-std::string stagingParentFor(const std::string& parent) {
-    return parent.empty() ? "." : parent;
-}
-
 std::optional<StagingFolder> StagingFolder::makeIn(const std::string& parent, int& error) {
     clearStale(parent);
     for (int attempt = 0; attempt < kStagingAttempts; ++attempt) {

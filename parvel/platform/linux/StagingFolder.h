@@ -31,10 +31,7 @@ private:
     FileDescriptor m_descriptor;  ///< holds the lock
 };
 
-/// The folder in which an item is staged before it gets a name in `parent`.
-[[nodiscard]] std::string stagingParentFor(const std::string& parent);
-
-/// A staging name, one path component, for somebody else's files.
+/// Whether a name, one path component, is that of a staging folder.
 [[nodiscard]] bool isStagingName(std::string_view name);
 
 }  // namespace parvel::host

@@ -16,7 +16,7 @@
 #include "parvel/foundation/URL.h"
 #include "parvel/platform/linux/FileDescriptor.h"
 #include "parvel/platform/linux/ItemMoves.h"
-#include "parvel/platform/linux/ItemTree.h"
+#include "parvel/platform/linux/Paths.h"
 
 namespace parvel::host {
 
@@ -89,9 +89,7 @@ bool isOwnRealFolder(const std::string& path) {
 std::string topDirectoryOf(const std::string& parent, const Place& place) {
     std::string top = parent;
     while (top != "/") {
-        std::string above(pathWithoutLastComponent(top));
-        if (above.empty())
-            above = "/";
+        std::string above = parentFolderOf(top);
         if (placeOf(above) != place)
             break;
         top = std::move(above);
@@ -213,9 +211,7 @@ int moveInto(const TrashFolder& trash, const std::string& item, const std::strin
 
 /// The item's path with its folder's links resolved: what the info file names.
 std::optional<std::string> resolvedPath(const std::string& item) {
-    std::string parent(pathWithoutLastComponent(item));
-    if (parent.empty())
-        parent = item.starts_with('/') ? "/" : ".";
+    const std::string parent = parentFolderOf(item);
     const std::unique_ptr<char, void (*)(void*)> real(::realpath(parent.c_str(), nullptr),
                                                       &std::free);
     if (!real)
@@ -254,8 +250,7 @@ int trashItem(const std::string& item, std::string& resulting) {
     const bool isAtHome = homeError == 0 && placeOf(home.path) == place;
     if (!isAtHome) {
         // An item may be the top of its own mount; then only a copy can trash it.
-        const std::string parent(pathWithoutLastComponent(*absolute));
-        const std::string folder = parent.empty() ? "/" : parent;
+        const std::string folder = parentFolderOf(*absolute);
         if (placeOf(folder) == place) {
             const auto trash = volumeTrash(topDirectoryOf(folder, *place));
             if (trash && moveInto(*trash, item, *absolute, resulting) == 0)

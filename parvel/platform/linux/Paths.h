@@ -1,0 +1,23 @@
+#pragma once
+
+#include <sys/stat.h>
+
+#include <string>
+
+#include "parvel/foundation/URL.h"
+
+namespace parvel::host {
+
+/// The folder that an item stands in, as a path that can be opened.
+inline std::string parentFolderOf(const std::string& path) {
+    const std::string_view parent = pathWithoutLastComponent(path);
+    return parent.empty() ? std::string(path.starts_with('/') ? "/" : ".") : std::string(parent);
+}
+
+/// Whether anything stands at the path, a dangling link included.
+inline bool itemStandsAt(const std::string& path) {
+    struct stat status {};
+    return ::lstat(path.c_str(), &status) == 0;
+}
+
+}  // namespace parvel::host

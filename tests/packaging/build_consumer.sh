@@ -1,0 +1,34 @@
+#!/bin/bash
+# build_consumer.sh BUILD COMPILER LIBDIR: installs the build to a scratch prefix, moves the prefix,
+# and there builds and runs a small program by the CMake package and by pkg-config.
+set -euo pipefail
+build=$1 compiler=$2 libdir=$3
+consumer=$(cd "$(dirname "$0")" && pwd)/consumer
+scratch=$(mktemp -d)
+trap 'rm -rf "$scratch"' EXIT
+
+cmake --install "$build" --prefix "$scratch/installed" >/dev/null
+# Nothing installed may hold on to the place that it was installed to.
+prefix=$scratch/prefix
+mv "$scratch/installed" "$prefix"
+
+echo "== no installed header names another library's types"
+if grep -rnE '\b(zip_t|zip_file|libdeflate_|xml(Doc|Node|Char|SAX)|icu::|U(ErrorCode|Char)|EVP_|sd_)' \
+    "$prefix/include"; then
+    exit 1
+fi
+
+echo "== CMake package"
+cmake -S "$consumer" -B "$scratch/cmake" -G Ninja -DCMAKE_CXX_COMPILER="$compiler" \
+    -DCMAKE_PREFIX_PATH="$prefix" >/dev/null
+cmake --build "$scratch/cmake"
+"$scratch/cmake/consumer"
+
+echo "== pkg-config"
+export PKG_CONFIG_PATH=$prefix/$libdir/pkgconfig
+read -ra flags <<<"$(pkg-config --cflags --libs ParvelFoundation)"
+"$compiler" -std=c++20 "$consumer/main.cpp" -o "$scratch/consumer" "${flags[@]}"
+LD_LIBRARY_PATH=$prefix/$libdir "$scratch/consumer"
+
+echo "== SONAME"
+readelf -d "$prefix/$libdir/libParvelFoundation.so" | grep -E 'SONAME.*libParvelFoundation\.so\.[0-9]+'

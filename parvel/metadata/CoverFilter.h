@@ -28,7 +28,10 @@ struct PV_EXPORT CoverFilter {
     [[nodiscard]] bool refuses(const Data& data) const;
 };
 
-/// Sets the filter of the whole process; call it before records are made.
+/// Sets the filter of the whole process; call it before records are made, never beside another
+/// thread that makes them.
 PV_EXPORT void setCoverFilter(CoverFilter filter);
+/// The filter in force.
+[[nodiscard]] const CoverFilter& coverFilter();
 
 }  // namespace parvel

@@ -47,7 +47,14 @@ enum PVAssetMetadataFlavor : std::int64_t {
 /// it is absent; the pointer is good until that entry changes. Booleans read false and unsigned
 /// numbers 0 when absent.
 class PV_EXPORT PVAssetMetadata {
+protected:
+    /// What the constructors take, so that the library alone can call them.
+    struct Construction {
+        explicit Construction() = default;
+    };
+
 public:
+    explicit PVAssetMetadata(Construction);
     /// The base class's initialiser ignores its arguments: the record stays empty.
     static std::shared_ptr<PVAssetMetadata> initWithURL_dictionary_validate(
         const std::optional<URL>& url, const Dictionary* dictionary, bool validate);
@@ -128,7 +135,7 @@ public:
     [[nodiscard]] const Value* updateDate() const;
     [[nodiscard]] const Value* modificationDate() const;
     [[nodiscard]] const Value* releaseDate() const;
-    /// Now, at each call, when absent.
+    /// Now, at each call, when absent. What is stored and no number reads as 0 seconds.
     [[nodiscard]] Date insertionDate() const;
     [[nodiscard]] const Value* genre() const;
     [[nodiscard]] const Value* assetDescription() const;
@@ -181,6 +188,7 @@ public:
     [[nodiscard]] bool isBook() const;
     /// An EPUB (never a "folium" package) whose producer begins with "Folium Author".
     [[nodiscard]] bool isRMT() const;
+    /// These four go by the record's URL alone: a kind cached before that URL is not asked.
     [[nodiscard]] std::optional<URL> bazaarMetadataURL() const;
     [[nodiscard]] std::optional<URL> bazaarMetadataBackupURL() const;
     [[nodiscard]] std::optional<URL> bazaarArtworkURL() const;
@@ -233,8 +241,6 @@ public:
     [[nodiscard]] String description() const;
 
 protected:
-    PVAssetMetadata();
-
     [[nodiscard]] const Value* stored(std::string_view key) const;
     /// The dictionary, for the setters of the mutable class.
     [[nodiscard]] Dictionary& mutableDictionary() { return *m_backingDictionary; }

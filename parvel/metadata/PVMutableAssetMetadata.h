@@ -9,6 +9,7 @@ namespace parvel {
 /// says otherwise. Owned by one thread until it is handed out.
 class PV_EXPORT PVMutableAssetMetadata : public PVAssetMetadata {
 public:
+    explicit PVMutableAssetMetadata(Construction construction) : PVAssetMetadata(construction) {}
     /// Over a copy of the dictionary. Without `validate` the URL is not kept: such a record's URL
     /// comes from "path" alone, so that copies and update records acquire none. Deliberate. With
     /// it, the generation count, store ID, source URL and display name are made sound, and a record
@@ -77,9 +78,6 @@ public:
     void setRating(std::optional<Number> rating);
     /// Does nothing: thumbnails are not kept in the record. Deliberate.
     void setThumbnail(const Data* image);
-
-protected:
-    PVMutableAssetMetadata();
 
 private:
     void store(std::string_view key, std::optional<Value> value);

@@ -10,10 +10,11 @@
 
 namespace parvel {
 
-/// MD5 (RFC 1321) over bytes that come in pieces.
+/// MD5 (RFC 1321) over bytes that come in pieces, and SHA-256 (FIPS 180-4) over bytes at hand.
 class Digest {
 public:
     using MD5 = std::array<std::uint8_t, 16>;
+    using SHA256 = std::array<std::uint8_t, 32>;
 
     /// One digest in the making, for one thread.
     class Running {
@@ -27,6 +28,8 @@ public:
     virtual ~Digest() = default;
     /// None where the host refuses the algorithm.
     [[nodiscard]] virtual std::unique_ptr<Running> beginMD5() = 0;
+    /// None when any step failed.
+    [[nodiscard]] virtual std::optional<SHA256> sha256(const Data& data) = 0;
 
     static Digest& host();
 };

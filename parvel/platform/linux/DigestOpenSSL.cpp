@@ -41,6 +41,17 @@ public:
         return std::make_unique<RunningDigestOpenSSL>(m_md5);
     }
 
+    std::optional<SHA256> sha256(const Data& data) override {
+        const std::unique_ptr<EVP_MD_CTX, DigestContextDeleter> context(EVP_MD_CTX_new());
+        bool isSound = context && EVP_DigestInit_ex(context.get(), EVP_sha256(), nullptr) == 1;
+        for (const Data::Bytes bytes : data.ranges())
+            isSound = isSound && EVP_DigestUpdate(context.get(), bytes.data(), bytes.size()) == 1;
+        SHA256 digest{};
+        if (!isSound || EVP_DigestFinal_ex(context.get(), digest.data(), nullptr) != 1)
+            return std::nullopt;
+        return digest;
+    }
+
 private:
     // Looked up once, which is most of a short digest's cost, and kept for the process's life.
     const EVP_MD* const m_md5 = EVP_MD_fetch(nullptr, "MD5", nullptr);

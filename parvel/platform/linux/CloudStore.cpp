@@ -105,12 +105,12 @@ bool holdsPlaceholder(host::FileDescriptor folder, int levels, int& entriesLeft)
     return false;
 }
 
-bool exists(const std::string& path) {
+bool isThere(const std::string& path) {
     return host::retried([&] { return ::access(path.c_str(), F_OK); }) == 0;
 }
 
 /// The folder that the item stands in, which is not the one that a link leads to.
-std::string folderOf(const std::string& path) {
+std::string parentFolderOf(const std::string& path) {
     const std::size_t slash = path.rfind('/');
     if (slash == std::string::npos)
         return ".";
@@ -133,10 +133,10 @@ public:
     bool isPromisedItemReachable(const URL& url, ErrorOut error) override {
         if (!url.isFileURL())
             return fail(error, makeServiceError(ENOENT, url));
-        if (exists(url.path()))
+        if (isThere(url.path()))
             return true;
         const int errnoValue = errno;
-        return exists(placeholderPath(url)) || fail(error, makeServiceError(errnoValue, url));
+        return isThere(placeholderPath(url)) || fail(error, makeServiceError(errnoValue, url));
     }
 
     bool downloadingStatus(const URL& url, std::optional<DownloadingStatus>& status,
@@ -152,7 +152,7 @@ public:
     }
 
     std::optional<URL> placeholderFile(const URL& url) override {
-        if (!url.isFileURL() || exists(url.path()) || !exists(placeholderPath(url)))
+        if (!url.isFileURL() || isThere(url.path()) || !isThere(placeholderPath(url)))
             return std::nullopt;
         return URL::fileURLWithPath(placeholderPath(url));
     }
@@ -164,14 +164,15 @@ private:
             errno = ENOENT;
             return std::nullopt;
         }
-        host::FileDescriptor folder = openFolder(AT_FDCWD, folderOf(url.path()).c_str(), O_PATH);
+        host::FileDescriptor folder =
+            openFolder(AT_FDCWD, parentFolderOf(url.path()).c_str(), O_PATH);
         if (!folder)
             return std::nullopt;
         return liesBelowSyncedRoot(std::move(folder));
     }
 
     static bool hasAllContent(const URL& url) {
-        if (!exists(url.path()))
+        if (!isThere(url.path()))
             return false;
         int entriesLeft = mostEntries;
         return !holdsPlaceholder(openFolder(AT_FDCWD, url.path().c_str(), O_RDONLY), mostLevels,

@@ -1,0 +1,50 @@
+#pragma once
+
+#include <zip.h>
+
+#include <array>
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+
+namespace parvel::host {
+
+struct DiscardLibzip {
+    void operator()(zip_t* archive) const { zip_discard(archive); }
+};
+using LibzipHandle = std::unique_ptr<zip_t, DiscardLibzip>;
+
+/// Lets libzip read an open file by its descriptor, which stays its owner's. Opening reads no more
+/// than a budget: libzip takes the whole directory into memory, and weighs all that looks like one.
+class LibzipSource {
+public:
+    LibzipSource(int file, std::uint64_t fileSize) : m_file(file), m_fileSize(fileSize) {}
+    LibzipSource(const LibzipSource&) = delete;
+    LibzipSource& operator=(const LibzipSource&) = delete;
+
+    /// Null when libzip does not take the file for an archive. The source must outlive the handle.
+    [[nodiscard]] LibzipHandle open(std::uint64_t budget);
+
+private:
+    static zip_int64_t command(void* source, void* data, zip_uint64_t length,
+                               zip_source_cmd_t command);
+    [[nodiscard]] zip_int64_t read(std::uint8_t* data, std::uint64_t length);
+    [[nodiscard]] zip_int64_t seek(void* data, std::uint64_t length);
+    [[nodiscard]] zip_int64_t readAhead();
+    [[nodiscard]] zip_int64_t readAt(std::uint64_t position, std::uint8_t* data,
+                                     std::uint64_t length);
+    [[nodiscard]] zip_int64_t fail(int zipError, int errnoValue);
+
+    int m_file;
+    std::uint64_t m_fileSize;
+    std::uint64_t m_position = 0;
+    std::uint64_t m_budget = 0;
+    bool m_isOpening = false;
+    zip_error_t m_error = {};
+
+    std::array<std::uint8_t, 4096> m_ahead;  ///< libzip reads a directory in pieces of a few bytes
+    std::uint64_t m_aheadPosition = 0;
+    std::size_t m_aheadLength = 0;
+};
+
+}  // namespace parvel::host

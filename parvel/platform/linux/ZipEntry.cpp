@@ -1,0 +1,76 @@
+#include "parvel/platform/linux/ZipEntry.h"
+
+#include <libdeflate.h>
+#include <sys/stat.h>
+
+#include <algorithm>
+
+namespace parvel::host {
+
+namespace {
+
+constexpr std::uint16_t storedMethod = 0;
+constexpr std::uint16_t deflatedMethod = 8;
+/// Made-by systems whose external attributes hold a Unix mode in their upper half.
+constexpr std::uint8_t unixSystem = 3;
+constexpr std::uint8_t darwinSystem = 19;
+constexpr int modeShift = 16;
+
+constexpr std::uint64_t largestWholeEntry = 32ULL << 20;
+/// A deflate stream gives at most 258 bytes for two of its bits, so no honest entry claims more;
+/// tiny ones need no allowance.
+constexpr std::uint64_t mostBytesPerByte = 1032;
+
+bool isLinkOrFolder(const ZipEntry& entry) {
+    if (entry.hostSystem != unixSystem && entry.hostSystem != darwinSystem)
+        return false;
+    const mode_t mode = entry.externalAttributes >> modeShift;
+    return S_ISLNK(mode) || S_ISDIR(mode);
+}
+
+bool canGiveItsSize(const ZipEntry& entry) {
+    if (entry.method == storedMethod)
+        return entry.size == entry.compressedSize;
+    return entry.method == deflatedMethod &&
+           entry.size / mostBytesPerByte <= entry.compressedSize &&
+           entry.size <= entry.compressedSize * mostBytesPerByte;
+}
+
+}  // namespace
+
+bool ZipEntry::isLarge() const {
+    return size > largestWholeEntry || compressedSize > largestWholeEntry;
+}
+
+bool canBeDelivered(const ZipEntry& entry, std::uint64_t limit) {
+    return !entry.isEncrypted && !isLinkOrFolder(entry) && entry.size <= limit &&
+           canGiveItsSize(entry);
+}
+
+ZipDecoder::ZipDecoder() = default;
+ZipDecoder::~ZipDecoder() = default;
+
+void ZipDecoder::Release::operator()(libdeflate_decompressor* decompressor) const {
+    libdeflate_free_decompressor(decompressor);
+}
+
+std::optional<Data> ZipDecoder::decode(const ZipEntry& entry, Data::Bytes stored) {
+    auto content = std::make_unique_for_overwrite<std::uint8_t[]>(entry.size);
+    if (entry.method == storedMethod) {
+        std::copy(stored.begin(), stored.end(), content.get());
+    } else if (!stored.empty()) {
+        if (!m_decompressor)
+            m_decompressor.reset(libdeflate_alloc_decompressor());
+        if (!m_decompressor)
+            throw std::bad_alloc();
+        // No place for the actual size: anything but the whole size is a failure.
+        if (libdeflate_deflate_decompress(m_decompressor.get(), stored.data(), stored.size(),
+                                          content.get(), entry.size, nullptr) != LIBDEFLATE_SUCCESS)
+            return std::nullopt;
+    }
+    if (libdeflate_crc32(0, content.get(), entry.size) != entry.crc)
+        return std::nullopt;
+    return Data::adopt(std::move(content), entry.size);
+}
+
+}  // namespace parvel::host

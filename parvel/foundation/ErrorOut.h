@@ -1,5 +1,6 @@
 #pragma once
 
+#include <concepts>
 #include <memory>
 #include <optional>
 #include <utility>
@@ -21,8 +22,14 @@ inline void assign(ErrorOut error, std::optional<Error> value) {
 
 /// What `fail` returns: "none" or false, whichever the operation gives.
 struct Failure {
-    operator bool() const { return false; }
+    /// To bool and to nothing that a bool converts to: an optional number would else hold a 0.
+    template <std::same_as<bool> Flag>
+    operator Flag() const {
+        return false;
+    }
     operator std::nullopt_t() const { return std::nullopt; }
+    /// Better than the optional's own conversion, which would make an optional that holds false.
+    operator std::optional<bool>() && { return std::nullopt; }
     template <class T>
     operator std::optional<T>() const {
         return std::nullopt;

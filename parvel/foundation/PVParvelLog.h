@@ -78,7 +78,7 @@ private:
 
 /// The library's log handle: subsystem "com.kestrel.PVAgentService", category "Parvel". The level
 /// is tested before any argument is described; a level that is off costs one relaxed load.
-class PV_EXPORT ParvelLog {
+class ParvelLog {
 public:
     static constexpr std::string_view subsystem = "com.kestrel.PVAgentService";
     static constexpr std::string_view category = "Parvel";
@@ -118,10 +118,10 @@ private:
             [](const void* object) { return logText(*static_cast<const A*>(object)); }}...};
         write(LogLine{level, subsystem, category, text, list});
     }
-    static void write(const LogLine& line);
+    PV_EXPORT static void write(const LogLine& line);
 
     /// The least level that any sink wants.
-    static std::atomic<int> s_threshold;
+    PV_EXPORT static std::atomic<int> s_threshold;
 };
 
 /// The library's one log handle.

@@ -56,6 +56,8 @@ public:
                                                                          ErrorOut error);
     static MutableAssetPtr _eBook_metadataForAssetAtURL_preloadedMetadata_includeCover_error(
         const URL& url, const AssetPtr& preloadedMetadata, bool includeCover, ErrorOut error);
+    static MutableAssetPtr _audiobook_metadataForAssetAtURL_preloadedMetadata_includeCover_error(
+        const URL& url, const AssetPtr& preloadedMetadata, bool includeCover, ErrorOut error);
     /// The record that the asset's extended attributes hold: with little but its URL where it has
     /// none. None for an extension of no kind. A failed attribute read leaves the record without
     /// them.

@@ -43,6 +43,11 @@ public:
     /// trash, or its volume's own. `resulting` is its place there.
     virtual bool trashItem(const URL& item, std::optional<URL>* resulting,
                            ErrorOut error = nullptr) = 0;
+    /// Moves a local item into synchronised storage (true), where the destination must lie, or a
+    /// synchronised one out of it (false). ENOTSUP where the destination lies in no such storage;
+    /// ETIMEDOUT, with nothing touched, where the item's content is not on this device.
+    virtual bool setUbiquitous(bool ubiquitous, const URL& item, const URL& destination,
+                               ErrorOut error = nullptr) = 0;
 
     /// A new default service.
     static std::shared_ptr<FileSystemService> makeDefault();
@@ -72,6 +77,10 @@ public:
     }
     bool trashItem(const URL& item, std::optional<URL>* resulting, ErrorOut error) override {
         return m_target->trashItem(item, resulting, error);
+    }
+    bool setUbiquitous(bool ubiquitous, const URL& item, const URL& destination,
+                       ErrorOut error) override {
+        return m_target->setUbiquitous(ubiquitous, item, destination, error);
     }
 
 private:

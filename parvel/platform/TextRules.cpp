@@ -1,5 +1,6 @@
 #include "parvel/platform/TextRules.h"
 
+#include <algorithm>
 #include <cstdint>
 #include <cstring>
 
@@ -93,6 +94,30 @@ std::size_t utf16Length(std::string_view text) {
         length += (isContinuationByte ? 0U : 1U) + (byte >= 0xF0 ? 1U : 0U);
     }
     return length;
+}
+
+std::string utf16Prefix(std::string_view text, std::size_t units) {
+    std::string prefix;
+    std::size_t used = 0;
+    for (std::size_t at = 0; at < text.size() && used < units;) {
+        const std::size_t length = std::max<std::size_t>(sequenceLength(text.substr(at)), 1);
+        const std::size_t taken = length == 4 ? 2 : 1;
+        if (used + taken > units)
+            return prefix + "\xEF\xBF\xBD";
+        prefix.append(text.substr(at, length));
+        used += taken;
+        at += length;
+    }
+    return prefix;
+}
+
+std::string withCollapsedBlanks(std::string_view text) {
+    std::string collapsed;
+    for (const char character : text) {
+        if (character != ' ' || !collapsed.ends_with(' '))
+            collapsed += character;
+    }
+    return collapsed;
 }
 
 }  // namespace parvel

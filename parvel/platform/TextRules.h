@@ -13,6 +13,10 @@ public:
 
     /// Lower case by the Unicode rules of no particular language. Bytes that are no UTF-8 stay.
     [[nodiscard]] virtual std::string lowercased(std::string_view text) = 0;
+    /// The text without what no synchronised storage takes in a file name: unassigned code points,
+    /// punctuation, control and format characters, and `/ \ ? % * | " < > : #`. Low line and
+    /// hyphen-minus stay. Bytes that are no UTF-8 become U+FFFD.
+    [[nodiscard]] virtual std::string withoutForbiddenNameCharacters(std::string_view text) = 0;
 
     static TextRules& host();
 };
@@ -22,5 +26,10 @@ public:
 [[nodiscard]] std::string withReplacedInvalidUTF8(std::string_view text);
 /// The length in UTF-16 units of valid UTF-8 text.
 [[nodiscard]] std::size_t utf16Length(std::string_view text);
+/// The first UTF-16 units of valid UTF-8 text. A cut through a surrogate pair leaves U+FFFD for the
+/// half that stays.
+[[nodiscard]] std::string utf16Prefix(std::string_view text, std::size_t units);
+/// The text with one blank for each run of two or more.
+[[nodiscard]] std::string withCollapsedBlanks(std::string_view text);
 
 }  // namespace parvel

@@ -1,4 +1,8 @@
+#include <cerrno>
+
+#include "parvel/platform/CloudStore.h"
 #include "parvel/platform/FileSystemService.h"
+#include "parvel/platform/Service.h"
 #include "parvel/platform/linux/ItemMoves.h"
 #include "parvel/platform/linux/ItemTree.h"
 #include "parvel/platform/linux/Paths.h"
@@ -12,6 +16,13 @@ namespace {
 /// destination where the new item can't be made.
 Error makeTransferError(int errnoValue, const URL& source, const URL& destination) {
     return makeServiceError(errnoValue, host::itemStandsAt(source.path()) ? destination : source);
+}
+
+/// Moving a file that only stands for a book does not move the book.
+bool isNotDownloaded(const URL& item) {
+    std::optional<DownloadingStatus> status;
+    return Service<CloudStore>::current().downloadingStatus(item, status) &&
+           status == DownloadingStatus::NotDownloaded;
 }
 
 class LinuxFileSystemService : public FileSystemService {
@@ -42,11 +53,18 @@ public:
     }
 
     bool removeItem(const URL& item, ErrorOut error) override {
-        const int failure = host::discardItem(item.path());
+        int failure = host::discardItem(item.path());
+        // What stands for an item that is not on this device goes without a download.
+        if (failure == ENOENT) {
+            if (const auto placeholder = Service<CloudStore>::current().placeholderFile(item))
+                failure = host::discardItem(placeholder->path());
+        }
         return failure == 0 || fail(error, makeServiceError(failure, item));
     }
 
     bool trashItem(const URL& item, std::optional<URL>* resulting, ErrorOut error) override {
+        if (isNotDownloaded(item))
+            return fail(error, makePOSIXError(ETIMEDOUT, item));
         std::string place;
         const int failure = host::trashItem(item.path(), place);
         if (failure != 0)
@@ -54,6 +72,15 @@ public:
         if (resulting)
             *resulting = URL::fileURLWithPath(place);
         return true;
+    }
+
+    bool setUbiquitous(bool ubiquitous, const URL& item, const URL& destination,
+                       ErrorOut error) override {
+        if (ubiquitous && !Service<CloudStore>::current().isUbiquitous(destination).value_or(false))
+            return fail(error, makePOSIXError(ENOTSUP, destination));
+        if (!ubiquitous && isNotDownloaded(item))
+            return fail(error, makePOSIXError(ETIMEDOUT, item));
+        return moveItem(item, destination, error);
     }
 };
 

@@ -2,6 +2,8 @@
 
 #include <unicode/bytestream.h>
 #include <unicode/casemap.h>
+#include <unicode/uniset.h>
+#include <unicode/unistr.h>
 
 #include <algorithm>
 #include <limits>
@@ -27,7 +29,35 @@ public:
         return U_SUCCESS(status) ? lower : lowercasedASCII(text);
     }
 
+    std::string withoutForbiddenNameCharacters(std::string_view text) override {
+        const icu::UnicodeSet& forbidden = forbiddenNameCharacters();
+        const icu::UnicodeString characters = icu::UnicodeString::fromUTF8(
+            icu::StringPiece(text.data(), static_cast<int32_t>(text.size())));
+        icu::UnicodeString kept;
+        for (int32_t at = 0; at < characters.length(); at = characters.moveIndex32(at, 1)) {
+            const UChar32 character = characters.char32At(at);
+            if (!forbidden.contains(character))
+                kept.append(character);
+        }
+        std::string result;
+        return kept.toUTF8String(result);
+    }
+
 private:
+    /// Built once: what is illegal in text, punctuation, control and format characters, and twelve
+    /// by name. The hyphen-minus is added and, with the low line, taken out again. Deliberate.
+    static const icu::UnicodeSet& forbiddenNameCharacters() {
+        static const icu::UnicodeSet set = [] {
+            UErrorCode status = U_ZERO_ERROR;
+            icu::UnicodeSet made(UNICODE_STRING_SIMPLE("[[:Cn:][:P:][:Cc:][:Cf:]]"), status);
+            made.addAll(UNICODE_STRING_SIMPLE("/\\?%*|\"<>:-#"));
+            made.removeAll(UNICODE_STRING_SIMPLE("_-"));
+            made.freeze();
+            return made;
+        }();
+        return set;
+    }
+
     static std::string lowercasedASCII(std::string_view text) {
         std::string lower(text);
         for (char& character : lower) {

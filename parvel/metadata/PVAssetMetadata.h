@@ -48,7 +48,7 @@ enum PVAssetMetadataFlavor : std::int64_t {
 /// numbers 0 when absent.
 class PV_EXPORT PVAssetMetadata {
 protected:
-    /// What the constructors take, so that the library alone can call them.
+    /// Taken by the constructors, so that the library alone can call them.
     struct Construction {
         explicit Construction() = default;
     };

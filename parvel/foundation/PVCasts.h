@@ -25,6 +25,10 @@ struct ProtocolOf {};
 template <class P>
 inline constexpr ProtocolOf<P> protocolOf{};
 
+/// T as const as the object that it is cast from.
+template <class T, class U>
+using AsConstAs = std::conditional_t<std::is_const_v<U>, const T, T>;
+
 /// Whether a kind of Value conforms to a protocol. It does only where this is specialised.
 template <class Kind, class P>
 inline constexpr bool conformsTo = false;
@@ -35,8 +39,9 @@ template <class T>
     return object ? object->as<T>() : nullptr;
 }
 template <class T, class U>
-[[nodiscard]] std::shared_ptr<T> PVDynamicCast(ClassOf<T>, const std::shared_ptr<U>& object) {
-    return std::dynamic_pointer_cast<T>(object);
+[[nodiscard]] std::shared_ptr<AsConstAs<T, U>> PVDynamicCast(ClassOf<T>,
+                                                             const std::shared_ptr<U>& object) {
+    return std::dynamic_pointer_cast<AsConstAs<T, U>>(object);
 }
 
 /// Passes when the object conforms to the protocol.
@@ -80,18 +85,18 @@ template <class P, class U>
 template <class T, class... P>
 [[nodiscard]] const T* PVClassAndProtocolCast(const Value* object, ClassOf<T> type,
                                               std::size_t count, ProtocolOf<P>... protocols) {
-    std::size_t tested = 0;
+    [[maybe_unused]] std::size_t tested = 0;
     const T* cast = PVDynamicCast(type, object);
     const bool conforms =
         cast && ((tested++ >= count || PVProtocolCast(protocols, object) != nullptr) && ...);
     return conforms ? cast : nullptr;
 }
 template <class T, class U, class... P>
-[[nodiscard]] std::shared_ptr<T> PVClassAndProtocolCast(const std::shared_ptr<U>& object,
-                                                        ClassOf<T> type, std::size_t count,
-                                                        ProtocolOf<P>... protocols) {
-    std::size_t tested = 0;
-    std::shared_ptr<T> cast = PVDynamicCast(type, object);
+[[nodiscard]] std::shared_ptr<AsConstAs<T, U>> PVClassAndProtocolCast(
+    const std::shared_ptr<U>& object, ClassOf<T> type, std::size_t count,
+    ProtocolOf<P>... protocols) {
+    [[maybe_unused]] std::size_t tested = 0;
+    std::shared_ptr<AsConstAs<T, U>> cast = PVDynamicCast(type, object);
     const bool conforms =
         cast && ((tested++ >= count || PVProtocolCast(protocols, object) != nullptr) && ...);
     return conforms ? cast : nullptr;
@@ -102,10 +107,11 @@ template <class T, class U, class... P>
     return reference && reference->typeID() == type ? reference : nullptr;
 }
 
-/// What a polymorphic object says of its own kind, for PVRefTypeCast over shared pointers.
+/// Passes when the object is of exactly the given class, not of a subclass.
 template <class U>
 [[nodiscard]] std::shared_ptr<U> PVRefTypeCast(const std::type_info& type,
                                                const std::shared_ptr<U>& reference) {
+    static_assert(std::is_polymorphic_v<U>, "only a polymorphic object knows its run-time class");
     return reference && typeid(*reference) == type ? reference : nullptr;
 }
 

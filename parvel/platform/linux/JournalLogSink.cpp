@@ -24,25 +24,40 @@ char journalPriority(LogLevel level) {
     return '2';
 }
 
+/// Gives the caller's errno back; who logs a failure may read it after the line.
+class KeptErrno {
+public:
+    KeptErrno() = default;
+    ~KeptErrno() { errno = m_value; }
+    KeptErrno(const KeptErrno&) = delete;
+    KeptErrno& operator=(const KeptErrno&) = delete;
+
+private:
+    const int m_value = errno;
+};
+
+/// Without a journal sd_journal_sendv succeeds and does nothing, after the line was put together.
+bool hasJournal() {
+    const KeptErrno kept;
+    return access("/run/systemd/journal/socket", W_OK) == 0;
+}
+
 class JournalLogSink final : public LogSink {
 public:
     void write(const LogLine& line) override {
         if (!m_hasJournal)
             return;
-        const int callersErrno = errno;
+        const KeptErrno kept;
         std::array<std::string, 4> fields = journalFields(line);
         std::array<iovec, 4> list;
         for (std::size_t i = 0; i < fields.size(); ++i)
             list[i] = {fields[i].data(), fields[i].size()};
         // A line that can't be delivered is lost; logging never fails an operation.
         static_cast<void>(sd_journal_sendv(list.data(), static_cast<int>(list.size())));
-        errno = callersErrno;
     }
 
 private:
-    // Without a journal sd_journal_sendv succeeds and does nothing, after the line was put
-    // together.
-    const bool m_hasJournal = access("/run/systemd/journal/socket", W_OK) == 0;
+    const bool m_hasJournal = hasJournal();
 };
 
 }  // namespace

@@ -1,4 +1,4 @@
-#include "parvel/platform/DateText.h"
+#include "parvel/platform/linux/DateTextICU.h"
 
 #include <unicode/datefmt.h>
 #include <unicode/locid.h>
@@ -7,7 +7,6 @@
 
 #include <cmath>
 #include <cstdlib>
-#include <cstring>
 #include <memory>
 #include <mutex>
 
@@ -16,23 +15,17 @@ namespace {
 
 constexpr double kMillisecondsASecond = 1000;
 
-/// The user's locale for times, looked up as POSIX has it. ICU's own default looks at LC_MESSAGES.
-icu::Locale userTimeLocale() {
-    for (const char* name : {"LC_ALL", "LC_TIME", "LANG"}) {
-        const char* value = std::getenv(name);
-        if (!value || *value == '\0')
-            continue;
-        const std::string_view language =
-            std::string_view(value).substr(0, std::strcspn(value, ".@"));
-        if (language == "C" || language == "POSIX")
-            break;
-        return icu::Locale::createCanonical(value);
-    }
-    return icu::Locale::createCanonical("en_US_POSIX");
+icu::Locale localeNamed(const std::string& name) {
+    const std::string_view language = std::string_view(name).substr(0, name.find_first_of(".@"));
+    const bool isCLocale = language == "C" || language == "POSIX";
+    return icu::Locale::createCanonical(isCLocale ? "en_US_POSIX" : name.c_str());
 }
 
 class DateTextICU final : public DateText {
 public:
+    explicit DateTextICU(const icu::Locale& locale)
+        : m_format(icu::DateFormat::createDateInstance(icu::DateFormat::kFullRelative, locale)) {}
+
     std::string stringFromDate(const Date& date) override {
         const std::lock_guard guard(m_lock);
         return formatted(date);
@@ -75,15 +68,28 @@ private:
     }
 
     std::mutex m_lock;  // ICU's formatters are not for several threads at once
-    const std::unique_ptr<icu::DateFormat> m_format{
-        icu::DateFormat::createDateInstance(icu::DateFormat::kFullRelative, userTimeLocale())};
+    const std::unique_ptr<icu::DateFormat> m_format;
 };
 
 }  // namespace
 
+std::string userTimeLocaleName() {
+    // ICU's own default looks at LC_MESSAGES.
+    for (const char* name : {"LC_ALL", "LC_TIME", "LANG"}) {
+        const char* value = std::getenv(name);
+        if (value && *value != '\0')
+            return value;
+    }
+    return "C";
+}
+
+std::unique_ptr<DateText> makeDateTextICU(const std::string& localeName) {
+    return std::make_unique<DateTextICU>(localeNamed(localeName));
+}
+
 DateText& DateText::host() {
-    static DateTextICU dateText;
-    return dateText;
+    static const std::unique_ptr<DateText> dateText = makeDateTextICU(userTimeLocaleName());
+    return *dateText;
 }
 
 }  // namespace parvel

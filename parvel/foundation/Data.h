@@ -37,6 +37,7 @@ public:
     [[nodiscard]] Bytes contiguous(std::vector<std::uint8_t>& storage) const;
     [[nodiscard]] std::string_view text(std::vector<std::uint8_t>& storage) const;
 
+    /// Of the size and the first bytes.
     [[nodiscard]] std::size_t hash() const;
     /// Equal bytes, however they are cut into ranges.
     PV_EXPORT friend bool operator==(const Data& left, const Data& right);

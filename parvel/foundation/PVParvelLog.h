@@ -3,6 +3,7 @@
 #include <array>
 #include <atomic>
 #include <concepts>
+#include <cstddef>
 #include <memory>
 #include <optional>
 #include <string>
@@ -38,6 +39,7 @@ std::string logText(T number) {
 PV_EXPORT std::string logText(const URL& url);
 /// `Error Domain=D Code=N "reason or description"`.
 PV_EXPORT std::string logText(const Error& error);
+/// A string as it is, any other value as its description.
 PV_EXPORT std::string logText(const Value& value);
 template <class T>
 std::string logText(const T* object) {

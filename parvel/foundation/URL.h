@@ -4,6 +4,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <utility>
 
 #include "parvel/foundation/PVExport.h"
 
@@ -34,11 +35,13 @@ public:
     /// empty where there is none.
     [[nodiscard]] std::string_view pathExtension() const;
 
+    /// The root stays the root.
     [[nodiscard]] URL deletingLastPathComponent() const;
-    /// Appends with exactly one slash between.
+    /// Appends with exactly one slash between. Only a URL that is no file's keeps its query.
     [[nodiscard]] URL appendingPathComponent(std::string_view component) const;
     /// Makes the path absolute and removes `.`, `..` and repeated slashes from its text; `..` above
-    /// the root is dropped. Symbolic links are not followed.
+    /// the root is dropped. Symbolic links are not followed. A relative path starts at the current
+    /// directory; a URL that is no file's stays as it is.
     [[nodiscard]] URL standardized() const;
 
     [[nodiscard]] std::size_t hash() const;
@@ -57,11 +60,11 @@ private:
 /// The same rules over the text of a path or file name.
 PV_EXPORT std::string_view lastComponentOfPath(std::string_view path);
 PV_EXPORT std::string_view extensionOfPath(std::string_view path);
-/// The path without its last extension and the dot before it.
+/// The path without its last extension and the dot before it; one that has none stays as it is.
 PV_EXPORT std::string_view pathWithoutExtension(std::string_view path);
-/// The path without its last component; empty for a single component.
+/// The path without its last component; empty for a single component, the root for the root.
 PV_EXPORT std::string_view pathWithoutLastComponent(std::string_view path);
-/// The two joined with exactly one slash; the component alone where the path is empty.
+/// The two joined with exactly one slash; the one alone where the other is empty.
 PV_EXPORT std::string pathAppending(std::string_view path, std::string_view component);
 
 }  // namespace parvel

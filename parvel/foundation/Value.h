@@ -6,6 +6,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <type_traits>
 #include <utility>
 #include <variant>
 #include <vector>
@@ -42,6 +43,7 @@ public:
     Value(String text) : m_storage(std::move(text)) {}
     Value(std::string_view text) : m_storage(String(text)) {}
     Value(const char* text) : m_storage(String(text)) {}
+    Value(std::nullptr_t) = delete;
     Value(Date date) : m_storage(date) {}
     Value(Data data) : m_storage(std::move(data)) {}
     Value(Array array);
@@ -70,8 +72,10 @@ public:
         }
     }
 
+    /// Of a container its size alone, so that hashing never descends.
     [[nodiscard]] std::size_t hash() const;
-    /// Deep equality; numbers compare by value, and values of different kinds are never equal.
+    /// Deep equality, without recursion; numbers compare by value, and values of different kinds
+    /// are never equal.
     PV_EXPORT friend bool operator==(const Value& left, const Value& right);
 
 private:
@@ -143,7 +147,8 @@ private:
 
 /// The value's one-line text for logs: dictionaries as `{key = value; …}`, strings quoted with
 /// `\"`, `\\` and `\n` escaped, data as `<N bytes>`, dates in ISO form (UTC), the null marker as
-/// `<null>`, arrays as `(a, b)`.
+/// `<null>`, arrays as `(a, b)`. A date that has no ISO form prints as its number of seconds, and
+/// containers below the 512th level as `(…)` and `{…}`.
 PV_EXPORT String description(const Value& value);
 PV_EXPORT String description(const Dictionary& dictionary);
 

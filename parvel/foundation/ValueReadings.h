@@ -31,7 +31,8 @@ PV_EXPORT bool boolReading(const Value* value);
 /// Of a number, its value (a negative one wraps); of a string, its 64-bit reading; else 0.
 PV_EXPORT std::uint64_t unsignedReading(const Value* value);
 
-/// Of a number, its value; of a string, its leading decimal number, 0 where there is none; else 0.
+/// Of a number, its value; of a string, its leading decimal number after white space and a sign, 0
+/// where there is none and infinity where it is larger than any real; else 0.
 PV_EXPORT double doubleReading(const Value* value);
 
 }  // namespace parvel

@@ -29,5 +29,25 @@ TEST(ErrorOut, FailingGivesNoneWhateverTheOptionalHolds) {
     EXPECT_EQ(failing<std::unique_ptr<int>>(nullptr), nullptr);
 }
 
+TEST(ErrorOut, AssignCanSetNone) {
+    std::optional<Error> slot = makeMissingURLError();
+    assign(&slot, std::nullopt);
+    assign(nullptr, std::nullopt);
+
+    EXPECT_EQ(slot, std::nullopt);
+}
+
+TEST(ErrorOut, ASlotIsTheCallersOrItsOwn) {
+    std::optional<Error> callers;
+    ErrorSlot asked(&callers);
+    ErrorSlot unasked(nullptr);
+    assign(asked.out(), makeMissingURLError());
+    assign(unasked.out(), makeNoIdentityError());
+
+    EXPECT_EQ(callers, makeMissingURLError());
+    EXPECT_EQ(asked.value(), makeMissingURLError());
+    EXPECT_EQ(unasked.value(), makeNoIdentityError());
+}
+
 }  // namespace
 }  // namespace parvel::testing

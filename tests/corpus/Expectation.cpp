@@ -110,7 +110,7 @@ void compare(const Value& actual, const json& expected, const std::string& root,
 Expectation::Expectation(json row) : m_row(std::make_shared<const json>(std::move(row))) {}
 
 std::vector<Expectation> Expectation::all() {
-    std::ifstream file(PARVEL_CORPUS_EXPECTATIONS);
+    std::ifstream file(PARVEL_CORPUS_TESTS "/expected.json");
     std::vector<Expectation> expectations;
     for (json& row : json::parse(file))
         expectations.push_back(Expectation(std::move(row)));

@@ -111,7 +111,7 @@ def book(package=None, container=None, drop=(), extra=()):
     archive = Zip()
     for name, data in (('mimetype', b'application/epub+zip'),
                        ('META-INF/container.xml', container or (CONTAINER % 'in/book.opf').encode()),
-                       ('in/book.opf', package or opf()), ('in/front.gif', COVER)):
+                       ('in/book.opf', opf() if package is None else package), ('in/front.gif', COVER)):
         if name not in drop:
             archive.add(name, data)
     for name, data in extra:
@@ -192,7 +192,7 @@ def zips():
     unicode_name = b'\1' + struct.pack('<I', zlib.crc32(b'in/fake.opf')) + b'in/book.opf'
     put('zip-unicode-path', book(drop=('in/book.opf',)).add(
         'in/fake.opf', opf(), extra=struct.pack('<HH', 0x7075, len(unicode_name)) + unicode_name).bytes(),
-        'error', 'a name of its own and another in an extra field')
+        'either', 'a name of its own and another in an extra field')
     put('zip-name-nul', book(drop=('in/book.opf',)).add(b'in/book.opf\0.txt', opf()).bytes(), 'error',
         'a name that ends at a NUL')
     put('zip-path-nul', book(container=(CONTAINER % 'in/book.opf&#0;').encode()).bytes(), 'error',
@@ -267,6 +267,9 @@ def xmls():
     p('attributes', opf(more=row * 25000), 'either', '6 million attributes, 250 an element')
     p('names', opf(more=''.join('<n%d a%d=""/>' % (n, n) for n in range(190000))), 'either',
       '190000 names, each of them new')
+    p('names-attributes', opf(more=''.join('<s %s/>' % ' '.join(
+        'k%d=""' % (row * 250 + n) for n in range(250)) for row in range(3000))), 'either',
+      '750000 names of attributes, each of them new')
     deep = ''.join('<s %s>' % ' '.join('xmlns:p%d_%d="u"' % (d, n) for n in range(250)) for d in range(200))
     p('namespaces', opf(more=deep + '<p0_0:t/>' * 190000 + '</s>' * 200), 'either',
       '50000 names in scope, asked 190000 times')

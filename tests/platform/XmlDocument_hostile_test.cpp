@@ -68,6 +68,19 @@ TEST(HostileXml, AttributesAreAcceptedUpToTheLimit) {
     EXPECT_FALSE(isAccepted("<a" + attributes(129) + attributes(128, "xmlns:n", "urn:x") + "/>"));
 }
 
+/// `<a0/><a1/>…`
+std::string differentElements(std::size_t count) {
+    std::string text;
+    for (std::size_t i = 0; i < count; ++i)
+        text += "<a" + std::to_string(i) + "/>";
+    return "<a>" + text + "</a>";
+}
+
+TEST(HostileXml, NamesAreAcceptedUpToTheLimit) {
+    EXPECT_TRUE(isAccepted(differentElements(49'000)));
+    EXPECT_FALSE(isAccepted(differentElements(51'000)));
+}
+
 TEST(HostileXml, VeryManyAttributesAreRefusedInEveryEncoding) {
     for (const std::size_t count : {20'000U, 100'000U}) {
         const std::string many = "<a" + attributes(count) + "/>";

@@ -9,10 +9,14 @@ namespace parvel {
 namespace {
 
 constexpr std::size_t kMaximumElements = 200'000;
+/// Of elements, attributes and prefixes, each counted once: libxml2 takes quadratic time over very
+/// many different names.
+constexpr int kMaximumNames = 50'000;
 /// Of bytes and tree together.
 constexpr std::size_t kMaximumMemory = 224 << 20;
 /// What libxml2 and the allocator take for one.
 constexpr std::size_t kNodeBytes = 128;
+constexpr std::size_t kContentBytes = 32;  ///< besides the content's own length
 constexpr std::size_t kAttributeBytes = 112;
 constexpr std::size_t kNamespaceBytes = 96;
 constexpr std::size_t kNameBytes = 56;
@@ -71,13 +75,13 @@ void XmlTreeParse::text(std::string_view characters) {
 }
 
 void XmlTreeParse::comment(const xmlChar* text) {
-    charge(1, kNodeBytes + lengthOf(text));
+    charge(1, kNodeBytes + kContentBytes + lengthOf(text));
     m_inText = false;
     xmlSAX2Comment(parser(), text);
 }
 
 void XmlTreeParse::processingInstruction(const xmlChar* target, const xmlChar* data) {
-    charge(1, kNodeBytes + lengthOf(data));
+    charge(1, kNodeBytes + kContentBytes + lengthOf(data));
     m_inText = false;
     xmlSAX2ProcessingInstruction(parser(), target, data);
 }
@@ -85,8 +89,9 @@ void XmlTreeParse::processingInstruction(const xmlChar* target, const xmlChar* d
 void XmlTreeParse::charge(std::size_t nodes, std::size_t bytes) {
     m_tree.scope.nodes += nodes;
     m_memory += bytes;
-    const auto names = static_cast<std::size_t>(xmlDictSize(parser()->dict));
-    if (m_memory + names * kNameBytes > kMaximumMemory)
+    const int names = xmlDictSize(parser()->dict);
+    if (names > kMaximumNames ||
+        m_memory + static_cast<std::size_t>(names) * kNameBytes > kMaximumMemory)
         stop();
 }
 

@@ -1,0 +1,19 @@
+#pragma once
+
+namespace parvel::cli {
+
+/// The exit status of an interrupted program.
+inline constexpr int kInterruptedExit = 130;
+
+/// From here on the first interrupt (SIGINT, SIGTERM) only asks for an end, the second one ends the
+/// program at once. A signal that the caller had ignored stays ignored. A closed pipe becomes a
+/// failed write instead of a signal.
+void watchForInterrupts();
+
+/// Whether an end was asked for. Any thread may ask.
+[[nodiscard]] bool interrupted();
+
+/// Waits until the descriptor has something to read; false when an end was asked for meanwhile.
+[[nodiscard]] bool waitForInput(int descriptor);
+
+}  // namespace parvel::cli

@@ -1,0 +1,83 @@
+#include "cli/Messages.h"
+
+#include <cerrno>
+
+#include "cli/TerminalText.h"
+
+namespace parvel::cli {
+namespace {
+
+std::string_view adviceForLibraryError(std::int64_t code) {
+    switch (static_cast<PVParvelFoundationErrorCode>(code)) {
+        case PVParvelFoundationErrorCode::NoAssetType:
+            return "a book ends in .epub or .folium, a document in .pdf, an audiobook in .m4a";
+        case PVParvelFoundationErrorCode::NoAssetID:
+            return "nothing in it or on it says which asset it is";
+        default:
+            return {};
+    }
+}
+
+std::string_view adviceForPOSIXError(std::int64_t code) {
+    switch (code) {
+        case EACCES:
+        case EPERM:
+            return "check the permissions of the file and of the folders above it";
+        case ELOOP:
+            return "symbolic links lead in a circle, or out of the book";
+        case ENOSPC:
+        case EDQUOT:
+            return "make room on the disk and try again";
+        case EMFILE:
+        case ENFILE:
+            return "too many files are open; try with a smaller -j";
+        default:
+            return {};
+    }
+}
+
+std::string_view adviceFor(const Result& result) {
+    const Error& error = *result.error;
+    if (error.domain() == PVParvelFoundationErrorDomain)
+        return adviceForLibraryError(error.code());
+    if (error.domain() == PVPOSIXErrorDomain)
+        return adviceForPOSIXError(error.code());
+    const bool isAbsent = error.domain() == PVFileErrorDomain &&
+                          error.code() == static_cast<std::int64_t>(PVFileErrorCode::NoSuchFile);
+    if (isAbsent && result.path.find('\0') != std::string::npos)
+        return "the name holds a NUL: are the names NUL-ended, so that -0 is needed?";
+    return {};
+}
+
+/// The log's reason says more than the general error of damaged content.
+bool reasonTellsMore(const Result& result) {
+    return !result.reason.empty() && result.error->domain() == PVFileErrorDomain &&
+           result.error->code() == static_cast<std::int64_t>(PVFileErrorCode::Corrupt);
+}
+
+}  // namespace
+
+std::string failureLine(std::string_view command, const Result& result) {
+    std::string line = "parvel: " + std::string(command) + ": " + safeText(result.path) + ": ";
+    if (!result.error) {
+        line += result.nothing;
+        return line + (result.reason.empty() ? "" : ": ") + safeText(result.reason) + "\n";
+    }
+    const Error& error = *result.error;
+    std::string words = reasonTellsMore(result) ? result.reason : error.message();
+    if (words.ends_with('.'))
+        words.pop_back();
+    line += safeText(words);
+    line += " (" + safeText(error.domain()) + " " + std::to_string(error.code()) + ")";
+    const std::string_view advice = adviceFor(result);
+    return line + (advice.empty() ? "" : "; ") + std::string(advice) + "\n";
+}
+
+std::string problemLine(std::string_view command, std::string_view problem) {
+    std::string line = "parvel: ";
+    if (!command.empty())
+        line += std::string(command) + ": ";
+    return line + safeText(problem) + "\n";
+}
+
+}  // namespace parvel::cli

@@ -1,0 +1,68 @@
+#include "cli/Output.h"
+
+#include <cerrno>
+#include <cstring>
+
+#include <sys/stat.h>
+#include <unistd.h>
+
+namespace parvel::cli {
+namespace {
+
+constexpr std::size_t kFull = 64 * 1024;
+
+/// The errno of the write that failed, else 0.
+int writeAll(int descriptor, std::string_view text) {
+    while (!text.empty()) {
+        const ssize_t written = write(descriptor, text.data(), text.size());
+        if (written >= 0)
+            text.remove_prefix(static_cast<std::size_t>(written));
+        else if (errno != EINTR)
+            return errno;
+    }
+    return 0;
+}
+
+bool isRegularFile(int descriptor) {
+    struct stat status {};
+    return fstat(descriptor, &status) == 0 && S_ISREG(status.st_mode);
+}
+
+}  // namespace
+
+Output::Output(int descriptor)
+    : m_descriptor(descriptor), m_isRegularFile(isRegularFile(descriptor)) {}
+
+void Output::append(std::string_view text) {
+    if (failed())
+        return;
+    m_buffer += text;
+    if (m_buffer.size() >= kFull)
+        flush();
+}
+
+void Output::flushForReader() {
+    if (!m_isRegularFile)
+        flush();
+}
+
+void Output::flush() {
+    if (!failed())
+        m_errno = writeAll(m_descriptor, m_buffer);
+    m_buffer.clear();
+}
+
+bool Output::finish(std::string_view command) {
+    flush();
+    if (failed() && m_errno != EPIPE)
+        writeToStandardError("parvel: " + std::string(command) +
+                             ": standard output: " + strerrordesc_np(m_errno) + "\n");
+    return !failed();
+}
+
+void writeToStandardError(std::string_view text) {
+    // Nobody is left to tell when standard error itself fails.
+    static_cast<void>(writeAll(STDERR_FILENO, text));
+}
+
+}  // namespace parvel::cli

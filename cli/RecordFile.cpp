@@ -1,0 +1,96 @@
+#include "cli/RecordFile.h"
+
+#include <cerrno>
+#include <cstring>
+#include <optional>
+
+#include <fcntl.h>
+#include <unistd.h>
+
+#include "cli/JsonReader.h"
+#include "parvel/foundation/PropertyList.h"
+
+namespace parvel::cli {
+namespace {
+
+/// The whole file; none with errno set.
+std::optional<std::string> contentsOf(const std::string& path) {
+    static constexpr std::size_t piece = 256 * 1024;
+    const int descriptor = open(path.c_str(), O_RDONLY | O_CLOEXEC);
+    if (descriptor < 0)
+        return std::nullopt;
+    std::string contents;
+    ssize_t count = 0;
+    do {
+        const std::size_t size = contents.size();
+        contents.resize(size + piece);
+        count = read(descriptor, contents.data() + size, piece);
+        contents.resize(size + (count > 0 ? static_cast<std::size_t>(count) : 0));
+    } while (count > 0 || (count < 0 && errno == EINTR));
+    const int readErrno = errno;
+    close(descriptor);
+    errno = readErrno;
+    return count < 0 ? std::nullopt : std::optional(std::move(contents));
+}
+
+/// A property list of either form begins with what JSON can't begin with.
+bool looksLikePropertyList(std::string_view text) {
+    if (text.starts_with("bplist") || text.starts_with("\xFE\xFF") || text.starts_with("\xFF\xFE"))
+        return true;
+    if (text.starts_with("\xEF\xBB\xBF"))
+        text.remove_prefix(3);
+    const std::size_t begin = text.find_first_not_of(" \t\r\n");
+    return begin != std::string_view::npos && text[begin] == '<';
+}
+
+std::optional<Value> valueOf(const std::string& contents, std::string& problem) {
+    if (looksLikePropertyList(contents)) {
+        std::optional<Value> value = valueFromPropertyList(Data::copyOf(contents));
+        if (!value)
+            problem = "a damaged property list";
+        return value;
+    }
+    try {
+        return valueFromJson(contents);
+    } catch (const JsonError& error) {
+        problem = std::string("neither a property list nor JSON: ") + error.what();
+        return std::nullopt;
+    }
+}
+
+bool isResult(const Dictionary& dictionary) {
+    return dictionary.contains("path") && dictionary.contains("assetType") &&
+           (dictionary.contains("record") || dictionary.contains("error"));
+}
+
+/// The dictionary, or a result's record; null with the reason.
+const Dictionary* recordIn(const Value& value, std::string& problem) {
+    const Array* array = value.as<Array>();
+    const Value& only = array && array->size() == 1 ? (*array)[0] : value;
+    const Dictionary* dictionary = only.as<Dictionary>();
+    if (!dictionary)
+        problem = "neither one record nor one result";
+    if (!dictionary || !isResult(*dictionary))
+        return dictionary;
+    const Value* record = dictionary->find("record");
+    const Dictionary* recorded = record ? record->as<Dictionary>() : nullptr;
+    if (!recorded)
+        problem = "a result without a record";
+    return recorded;
+}
+
+}  // namespace
+
+std::shared_ptr<const Dictionary> dictionaryFromFile(const std::string& path,
+                                                     std::string& problem) {
+    const std::optional<std::string> contents = contentsOf(path);
+    if (!contents) {
+        problem = strerrordesc_np(errno);
+        return nullptr;
+    }
+    const std::optional<Value> value = valueOf(*contents, problem);
+    const Dictionary* dictionary = value ? recordIn(*value, problem) : nullptr;
+    return dictionary ? std::make_shared<const Dictionary>(*dictionary) : nullptr;
+}
+
+}  // namespace parvel::cli

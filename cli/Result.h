@@ -1,0 +1,42 @@
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "parvel/foundation/Error.h"
+#include "parvel/foundation/Value.h"
+#include "parvel/metadata/PVAssetMetadata.h"
+
+namespace parvel::cli {
+
+/// What came of one PATH.
+struct Result {
+    std::string path;  ///< as given
+    PVAssetType assetType = PVAssetTypeUnknown;
+    std::optional<String> assetID;
+    std::shared_ptr<const Dictionary> record;  ///< null is none
+    std::optional<Error> error;
+    std::vector<Dictionary::Entry> fields;  ///< what the command adds to the keys of every result
+    std::string_view nothing = "no metadata";  ///< what there is where there is no record
+    std::string reason;  ///< what the log said about a failure, in words for a person
+
+    [[nodiscard]] bool succeeded() const { return record && !error; }
+};
+
+/// "epub", "folium", "pdf", "m4a" or "unknown".
+std::string_view assetTypeName(PVAssetType type);
+
+/// The URL of a PATH: made absolute where it is relative, otherwise as typed. The empty PATH stays
+/// empty, since it names nothing.
+URL urlOfPath(std::string_view path);
+
+/// The result of the PATH before anything was done with it.
+Result resultForPath(std::string_view path);
+
+/// Puts the record into the result as the given representation of it.
+void setRecord(Result& result, const AssetPtr& record, PVAssetMetadataFlavor flavor);
+
+}  // namespace parvel::cli

@@ -1,0 +1,51 @@
+# Completion of parvel(1) for bash.
+
+_parvel_options() {
+    case $1 in
+        '') echo '--log --version --json --help -h' ;;
+        inspect)
+            echo '--cover --extra --flavor --store --files-from --null -0 --recursive -r --jobs -j
+                --json --jsonl --plist --log --help -h'
+            ;;
+        match) echo '--key --json --jsonl --plist --log --help -h' ;;
+    esac
+}
+
+_parvel() {
+    local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
+    local command='' i
+    for ((i = 1; i < COMP_CWORD; i++)); do
+        case ${COMP_WORDS[i]} in
+            --log) ((i++)) ;;
+            -*) ;;
+            *)
+                command=${COMP_WORDS[i]}
+                break
+                ;;
+        esac
+    done
+
+    COMPREPLY=()
+    case $previous in
+        --log)
+            mapfile -t COMPREPLY < <(compgen -W 'off fault error default debug' -- "$current")
+            return
+            ;;
+        --flavor)
+            mapfile -t COMPREPLY < <(
+                compgen -W 'full content-library store progress identity' -- "$current")
+            return
+            ;;
+        -j | --jobs | --key) return ;;
+    esac
+    if [[ $current == -* ]]; then
+        mapfile -t COMPREPLY < <(compgen -W "$(_parvel_options "$command")" -- "$current")
+    elif [[ -z $command ]]; then
+        mapfile -t COMPREPLY < <(compgen -W 'inspect match' -- "$current")
+    else
+        compopt -o filenames
+        mapfile -t COMPREPLY < <(compgen -f -- "$current")
+    fi
+}
+
+complete -F _parvel parvel

@@ -1,0 +1,134 @@
+"""Makes the inputs of the cases (run_cases.py), each from one line:
+
+    book NAME [FIELD=VALUE]...     a small book. Fields: title, author, subject, description, id,
+                                   producer; expanded=yes for a folder; damage=container|opf|
+                                   metadata|no-container|no-opf|zip for one that is broken there;
+                                   store='{JSON}' for its store metadata file
+    file NAME TEXT                 a file with that text and a line end
+    json NAME JSON                 the same, checked to be JSON
+    plist NAME [binary] JSON       a property list
+    folder NAME
+    link NAME TARGET
+    pipe NAME
+    attribute NAME KEY VALUE       the extended attribute KEY of the library
+    many NUMBER NAME               copies of one book, %d in NAME counting from 1
+
+%XX in a NAME stands for that byte, so that names need not be UTF-8.
+"""
+
+import errno
+import json
+import os
+import plistlib
+import shlex
+import shutil
+import urllib.parse
+import zipfile
+from xml.sax.saxutils import escape
+
+CONTAINER = """<?xml version="1.0"?>
+<container version="1.0" xmlns="urn:oasis:names:tc:opendocument:xmlns:container"><rootfiles>
+<rootfile full-path="OPS/book.opf" media-type="application/oebps-package+xml"/>
+</rootfiles></container>
+"""
+OPF = """<?xml version="1.0"?>
+<package xmlns="http://www.idpf.org/2007/opf" version="2.0" unique-identifier="uid">
+<metadata xmlns:dc="http://purl.org/dc/elements/1.1/">
+{fields}</metadata>
+<manifest><item id="cover" href="cover.png" media-type="image/png"/></manifest></package>
+"""
+ELEMENTS = {"title": ("dc:title", ""), "author": ("dc:creator", ""), "subject": ("dc:subject", ""),
+            "description": ("dc:description", ""), "id": ("dc:identifier", ' id="uid"'),
+            "producer": ("dc:contributor", ' id="pvp"')}
+
+
+class Unsupported(Exception):
+    """The file system has no such thing."""
+
+
+def place(directory, name):
+    path = os.path.join(os.fsencode(directory), urllib.parse.unquote_to_bytes(name))
+    os.makedirs(os.path.dirname(path), exist_ok=True)
+    return path
+
+
+def opf_of(fields):
+    lines = "".join(f"<{tag}{attributes}>{escape(fields[name])}</{tag}>\n"
+                    for name, (tag, attributes) in ELEMENTS.items() if name in fields)
+    text = OPF.format(fields=lines)
+    if fields.get("damage") == "opf":
+        return text[:120]
+    if fields.get("damage") == "metadata":
+        return text.replace("metadata", "something")
+    return text
+
+
+def members_of(fields):
+    damage = fields.get("damage")
+    members = {"mimetype": "application/epub+zip"}
+    if damage != "no-container":
+        members["META-INF/container.xml"] = "<broken" if damage == "container" else CONTAINER
+    if damage != "no-opf":
+        members["OPS/book.opf"] = opf_of(fields)
+    members["OPS/cover.png"] = "no real picture"
+    if "store" in fields:
+        members["BazaarMetadata.plist"] = plistlib.dumps(json.loads(fields["store"])).decode()
+    return members
+
+
+def book(path, fields):
+    if fields.get("damage") == "zip":
+        write(path, "no zip archive")
+    elif fields.get("expanded") == "yes":
+        for name, text in members_of(fields).items():
+            member = os.path.join(path, name.encode())
+            os.makedirs(os.path.dirname(member), exist_ok=True)
+            write(member, text)
+    else:
+        with zipfile.ZipFile(os.fsdecode(path), "w") as archive:
+            for name, text in members_of(fields).items():
+                archive.writestr(zipfile.ZipInfo(name), text)
+
+
+def write(path, text):
+    with open(path, "wb") as file:
+        file.write(text if isinstance(text, bytes) else text.encode())
+
+
+def attribute(path, key, value):
+    try:
+        os.setxattr(path, "user.com.kestrel.Folium." + key, value.encode())
+    except OSError as error:
+        if error.errno in (errno.ENOTSUP, errno.EPERM):
+            raise Unsupported("the file system keeps no extended attributes") from error
+        raise
+
+
+def make(directory, line):
+    kind, name, *rest = shlex.split(line)
+    if kind == "many":
+        first = place(directory, rest[0] % 1)
+        book(first, {"title": "One of many", "author": "Somebody"})
+        for number in range(2, int(name) + 1):
+            shutil.copy(first, place(directory, rest[0] % number))
+        return
+    path = place(directory, name)
+    if kind == "book":
+        book(path, dict(field.split("=", 1) for field in rest))
+    elif kind == "file":
+        write(path, "".join(rest) + "\n")
+    elif kind == "json":
+        write(path, json.dumps(json.loads(rest[0])) + "\n")
+    elif kind == "plist":
+        form = plistlib.FMT_BINARY if rest[0] == "binary" else plistlib.FMT_XML
+        write(path, plistlib.dumps(json.loads(rest[-1]), fmt=form))
+    elif kind == "folder":
+        os.makedirs(path)
+    elif kind == "link":
+        os.symlink(rest[0], path)
+    elif kind == "pipe":
+        os.mkfifo(path)
+    elif kind == "attribute":
+        attribute(path, rest[0], rest[1])
+    else:
+        raise ValueError("no such input: " + line)

@@ -12,6 +12,7 @@
 #include "parvel/foundation/PVExport.h"
 #include "parvel/foundation/URL.h"
 #include "parvel/foundation/Value.h"
+#include "parvel/metadata/PVAssetMetadataFlavor.h"
 #include "parvel/metadata/PVAssetType.h"
 
 namespace parvel {
@@ -24,15 +25,6 @@ using AssetPtr = std::shared_ptr<const PVAssetMetadata>;
 /// A record that is still being made, or that its caller owns alone.
 using MutableAssetPtr = std::shared_ptr<PVMutableAssetMetadata>;
 
-/// The dictionary representations of a record, each cut for one consumer.
-enum PVAssetMetadataFlavor : std::int64_t {
-    PVAssetMetadataFlavorFull = 0,
-    PVAssetMetadataFlavorContentLibrary = 1,
-    PVAssetMetadataFlavorBazaarMetadata = 2,
-    PVAssetMetadataFlavorProgress = 3,
-    PVAssetMetadataFlavorIdentity = 4,
-};
-
 /// What is known of one asset: a typed view over one string-keyed property-list dictionary, an
 /// explicit URL and a cached kind. Keys are in PVAssetMetadataKeys.h.
 ///
@@ -44,7 +36,7 @@ enum PVAssetMetadataFlavor : std::int64_t {
 ///         std::cout << book->title().value_or("untitled") << '\n';
 ///
 /// Getters that give `const Value*` give the value as it is stored, of whatever kind, and null when
-/// it is absent; the pointer is good until that entry changes. Booleans read false and unsigned
+/// it is absent; the pointer is good until the record changes. Booleans read false and unsigned
 /// numbers 0 when absent.
 class PV_EXPORT PVAssetMetadata {
 protected:

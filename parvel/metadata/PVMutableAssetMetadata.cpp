@@ -68,7 +68,7 @@ std::shared_ptr<PVAssetMetadata> PVMutableAssetMetadata::copyWithZone() const {
 }
 
 void PVMutableAssetMetadata::combineWithMetadata(const PVAssetMetadata* other) {
-    if (other && other != this)
+    if (other)
         mutableDictionary().merge(*other->backingDictionary());
 }
 

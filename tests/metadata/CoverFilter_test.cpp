@@ -76,7 +76,7 @@ TEST(CoverFilter, LetsTheImageOfAnyOtherDigestPass) {
 
 TEST(CoverFilter, LetsAnImageOfAnotherSizePass) {
     CoverFilter filter;
-    filter.refusedImages = {{digestOfABC, 4}};
+    filter.refusedImages = {{digestOfABC, 4}, {{}, 3}};
 
     EXPECT_FALSE(filter.refuses(coverBytes("abc")));
 }

@@ -360,6 +360,7 @@ TEST(PVAssetMetadata, WasInsertedAtTheReferenceDateForZero) {
 TEST(PVAssetMetadata, WasInsertedAtTheStoredSeconds) {
     EXPECT_EQ(recordOver({{"PVInsertionDate", integerValue(-61)}})->insertionDate(), Date{-61});
     EXPECT_EQ(recordOver({{"PVInsertionDate", realValue(12.75)}})->insertionDate(), Date{12});
+    EXPECT_EQ(recordOver({{"PVInsertionDate", realValue(2e15)}})->insertionDate(), Date{2e15});
     EXPECT_EQ(recordOver({{"PVInsertionDate", "500"}})->insertionDate(), Date{500});
 }
 

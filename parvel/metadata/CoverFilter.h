@@ -32,6 +32,6 @@ struct PV_EXPORT CoverFilter {
 /// thread that makes them.
 PV_EXPORT void setCoverFilter(CoverFilter filter);
 /// The filter in force.
-[[nodiscard]] const CoverFilter& coverFilter();
+[[nodiscard]] PV_EXPORT const CoverFilter& coverFilter();
 
 }  // namespace parvel

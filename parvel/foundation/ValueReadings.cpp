@@ -7,7 +7,7 @@
 namespace parvel {
 namespace {
 
-bool isDigit(char character) {
+bool isDecimalDigit(char character) {
     return character >= '0' && character <= '9';
 }
 
@@ -36,7 +36,7 @@ bool isTooLarge(std::string_view number) {
 double doubleReadingOfText(std::string_view text) {
     const bool negative = takeSign(text);
     // The standard's reader would take another sign, "inf" and "nan" too.
-    if (text.empty() || (!isDigit(text.front()) && text.front() != '.'))
+    if (text.empty() || (!isDecimalDigit(text.front()) && text.front() != '.'))
         return 0;
     double number = 0;
     const auto [end, failure] = std::from_chars(text.data(), text.data() + text.size(), number);
@@ -65,7 +65,7 @@ std::int64_t int64Reading(std::string_view text) {
     const std::uint64_t limit = negative ? kMost + 1 : kMost;
     std::uint64_t magnitude = 0;
     for (char character : text) {
-        if (!isDigit(character))
+        if (!isDecimalDigit(character))
             break;
         const auto digit = static_cast<std::uint64_t>(character - '0');
         if (magnitude > (limit - digit) / 10) {

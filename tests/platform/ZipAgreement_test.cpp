@@ -194,13 +194,14 @@ TEST_F(ZipAgreementTest, AnswersAsLibzipOnArchivesDamagedAtRandom) {
     }
 }
 
-/// The names of all entries, as far as libzip opens the file.
+/// The names of the first thousand entries, as far as libzip opens the file.
 std::vector<std::string> namesIn(const std::string& path) {
     std::vector<std::string> names = {"none"};
     zip_t* archive = zip_open(path.c_str(), ZIP_RDONLY, nullptr);
     if (!archive)
         return names;
-    for (zip_int64_t i = 0; i < zip_get_num_entries(archive, 0); ++i)
+    const zip_int64_t count = std::min<zip_int64_t>(zip_get_num_entries(archive, 0), 1000);
+    for (zip_int64_t i = 0; i < count; ++i)
         names.emplace_back(zip_get_name(archive, static_cast<zip_uint64_t>(i), ZIP_FL_ENC_RAW));
     zip_discard(archive);
     return names;

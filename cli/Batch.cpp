@@ -2,10 +2,12 @@
 
 #include <algorithm>
 #include <atomic>
+#include <cerrno>
 #include <charconv>
 #include <condition_variable>
 #include <map>
 #include <mutex>
+#include <new>
 #include <system_error>
 #include <thread>
 #include <vector>
@@ -23,6 +25,12 @@ namespace {
 constexpr unsigned kMostJobs = 512;
 /// How many results may wait for an earlier one, for each thread.
 constexpr std::size_t kWaitingPerJob = 8;
+
+Result failedResult(const std::string& path, int errnoValue) {
+    Result result = resultForPath(path);
+    result.error = makePOSIXError(errnoValue, urlOfPath(path));
+    return result;
+}
 
 class Batch {
 public:
@@ -122,15 +130,16 @@ void Batch::waitForRoom() {
 
 Result Batch::resultOf(const FoundPath& found, CallLog& log) const {
     log.clear();
-    if (found.readErrno != 0) {
-        Result result = resultForPath(found.path);
-        result.error = makePOSIXError(found.readErrno, urlOfPath(found.path));
+    if (found.readErrno != 0)
+        return failedResult(found.path, found.readErrno);
+    try {
+        Result result = m_work(found.path);
+        if (!result.succeeded() && result.reason.empty())
+            result.reason = log.reason();
         return result;
+    } catch (const std::bad_alloc&) {
+        return failedResult(found.path, ENOMEM);
     }
-    Result result = m_work(found.path);
-    if (!result.succeeded() && result.reason.empty())
-        result.reason = log.reason();
-    return result;
 }
 
 void Batch::deliver(std::size_t index, Printed printed) {

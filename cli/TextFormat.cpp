@@ -135,11 +135,11 @@ std::string_view kindText(PVAssetType type) {
         case PVAssetTypePDF:
             return "PDF document";
         case PVAssetTypeAudiobook:
-            return "audiobook";
+            return "Audiobook";
         case PVAssetTypeUnknown:
             break;
     }
-    return "unknown";
+    return "Unknown";
 }
 
 /// What a book, document or audiobook is known by, and where that comes from.

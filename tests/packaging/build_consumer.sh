@@ -1,9 +1,11 @@
 #!/bin/bash
 # build_consumer.sh BUILD COMPILER LIBDIR: installs the build to a scratch prefix, moves the prefix,
-# and there builds and runs a small program by the CMake package and by pkg-config.
+# and there builds and runs a small program by the CMake package and by pkg-config, and the README's
+# example.
 set -euo pipefail
 build=$1 compiler=$2 libdir=$3
-consumer=$(cd "$(dirname "$0")" && pwd)/consumer
+here=$(cd "$(dirname "$0")" && pwd)
+consumer=$here/consumer
 scratch=$(mktemp -d)
 trap 'rm -rf "$scratch"' EXIT
 
@@ -29,6 +31,14 @@ export PKG_CONFIG_PATH=$prefix/$libdir/pkgconfig
 read -ra flags <<<"$(pkg-config --cflags --libs ParvelFoundation)"
 "$compiler" -std=c++20 "$consumer/main.cpp" -o "$scratch/consumer" "${flags[@]}"
 LD_LIBRARY_PATH=$prefix/$libdir "$scratch/consumer"
+
+echo "== README"
+sed -n '/^```cpp$/,/^```$/p' "$here/../../README.md" | sed '/^```/d' >"$scratch/example.cpp"
+"$compiler" -std=c++20 "$scratch/example.cpp" -o "$scratch/example" "${flags[@]}"
+LD_LIBRARY_PATH=$prefix/$libdir "$scratch/example" "$here/../../samples/salt-and-starlight.epub"
+
+echo "== program"
+"$prefix/bin/parvel" --version
 
 echo "== SONAME"
 readelf -d "$prefix/$libdir/libParvelFoundation.so" | grep -E 'SONAME.*libParvelFoundation\.so\.[0-9]+'

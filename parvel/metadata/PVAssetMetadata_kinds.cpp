@@ -85,8 +85,10 @@ bool PVAssetMetadata::isBook() const {
 }
 
 bool PVAssetMetadata::isRMT() const {
+    if (!isEPub())
+        return false;
     const String* text = PVDynamicCast(classOf<String>, producer());
-    return text && text->starts_with("Folium Author") && isEPub();
+    return text && text->starts_with("Folium Author");
 }
 
 // Members of a book package.

@@ -189,6 +189,15 @@ TEST(RichMediaBook, IsNoBookOfAnotherProducer) {
     EXPECT_FALSE(assetNamed("a.epub")->isRMT());
 }
 
+TEST(RichMediaBook, HasItsKindCachedByTheQuestionWhoeverItsProducerIs) {
+    const MutableAssetPtr record = assetMadeBy("Another", "a.epub");
+    ASSERT_FALSE(record->isRMT());
+
+    record->setUrl(fileNamed("a.pdf"));
+
+    EXPECT_EQ(record->assetType(), PVAssetTypeEPub);
+}
+
 TEST(RichMediaBook, IsNoBookWhoseProducerIsNoText) {
     for (const Value& value : valuesOfEveryKind())
         EXPECT_FALSE(assetMadeBy(value, "a.epub")->isRMT());

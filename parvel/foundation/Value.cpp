@@ -114,8 +114,7 @@ bool isKeyBefore(const Dictionary::Entry& entry, std::string_view key) {
     return entry.key < key;
 }
 
-void appendQuoted(String& text, const String& string) {
-    text += '"';
+void appendEscaped(String& text, const String& string) {
     for (char character : string) {
         if (character == '"' || character == '\\')
             text += '\\';
@@ -124,6 +123,11 @@ void appendQuoted(String& text, const String& string) {
         else
             text += character;
     }
+}
+
+void appendQuoted(String& text, const String& string) {
+    text += '"';
+    appendEscaped(text, string);
     text += '"';
 }
 
@@ -154,7 +158,9 @@ void appendDictionary(String& text, const Dictionary& dictionary, int depth) {
     text += '{';
     const char* separator = "";
     for (const Dictionary::Entry& entry : dictionary) {
-        text.append(separator).append(entry.key).append(" = ");
+        text += separator;
+        appendEscaped(text, entry.key);
+        text += " = ";
         appendDescription(text, entry.value, depth + 1);
         separator = "; ";
     }

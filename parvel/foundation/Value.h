@@ -145,10 +145,10 @@ private:
     std::vector<Entry> m_entries;  ///< sorted by key, each key once
 };
 
-/// The value's one-line text for logs: dictionaries as `{key = value; …}`, strings quoted with
-/// `\"`, `\\` and `\n` escaped, data as `<N bytes>`, dates in ISO form (UTC), the null marker as
-/// `<null>`, arrays as `(a, b)`. A date that has no ISO form prints as its number of seconds, and
-/// containers below the 512th level as `(…)` and `{…}`.
+/// The value's one-line text for logs: dictionaries as `{key = value; …}`, strings quoted, keys
+/// not, both with `\"`, `\\` and `\n` escaped, data as `<N bytes>`, dates in ISO form (UTC), the
+/// null marker as `<null>`, arrays as `(a, b)`. A date that has no ISO form prints as its number of
+/// seconds, and containers below the 512th level as `(…)` and `{…}`.
 PV_EXPORT String description(const Value& value);
 PV_EXPORT String description(const Dictionary& dictionary);
 

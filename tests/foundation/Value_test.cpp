@@ -152,6 +152,12 @@ TEST(Description, IsOneLineInKeyOrder) {
               "tags = (\"a\", 2, <null>); title = \"A \\\"B\\\" \\\\ C\\nD\"}");
 }
 
+TEST(Description, IsOneLineWhateverAKeyHolds) {
+    const Dictionary dictionary{{"a\n\"b\" \\", Number::signedInteger(1)}};
+
+    EXPECT_EQ(description(dictionary), "{a\\n\\\"b\\\" \\\\ = 1}");
+}
+
 TEST(Description, OfADictionaryIsThatOfItsValue) {
     const Dictionary dictionary{{"a", "b"}};
 

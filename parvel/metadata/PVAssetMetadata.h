@@ -127,7 +127,7 @@ public:
     [[nodiscard]] const Value* updateDate() const;
     [[nodiscard]] const Value* modificationDate() const;
     [[nodiscard]] const Value* releaseDate() const;
-    /// Now, at each call, when absent. What is stored and no number reads as 0 seconds.
+    /// Now, at each call, when absent. What is stored and gives no number reads as 0 seconds.
     [[nodiscard]] Date insertionDate() const;
     [[nodiscard]] const Value* genre() const;
     [[nodiscard]] const Value* assetDescription() const;

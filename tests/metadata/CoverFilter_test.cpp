@@ -2,9 +2,8 @@
 
 #include <gtest/gtest.h>
 
-#include "parvel/platform/Digest.h"
-#include "parvel/platform/Service.h"
 #include "tests/support/Records.h"
+#include "tests/support/RefusingDigest.h"
 
 namespace parvel::testing {
 namespace {
@@ -89,22 +88,15 @@ TEST(CoverFilter, AsksForTheHashAndTheDigestsBoth) {
     EXPECT_TRUE(filter.refuses(coverBytes("abc")));
 }
 
-class FailingDigest : public Digest {
-public:
-    std::unique_ptr<Running> beginMD5() override { return nullptr; }
-    std::optional<SHA256> sha256(const Data&) override { return std::nullopt; }
-};
-
 TEST(CoverFilter, RefusesNothingWhereTheHostCannotDigest) {
-    FailingDigest digest;
-    const Service<Digest>::Replacement replacement(digest);
+    const RefusingDigest digest;
     CoverFilter filter;
     filter.refusedImages = {{digestOfABC, 3}};
 
     EXPECT_FALSE(filter.refuses(coverBytes("abc")));
 }
 
-/// Puts a filter in force that refuses every image, and the shipped one back.
+/// Puts a filter in force that refuses one image, and the shipped one back.
 class RecordWithCover : public ::testing::Test {
 protected:
     RecordWithCover() {

@@ -35,6 +35,7 @@ Dictionary manyEntriesWithout(std::initializer_list<std::string_view> keys) {
 
 // The five.
 
+// Deliberate: the live dictionary, not a copy.
 TEST(FullRepresentation, IsTheRecordsOwnDictionary) {
     const MutableAssetPtr record = recordOver(manyEntries());
 
@@ -192,7 +193,7 @@ TEST(EqualRecords, HaveEqualDictionaries) {
     EXPECT_EQ(record->hash(), recordOver(manyEntries())->hash());
 }
 
-TEST(EqualRecords, ComputeTheirNumbersByValue) {
+TEST(EqualRecords, CompareTheirNumbersByValue) {
     const MutableAssetPtr one = recordOver({{"rating", integerValue(1)}});
     const MutableAssetPtr other = recordOver({{"rating", booleanValue(true)}});
 

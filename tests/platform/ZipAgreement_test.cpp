@@ -194,6 +194,39 @@ TEST_F(ZipAgreementTest, AnswersAsLibzipOnArchivesDamagedAtRandom) {
     }
 }
 
+/// An archive whose offsets count the bytes that will stand before it.
+std::string archiveFor(std::size_t offset, const std::string& content) {
+    return ZipBuilder{}
+        .stored("mimetype", content)
+        .prefix(std::string(offset, '#'), true)
+        .bytes()
+        .substr(offset);
+}
+
+TEST_F(ZipAgreementTest, AnArchiveHiddenBeforeTheFirstEntryIsLeftToLibzip) {
+    const std::string hidden = archiveFor(0, "hidden" + std::string(1000, 'h'));
+    const std::string padding(5000, 'p');
+
+    expectAgreementOn(
+        ZipBuilder{}.prefix(hidden, true).stored("mimetype", "x").stored("p", padding).bytes(),
+        "hidden archive");
+    EXPECT_EQ(m_tally.plainArchives, 0);
+}
+
+TEST_F(ZipAgreementTest, AnArchiveHiddenInAnEntryIsNotTakenForTheWhole) {
+    const std::string name = "inner";
+    const std::string padding(5000, 'p');
+
+    expectAgreementOn(ZipBuilder{}
+                          .stored(name, archiveFor(30 + name.size(), "hidden"))
+                          .stored("mimetype", "x")
+                          .stored("p", padding)
+                          .bytes(),
+                      "archive in an entry");
+    EXPECT_EQ(m_tally.plainArchives, 1);
+    EXPECT_EQ(m_tally.sureContents, 1);
+}
+
 /// The names of the first thousand entries, as far as libzip opens the file.
 std::vector<std::string> namesIn(const std::string& path) {
     std::vector<std::string> names = {"none"};

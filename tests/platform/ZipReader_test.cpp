@@ -1,3 +1,4 @@
+#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -5,6 +6,7 @@
 #include <filesystem>
 
 #include "parvel/platform/ZipArchive.h"
+#include "parvel/platform/linux/FileDescriptor.h"
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/support/ZipBuilder.h"
 
@@ -320,6 +322,24 @@ TEST_F(ZipReaderTest, AFileThatIsNoArchiveIsCorrupt) {
         EXPECT_FALSE(open());
         expectOpenError(PVFileErrorDomain, 259, m_folder.url("a.zip"));
     }
+}
+
+TEST_F(ZipReaderTest, AHugeSparseFileThatClaimsAsManyEntriesIsNoArchive) {
+    const std::string end = ZipBuilder{}.zip64().count(1ULL << 31).bytes();
+    std::string path = m_folder.write("a.zip", "");
+    ASSERT_EQ(::truncate(path.c_str(), 200LL << 30), 0);
+    const host::FileDescriptor file(::open(path.c_str(), O_WRONLY | O_CLOEXEC));
+    const auto size = static_cast<std::uint64_t>(200LL << 30);
+    std::string lie = end;
+    for (std::size_t byte = 0; byte < 8; ++byte) {
+        lie[40 + byte] = static_cast<char>(size >> 8 * byte);      // the directory's size
+        lie[56 + 8 + byte] = static_cast<char>(size >> 8 * byte);  // the record's place
+    }
+    ASSERT_EQ(::pwrite(file.get(), lie.data(), lie.size(), 200LL << 30),
+              static_cast<ssize_t>(lie.size()));
+
+    EXPECT_FALSE(open());
+    expectOpenError(PVFileErrorDomain, 259, m_folder.url("a.zip"));
 }
 
 TEST_F(ZipReaderTest, ATailFullOfEndRecordsIsNoArchive) {

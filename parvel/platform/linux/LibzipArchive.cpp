@@ -1,12 +1,7 @@
 #include "parvel/platform/linux/LibzipArchive.h"
 
-#include <unistd.h>
-
 #include <algorithm>
-#include <cstring>
-#include <vector>
 
-#include "parvel/platform/linux/SystemCall.h"
 #include "parvel/platform/linux/ZipFormat.h"
 
 namespace parvel::host {
@@ -16,9 +11,6 @@ namespace {
 /// What opening may read: a directory of some 90,000 entries with names of the usual length, which
 /// libzip keeps in about three times as much memory.
 constexpr std::uint64_t openingBudget = 8ULL << 20;
-/// libzip reads a whole directory for each place near the end that looks like an end record. An
-/// honest archive has one, and those of the archives stored in it.
-constexpr int mostEndRecords = 64;
 constexpr std::uint64_t pieceLength = 1ULL << 20;
 
 struct CloseEntry {
@@ -38,27 +30,10 @@ bool readFully(zip_file_t* entry, std::uint8_t* buffer, std::uint64_t size) {
     return true;
 }
 
-bool hasTooManyEndRecords(int file, std::uint64_t fileSize) {
-    std::vector<std::uint8_t> tail(std::min<std::uint64_t>(fileSize, zip::longestEnd));
-    const ssize_t count = retried([&] {
-        return ::pread(file, tail.data(), tail.size(), static_cast<off_t>(fileSize - tail.size()));
-    });
-    int found = 0;
-    const std::uint8_t* next = tail.data();
-    const std::uint8_t* end = next + std::max<ssize_t>(count, 0);
-    while ((next = static_cast<const std::uint8_t*>(
-                ::memmem(next, static_cast<std::size_t>(end - next), zip::endSignature,
-                         zip::signatureLength))) != nullptr) {
-        ++next;
-        ++found;
-    }
-    return found > mostEndRecords;
-}
-
 }  // namespace
 
 std::unique_ptr<LibzipArchive> LibzipArchive::open(int file, std::uint64_t fileSize) {
-    if (fileSize < zip::endLength || hasTooManyEndRecords(file, fileSize))
+    if (fileSize < zip::endLength)  // libzip takes an empty file for an empty archive
         return nullptr;
     std::unique_ptr<LibzipArchive> archive(new LibzipArchive(file, fileSize));
     archive->m_archive = archive->m_source.open(openingBudget);
@@ -75,7 +50,9 @@ std::optional<Data> LibzipArchive::readEntry(std::string_view name, std::uint64_
     return entry.isLarge() ? readInPieces(*index, entry) : readWhole(*index, entry);
 }
 
-/// Compares one name after the other: libzip's own search compares names as it decodes them.
+/// Compares one name after the other: libzip's own search compares names as it decodes them. What
+/// it gives as the stored bytes has a space for each NUL, and is the name of the Unicode field
+/// where an entry has one.
 std::optional<std::uint64_t> LibzipArchive::find(std::string_view name) const {
     const zip_int64_t count = zip_get_num_entries(m_archive.get(), 0);
     for (zip_int64_t i = 0; i < count; ++i) {

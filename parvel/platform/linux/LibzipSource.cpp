@@ -5,12 +5,24 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
+#include <vector>
 
 #include "parvel/platform/linux/SystemCall.h"
+#include "parvel/platform/linux/ZipFormat.h"
 
 namespace parvel::host {
 
+namespace {
+
+/// libzip reads a whole directory for each place near the end that looks like an end record. An
+/// honest archive has one, and those of the archives stored in it.
+constexpr int mostEndRecords = 64;
+
+}  // namespace
+
 LibzipHandle LibzipSource::open(std::uint64_t budget) {
+    if (!endRecordsAreModest(budget))
+        return nullptr;
     zip_source_t* source = zip_source_function_create(&LibzipSource::command, this, nullptr);
     if (!source)
         return nullptr;
@@ -21,6 +33,39 @@ LibzipHandle LibzipSource::open(std::uint64_t budget) {
     if (!archive)
         zip_source_free(source);
     return archive;
+}
+
+/// libzip takes memory for as many entries as a zip64 end record tells before it reads the first,
+/// so whatever could be such a record must tell a number that the budget lets it read.
+bool LibzipSource::endRecordsAreModest(std::uint64_t budget) {
+    std::vector<std::uint8_t> tail(std::min<std::uint64_t>(m_fileSize, zip::longestEnd));
+    const zip_int64_t read = readAt(m_fileSize - tail.size(), tail.data(), tail.size());
+    if (read != static_cast<zip_int64_t>(tail.size()))
+        return false;
+    int found = 0;
+    const std::uint8_t* end = tail.data() + tail.size();
+    for (const std::uint8_t* next = tail.data();; ++next) {
+        next = static_cast<const std::uint8_t*>(::memmem(next, static_cast<std::size_t>(end - next),
+                                                         zip::endSignature, zip::signatureLength));
+        if (!next)
+            return true;
+        const auto before = static_cast<std::size_t>(next - tail.data());
+        if (++found > mostEndRecords ||
+            (before >= zip::locator64Length &&
+             countOfRecord64(next - zip::locator64Length) > budget / zip::directoryHeaderLength))
+            return false;
+    }
+}
+
+/// The number of entries that the zip64 end record of a locator tells; 0 where there is none.
+std::uint64_t LibzipSource::countOfRecord64(const std::uint8_t* locator) {
+    std::array<std::uint8_t, zip::end64Length> record;
+    const std::uint64_t offset = zip::get64(locator + 8);
+    if (std::memcmp(locator, zip::locator64Signature, zip::signatureLength) != 0 ||
+        offset > m_fileSize ||
+        readAt(offset, record.data(), record.size()) != static_cast<zip_int64_t>(record.size()))
+        return 0;
+    return zip::get64(record.data() + 24);
 }
 
 zip_int64_t LibzipSource::command(void* source, void* data, zip_uint64_t length,

@@ -15,7 +15,8 @@ struct DiscardLibzip {
 using LibzipHandle = std::unique_ptr<zip_t, DiscardLibzip>;
 
 /// Lets libzip read an open file by its descriptor, which stays its owner's. Opening reads no more
-/// than a budget: libzip takes the whole directory into memory, and weighs all that looks like one.
+/// than a budget, in bytes: libzip takes the whole directory into memory, in about three times as
+/// much of it, and weighs all that looks like one.
 class LibzipSource {
 public:
     LibzipSource(int file, std::uint64_t fileSize) : m_file(file), m_fileSize(fileSize) {}
@@ -28,6 +29,8 @@ public:
 private:
     static zip_int64_t command(void* source, void* data, zip_uint64_t length,
                                zip_source_cmd_t command);
+    [[nodiscard]] bool endRecordsAreModest(std::uint64_t budget);
+    [[nodiscard]] std::uint64_t countOfRecord64(const std::uint8_t* locator);
     [[nodiscard]] zip_int64_t read(std::uint8_t* data, std::uint64_t length);
     [[nodiscard]] zip_int64_t seek(void* data, std::uint64_t length);
     [[nodiscard]] zip_int64_t readAhead();

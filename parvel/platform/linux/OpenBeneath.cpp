@@ -5,7 +5,6 @@
 #include <sys/stat.h>
 #include <sys/syscall.h>
 
-#include <cstring>
 #include <string>
 #include <string_view>
 #include <vector>

@@ -12,17 +12,18 @@ std::string text(const URL& url) {
     return url.absoluteString();
 }
 
+struct MoveOptions {
+    bool replace = false;
+    bool renameIfCollision = false;
+    bool useAssetIDFileName = false;
+};
+
 class Moves : public ManagedFolder {
 protected:
     AssetPtr moveTo(const AssetPtr& moved, const std::optional<URL>& target, bool replace = false) {
         return m_manager->moveAsset_toURL_replaceExisting_error(moved, target, replace, &m_error);
     }
-    struct Options {
-        bool replace = false;
-        bool renameIfCollision = false;
-        bool useAssetIDFileName = false;
-    };
-    AssetPtr moveInto(const AssetPtr& moved, const URL& directory, Options options = {}) {
+    AssetPtr moveInto(const AssetPtr& moved, const URL& directory, MoveOptions options = {}) {
         return m_manager
             ->moveAsset_toDirectory_replaceExisting_renameIfCollision_useAssetIDFileName_error(
                 moved, directory, options.replace, options.renameIfCollision,
@@ -194,7 +195,8 @@ TEST_F(Moves, ABookWithoutUsableNameFailsWith259AndNoURL) {
 
 TEST_F(Moves, AnIDThatIsNoSingleNameIsNoFileName) {
     const URL library = makeFolder("library");
-    for (const std::string id : {"", ".", "..", "../out", "a/b", "/etc", std::string("a\0b", 3)}) {
+    for (const std::string& id :
+         std::vector<std::string>{"", ".", "..", "../out", "a/b", "/etc", std::string("a\0b", 3)}) {
         const auto book = asset("a.epub");
         book->setGeneratedID(id);
         EXPECT_FALSE(moveInto(book, library, {.useAssetIDFileName = true})) << id;

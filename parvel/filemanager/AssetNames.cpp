@@ -16,11 +16,6 @@ constexpr std::size_t kLongestSanitizedName = 254;  // UTF-16 units, without the
 constexpr std::size_t kLongestFileName = 255;       // bytes
 constexpr std::string_view kLongestCount = " 9999";
 
-bool isOneComponent(const String& stem) {
-    return !stem.empty() && stem != "." && stem != ".." &&
-           stem.find_first_of(std::string_view("/\0", 2)) == String::npos;
-}
-
 String withExtension(String stem, std::string_view extension) {
     if (!extension.empty())
         stem.append(".").append(extension);
@@ -28,6 +23,11 @@ String withExtension(String stem, std::string_view extension) {
 }
 
 }  // namespace
+
+bool isOneComponent(const String& name) {
+    return !name.empty() && name != "." && name != ".." &&
+           name.find_first_of(std::string_view("/\0", 2)) == String::npos;
+}
 
 std::optional<URL> urlOf(const AssetPtr& asset) {
     return asset ? asset->url() : std::nullopt;

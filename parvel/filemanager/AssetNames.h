@@ -13,6 +13,9 @@ namespace parvel {
 [[nodiscard]] std::optional<URL> urlOf(const AssetPtr& asset);
 [[nodiscard]] std::optional<String> lastComponentOf(const AssetPtr& asset);
 
+/// Whether text can be the name of an item in a folder: not empty, `.` or `..`, no slash, no NUL.
+[[nodiscard]] bool isOneComponent(const String& name);
+
 /// The store ID, or else the generated ID, with the extension of the record's URL. None where that
 /// ID can't be one path component: the departure from "any text" keeps an asset within its
 /// directory.

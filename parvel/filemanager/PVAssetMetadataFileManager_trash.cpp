@@ -12,17 +12,15 @@ namespace parvel {
 
 namespace {
 
-/// A name in the trash is one component; what would lead elsewhere names no file, and the rename
-/// fails.
+/// The item's place in the trash under its display name. None where that is no single name, which
+/// is a failed rename: nothing out of a book leads out of the trash or into another item there.
 std::optional<URL> renamedInTrash(const URL& trashed, const String& displayName,
                                   std::string_view extension) {
-    String name = displayName;
-    // Deliberate: the extension is joined as a component, so that this rename fails and the item
-    // stays under the name that the trash gave it.
-    if (extensionOfPath(name).empty())
-        name = pathAppending(name, extension);
-    if (name == "." || name == ".." || name.starts_with("../") || name.starts_with('/') ||
-        name.find("/../") != String::npos || name.ends_with("/.."))
+    // Deliberate: a missing extension is joined as a component, so that this rename fails and the
+    // item stays under the name that the trash gave it.
+    const String name =
+        extensionOfPath(displayName).empty() ? pathAppending(displayName, extension) : displayName;
+    if (!isOneComponent(name))
         return std::nullopt;
     return trashed.deletingLastPathComponent().appendingPathComponent(name);
 }

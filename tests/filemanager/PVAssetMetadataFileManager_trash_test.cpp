@@ -91,6 +91,18 @@ TEST_F(TakingAway, ADisplayNameThatIsAPathMovesNothingOutOfTheTrash) {
     EXPECT_EQ(names("outside"), Names{});
 }
 
+TEST_F(TakingAway, ADisplayNameDoesNotMoveTheAssetIntoAnotherTrashedItem) {
+    makeFolder("data/Trash/files/My Book");
+    const auto book = asset("a.epub");
+    book->setDisplayName("My Book");
+
+    const AssetPtr trashed = m_manager->trashAsset_error(book, &m_error);
+
+    ASSERT_TRUE(trashed);
+    EXPECT_EQ(trashed->trashedURL(), inTrash("a.epub"));
+    EXPECT_EQ(names("data/Trash/files/My Book"), Names{});
+}
+
 TEST_F(TakingAway, AMissingAssetCanNotBeTrashed) {
     const auto book = PVAssetMetadata::metadataWithURL_dictionary(m_folder.url("a.epub"), nullptr);
     RecordedLog log;

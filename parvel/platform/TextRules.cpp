@@ -67,6 +67,26 @@ std::size_t validStretch(std::string_view text) {
 
 }  // namespace
 
+void appendUTF8(std::string& text, std::uint32_t codePoint) {
+    const auto byte = [&](std::uint32_t bits) { text += static_cast<char>(bits); };
+    const auto tail = [&](int shift) { byte(0x80 | (codePoint >> shift & 0x3F)); };
+    if (codePoint < 0x80) {
+        byte(codePoint);
+    } else if (codePoint < 0x800) {
+        byte(0xC0 | codePoint >> 6);
+        tail(0);
+    } else if (codePoint < 0x10000) {
+        byte(0xE0 | codePoint >> 12);
+        tail(6);
+        tail(0);
+    } else {
+        byte(0xF0 | codePoint >> 18);
+        tail(12);
+        tail(6);
+        tail(0);
+    }
+}
+
 bool isValidUTF8(std::string_view text) {
     return validStretch(text) == text.size();
 }

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <string>
 #include <string_view>
 
@@ -21,6 +22,8 @@ public:
     static TextRules& host();
 };
 
+/// Appends the character; the code point is at most U+10FFFF and no surrogate.
+void appendUTF8(std::string& text, std::uint32_t codePoint);
 [[nodiscard]] bool isValidUTF8(std::string_view text);
 /// The text with U+FFFD for each byte that is no part of valid UTF-8.
 [[nodiscard]] std::string withReplacedInvalidUTF8(std::string_view text);

@@ -44,27 +44,6 @@ std::uint64_t bigEndian64(const std::uint8_t* bytes) {
     return static_cast<std::uint64_t>(bigEndian32(bytes)) << 32 | bigEndian32(bytes + 4);
 }
 
-void appendUTF8(std::string& text, std::uint32_t codePoint) {
-    const auto trail = [&](int shift) {
-        text += static_cast<char>(0x80 | ((codePoint >> shift) & 0x3F));
-    };
-    if (codePoint < 0x80) {
-        text += static_cast<char>(codePoint);
-    } else if (codePoint < 0x800) {
-        text += static_cast<char>(0xC0 | (codePoint >> 6));
-        trail(0);
-    } else if (codePoint < 0x10000) {
-        text += static_cast<char>(0xE0 | (codePoint >> 12));
-        trail(6);
-        trail(0);
-    } else {
-        text += static_cast<char>(0xF0 | (codePoint >> 18));
-        trail(12);
-        trail(6);
-        trail(0);
-    }
-}
-
 /// Big-endian UTF-16 as UTF-8; none for an odd length or a lone surrogate.
 std::optional<std::string> utf8FromUTF16(const std::string& bytes) {
     const auto unitAt = [&](std::size_t at) {

@@ -6,7 +6,6 @@
 #include <vector>
 
 #include "parvel/platform/MalformedInput.h"
-#include "parvel/platform/TextRules.h"
 #include "parvel/platform/linux/PropertyListForms.h"
 
 // The binary form, all numbers big-endian:
@@ -31,6 +30,26 @@ std::uint64_t bigEndian(Data::Bytes bytes) {
     for (const std::uint8_t byte : bytes)
         value = value << 8 | byte;
     return value;
+}
+
+void appendUTF8(String& text, std::uint32_t codePoint) {
+    const auto byte = [&](std::uint32_t bits) { text += static_cast<char>(bits); };
+    const auto tail = [&](int shift) { byte(0x80 | (codePoint >> shift & 0x3F)); };
+    if (codePoint < 0x80) {
+        byte(codePoint);
+    } else if (codePoint < 0x800) {
+        byte(0xC0 | codePoint >> 6);
+        tail(0);
+    } else if (codePoint < 0x10000) {
+        byte(0xE0 | codePoint >> 12);
+        tail(6);
+        tail(0);
+    } else {
+        byte(0xF0 | codePoint >> 18);
+        tail(12);
+        tail(6);
+        tail(0);
+    }
 }
 
 /// A lone half of a surrogate pair becomes U+FFFD.
@@ -61,6 +80,7 @@ public:
     std::optional<Value> read() {
         if (!readTrailer())
             return std::nullopt;
+        spendNodes(1);
         return object(m_top, 1);
     }
 
@@ -86,7 +106,7 @@ private:
     std::optional<Value> dictionary(const Object& object, std::size_t depth);
     std::optional<String> key(std::uint64_t index);
 
-    bool holdsReferences(const Object& object, std::size_t perEntry) const;
+    bool takeReferences(const Object& object, std::size_t perEntry);
     std::uint64_t reference(const Object& object, std::uint64_t position) const;
     void spendNodes(std::uint64_t count);
     void spendText(std::uint64_t size);
@@ -147,7 +167,6 @@ std::optional<Value> BinaryPropertyList::object(std::uint64_t index, std::size_t
     const std::optional<Object> found = objectAt(index);
     if (!found)
         return std::nullopt;
-    spendNodes(1);
     switch (found->kind) {
         case 0x0:
             return simple(static_cast<unsigned>(found->size));
@@ -246,7 +265,7 @@ std::optional<Value> BinaryPropertyList::text(const Object& object, std::size_t 
 }
 
 std::optional<Value> BinaryPropertyList::array(const Object& object, std::size_t depth) {
-    if (!holdsReferences(object, 1))
+    if (!takeReferences(object, 1))
         return std::nullopt;
     if (depth > kMaximumPropertyListDepth)
         throw MalformedInput("a property list nested too deep");
@@ -263,7 +282,7 @@ std::optional<Value> BinaryPropertyList::array(const Object& object, std::size_t
 
 /// The references of all keys stand before those of the values.
 std::optional<Value> BinaryPropertyList::dictionary(const Object& object, std::size_t depth) {
-    if (!holdsReferences(object, 2))
+    if (!takeReferences(object, 2))
         return std::nullopt;
     if (depth > kMaximumPropertyListDepth)
         throw MalformedInput("a property list nested too deep");
@@ -285,17 +304,16 @@ std::optional<String> BinaryPropertyList::key(std::uint64_t index) {
     const std::optional<Object> found = objectAt(index);
     if (!found || (found->kind != 0x5 && found->kind != 0x6))
         return std::nullopt;
-    spendNodes(1);
     const std::optional<Value> value = text(*found, found->kind == 0x5 ? 1 : 2);
     return value ? std::optional<String>(*value->as<String>()) : std::nullopt;
 }
 
-/// Also makes sure that room for so many may be set aside.
-bool BinaryPropertyList::holdsReferences(const Object& object, std::size_t perEntry) const {
+/// Spends the nodes of all of them at once, before room is set aside: containers may share bytes,
+/// so what each has room for must not be counted for each anew.
+bool BinaryPropertyList::takeReferences(const Object& object, std::size_t perEntry) {
     if (object.size > object.rest.size() / (perEntry * m_referenceSize))
         return false;
-    if (object.size > m_nodesLeft)
-        throw MalformedInput("a property list of too many values");
+    spendNodes(object.size * perEntry);
     return true;
 }
 

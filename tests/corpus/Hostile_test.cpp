@@ -77,7 +77,7 @@ std::string shellWord(const std::string& path) {
 /// A folder with a make_hostile.py; the given set stands where the environment says.
 enum class Assets { Own, Given };
 
-std::string nameOf(const ::testing::TestParamInfo<Assets>& info) {
+std::string assetsName(const ::testing::TestParamInfo<Assets>& info) {
     return info.param == Assets::Own ? "Own" : "Given";
 }
 
@@ -140,7 +140,7 @@ TEST_P(HostileTest, EveryBookEndsInARecordOrAnErrorAndTouchesNothing) {
 }
 
 INSTANTIATE_TEST_SUITE_P(Assets, HostileTest, ::testing::Values(Assets::Own, Assets::Given),
-                         nameOf);
+                         assetsName);
 
 }  // namespace
 }  // namespace parvel::testing

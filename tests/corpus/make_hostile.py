@@ -306,25 +306,25 @@ def xmls():
     # What the documents say is put into expressions as it is.
     slow = 'count(//*[count(//*[count(//*[count(//*)>0])>0])>0])'
     fill = '<s/>' * 20000
-    p('expression-slow', opf(uid="n' or %s>0 or '1'='" % slow.replace('>', '&gt;'), more=fill), 'either',
+    p('expression-slow', opf(uid="q' or %s>0 or '1'='" % slow.replace('>', '&gt;'), more=fill), 'either',
       'an identifier that asks for a fourth power', kind='folium')
     p('expression-slow-cover', opf(cover='x&quot; or %s>0 or &quot;1&quot;=&quot;' % slow, more=fill),
       'either', 'a cover that does')
-    p('expression-joined', opf(uid="n' or contains(concat(%s),'q') or '1'='" % ','.join(['//*'] * 800),
+    p('expression-joined', opf(uid="q' or contains(concat(%s),'q') or '1'='" % ','.join(['//*'] * 800),
                                title='t' * 9000000), 'either', 'a text of 7 GB asked for', kind='folium')
-    p('expression-set', opf(uid="n'] | %s | *['" % ' | '.join(['//* | //@*'] * 900), more=fill), 'either',
+    p('expression-set', opf(uid="q'] | %s | *['" % ' | '.join(['//* | //@*'] * 900), more=fill), 'either',
       'a union of 900 sets', kind='folium')
     p('expression-axes', opf(cover='&quot;] | %s | *[&quot;' % '/'.join(
         ['//*', 'ancestor-or-self::*', 'following::*', 'preceding::*'] * 4), more=fill), 'either',
       'axes upon axes')
     for depth in (3000, 200000):
-        p('expression-deep-%d' % depth, opf(uid="n' or %s1%s or '1'='" % ('(' * depth, ')' * depth)),
+        p('expression-deep-%d' % depth, opf(uid="q' or %s1%s or '1'='" % ('(' * depth, ')' * depth)),
           'either', 'brackets %d deep' % depth, kind='folium')
-        p('expression-minus-%d' % depth, opf(uid="n' or %s1 or '1'='" % ('-' * depth)), 'either',
+        p('expression-minus-%d' % depth, opf(uid="q' or %s1 or '1'='" % ('-' * depth)), 'either',
           '%d signs' % depth, kind='folium')
-        p('expression-predicates-%d' % depth, opf(uid="n']%s | *['" % ('[1]' * depth)), 'either',
+        p('expression-predicates-%d' % depth, opf(uid="q']%s | *['" % ('[1]' * depth)), 'either',
           '%d conditions' % depth, kind='folium')
-    p('expression-function', opf(uid="n' or document('%s') or '1'='" % secret), 'either',
+    p('expression-function', opf(uid="q' or document('%s') or '1'='" % secret), 'either',
       'a function that reads files', kind='folium')
     p('identifier-long', opf(uid='n' * 5000000), 'either', 'an identifier of 5 MB', kind='folium')
 
@@ -428,6 +428,10 @@ def plists():
     s('dict-shared', binary([b'\xd2' + ref(60, 61, n + 1, n + 1) for n in range(60)] + [b'\x51a', b'\x51b']),
       '2^60 dictionaries that share')
     s('chain', binary([b'\xa1' + ref(n + 1) for n in range(200000)] + [b'\x08']), '200000 lists deep')
+    inner = b''.join(b'\xaf\x12' + struct.pack('>II', 400000, n + 1) for n in range(510))
+    out = b'bplist00' + inner + b'\0' * 2000000
+    s('overlapping', out + b''.join(struct.pack('>I', 8 + 10 * n) for n in range(511))
+      + struct.pack('>6xBBQQQ', 4, 4, 511, 0, len(out)), '510 lists of 400000 that share their bytes')
     s('self-key', binary([b'\xd1' + ref(0, 0)]), 'a dictionary that is its own key')
     for n, marker in (('null', b'\0'), ('fill', b'\x0f'), ('set', b'\xc1' + ref(1)), ('uid', b'\x80\1'),
                       ('reserved', b'\x70'), ('wide', b'\x14' + b'\xff' * 16), ('wider', b'\x1f' + b'\xff' * 40),
@@ -447,6 +451,10 @@ def plists():
         s('trailer-' + n, binary(plain, **lies), 'a trailer whose %s lies' % n)
     for cut in (6, 8, 9, 31, 32, 40):
         s('cut-%d' % cut, binary(plain)[:cut], 'cut at byte %d' % cut)
+    put('plist-and-more', book(package=opf('', more='<!---->' * 1000000), extra=[
+        ('BazaarMetadata.plist', (PLIST % ('<dict>%s</dict>' % ''.join(
+            '<key>%d</key><dict/>' % n for n in range(240000)))).encode())]).bytes(), 'either',
+        'the most of everything at once')
     s('sixteen', plistlib.dumps({'k': b'\0' * 11000000}), '15 MB of base64')
     s('over', plistlib.dumps({'k': b'\0' * 13000000}), '17 MB of base64')
 

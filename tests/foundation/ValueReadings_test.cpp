@@ -138,12 +138,12 @@ TEST(DoubleReading, Is0WithoutANumber) {
 }
 
 TEST(DoubleReading, TellsTooLargeFromTooSmall) {
-    constexpr double kInfinity = std::numeric_limits<double>::infinity();
+    constexpr double infinity = std::numeric_limits<double>::infinity();
 
-    EXPECT_EQ(doubleOf("1e999"), kInfinity);
-    EXPECT_EQ(doubleOf("-1e999"), -kInfinity);
-    EXPECT_EQ(doubleOf("1" + std::string(400, '0')), kInfinity);
-    EXPECT_EQ(doubleOf("0.0001e99999999999999999999"), kInfinity);
+    EXPECT_EQ(doubleOf("1e999"), infinity);
+    EXPECT_EQ(doubleOf("-1e999"), -infinity);
+    EXPECT_EQ(doubleOf("1" + std::string(400, '0')), infinity);
+    EXPECT_EQ(doubleOf("0.0001e99999999999999999999"), infinity);
     EXPECT_EQ(doubleOf("1e-999"), 0);
     EXPECT_EQ(doubleOf("0." + std::string(400, '0') + "1"), 0);
     EXPECT_EQ(doubleOf("1000e-99999999999999999999"), 0);

@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "parvel/platform/MalformedInput.h"
+#include "parvel/platform/TextRules.h"
 #include "parvel/platform/linux/PropertyListForms.h"
 
 // The binary form, all numbers big-endian:
@@ -30,26 +31,6 @@ std::uint64_t bigEndian(Data::Bytes bytes) {
     for (const std::uint8_t byte : bytes)
         value = value << 8 | byte;
     return value;
-}
-
-void appendUTF8(String& text, std::uint32_t codePoint) {
-    const auto byte = [&](std::uint32_t bits) { text += static_cast<char>(bits); };
-    const auto tail = [&](int shift) { byte(0x80 | (codePoint >> shift & 0x3F)); };
-    if (codePoint < 0x80) {
-        byte(codePoint);
-    } else if (codePoint < 0x800) {
-        byte(0xC0 | codePoint >> 6);
-        tail(0);
-    } else if (codePoint < 0x10000) {
-        byte(0xE0 | codePoint >> 12);
-        tail(6);
-        tail(0);
-    } else {
-        byte(0xF0 | codePoint >> 18);
-        tail(12);
-        tail(6);
-        tail(0);
-    }
 }
 
 /// A lone half of a surrogate pair becomes U+FFFD.

@@ -1,5 +1,6 @@
 #include <libxml/xpath.h>
 #include <libxml/xpathInternals.h>
+#include <malloc.h>
 
 #include <utility>
 #include <vector>
@@ -11,6 +12,8 @@
 
 namespace parvel {
 namespace {
+
+constexpr std::size_t kManyNodes = 100'000;
 
 struct FreeXPathContext {
     void operator()(xmlXPathContext* context) const { xmlXPathFreeContext(context); }
@@ -29,6 +32,7 @@ const xmlChar* xmlText(const std::string& text) {
 class Libxml2Document final : public XmlDocument {
 public:
     explicit Libxml2Document(XmlTree tree) : m_tree(std::move(tree)) {}
+    ~Libxml2Document() override;
 
     XPathResult evaluate(const void* context, std::string_view expression,
                          ErrorOut error) const override;
@@ -46,6 +50,17 @@ private:
     /// What holds the namespace nodes that were handed out: they are no part of the tree.
     mutable std::vector<XPathObject> m_namespaceResults;
 };
+
+/// The allocator keeps the many small pieces of a large tree; they are given back, for a cover may
+/// be read next.
+Libxml2Document::~Libxml2Document() {
+    const bool isLarge = m_tree.scope.nodes > kManyNodes;
+    m_namespaceResults.clear();
+    m_context.reset();
+    m_tree.document.reset();
+    if (isLarge)
+        malloc_trim(0);
+}
 
 XPathResult Libxml2Document::evaluate(const void* context, std::string_view expression,
                                       ErrorOut error) const {

@@ -12,8 +12,8 @@ constexpr std::size_t kMaximumElements = 200'000;
 /// Of elements, attributes and prefixes, each counted once: libxml2 takes quadratic time over very
 /// many different names.
 constexpr int kMaximumNames = 50'000;
-/// Of bytes and tree together.
-constexpr std::size_t kMaximumMemory = 224 << 20;
+/// Of bytes and tree together. A book's store metadata file is held beside them.
+constexpr std::size_t kMaximumMemory = 160 << 20;
 /// What libxml2 and the allocator take for one.
 constexpr std::size_t kNodeBytes = 128;
 constexpr std::size_t kContentBytes = 32;  ///< besides the content's own length

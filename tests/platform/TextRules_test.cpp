@@ -59,6 +59,15 @@ TEST(WithReplacedInvalidUTF8, LeavesValidTextAsItIs) {
     EXPECT_EQ(withReplacedInvalidUTF8(""), "");
 }
 
+TEST(AppendUTF8, WritesTheShortestFormOfEachLength) {
+    std::string text = "x";
+    for (unsigned codePoint : {0x7FU, 0x80U, 0x7FFU, 0x800U, 0xFFFFU, 0x10000U, 0x10FFFFU})
+        appendUTF8(text, codePoint);
+
+    EXPECT_EQ(text,
+              "x\x7F\xC2\x80\xDF\xBF\xE0\xA0\x80\xEF\xBF\xBF\xF0\x90\x80\x80\xF4\x8F\xBF\xBF");
+}
+
 TEST(UTF16Length, CountsTwoUnitsAboveTheBasicPlane) {
     EXPECT_EQ(utf16Length(""), 0U);
     EXPECT_EQ(utf16Length("abc"), 3U);

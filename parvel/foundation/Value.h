@@ -53,7 +53,8 @@ public:
     Value(std::shared_ptr<const Array> array) : m_storage(std::move(array)) {}
     Value(const Value&) = default;
     Value(Value&&) noexcept = default;
-    Value& operator=(const Value&) = default;
+    /// The other may lie within this value.
+    Value& operator=(const Value& other) { return *this = Value(other); }
     Value& operator=(Value&&) noexcept = default;
     /// Frees nested containers without recursion, however deep they are.
     ~Value();

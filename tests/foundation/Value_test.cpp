@@ -97,6 +97,18 @@ TEST(Value, OfEqualValueHashesAlike) {
     EXPECT_NE(Value("a").hash(), Value("b").hash());
 }
 
+TEST(Value, TakesTheValueOfOneWithinIt) {
+    for (const Value& inner : {Value("text"), Value(Number::real(1)), Value(Array{"a"})}) {
+        Value value(Array{inner});
+        value = (*value.as<Array>())[0];
+        EXPECT_EQ(value, inner);
+
+        const Value& same = value;
+        value = same;
+        EXPECT_EQ(value, inner);
+    }
+}
+
 TEST(Value, OfAnyDepthIsFreed) {
     { const Value deep = nested(kVeryDeep, "x"); }
     Value replaced = nested(kVeryDeep, "x");

@@ -28,9 +28,7 @@ inline std::string logText(const std::string& text) {
 inline std::string logText(const char* text) {
     return text ? text : "(null)";
 }
-inline std::string logText(bool flag) {
-    return flag ? "1" : "0";
-}
+/// Flags as 1 and 0.
 template <std::integral T>
 std::string logText(T number) {
     return std::to_string(number);

@@ -1,9 +1,13 @@
 #include "parvel/foundation/Date.h"
 
+#include "tests/support/TestRounds.h"
+
 #include <gtest/gtest.h>
 
+#include <cstdio>
 #include <ctime>
 #include <limits>
+#include <random>
 
 namespace parvel::testing {
 namespace {
@@ -22,6 +26,22 @@ TEST(Date, NowIsTheClockOfTheHost) {
 
 TEST(Date, PrintsLeapDaysAndTheTimeOfDay) {
     EXPECT_EQ(isoText(Date{99705600 + 3661}), "2004-02-29T01:01:01Z");
+}
+
+TEST(Date, AgreesWithTheHostsCalendar) {
+    std::mt19937_64 random(1);
+    std::uniform_int_distribution<std::int64_t> anySecond(-63113904000, 252423993599);
+    for (std::size_t round = 0; round < testRounds(5000); ++round) {
+        const std::int64_t seconds = anySecond(random);
+        const auto unixSeconds = static_cast<std::time_t>(seconds + kReferenceDateUnixSeconds);
+        std::tm time{};
+        ASSERT_NE(gmtime_r(&unixSeconds, &time), nullptr);
+        char expected[64];
+        std::snprintf(expected, sizeof expected, "%04d-%02d-%02dT%02d:%02d:%02dZ",
+                      time.tm_year + 1900, time.tm_mon + 1, time.tm_mday, time.tm_hour, time.tm_min,
+                      time.tm_sec);
+        ASSERT_EQ(isoText(Date{static_cast<double>(seconds)}), expected);
+    }
 }
 
 TEST(Date, PrintsAsManyFractionalDigitsAsTheValueNeeds) {

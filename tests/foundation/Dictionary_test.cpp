@@ -1,11 +1,11 @@
+#include "parvel/foundation/Value.h"
+#include "tests/support/TestRounds.h"
+
 #include <gtest/gtest.h>
 
 #include <algorithm>
 #include <map>
 #include <random>
-
-#include "parvel/foundation/Value.h"
-#include "tests/support/TestRounds.h"
 
 namespace parvel::testing {
 namespace {
@@ -96,6 +96,13 @@ TEST(Dictionary, MergesNothingAndItself) {
     Dictionary empty;
     empty.merge(dictionary);
     EXPECT_EQ(empty, dictionary);
+}
+
+TEST(Dictionary, MergesADictionaryThatItHolds) {
+    Dictionary dictionary{{"a", "1"}, {"inner", Dictionary{{"a", "2"}, {"inner", "3"}}}};
+    dictionary.merge(*dictionary.find("inner")->as<Dictionary>());
+
+    EXPECT_EQ(dictionary, (Dictionary{{"a", "2"}, {"inner", "3"}}));
 }
 
 TEST(Dictionary, CopiesWithoutGivenKeys) {

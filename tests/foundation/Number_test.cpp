@@ -4,6 +4,8 @@
 
 #include <cmath>
 #include <limits>
+#include <utility>
+#include <vector>
 
 namespace parvel::testing {
 namespace {
@@ -49,6 +51,29 @@ TEST(Number, ComparesWithoutRounding) {
     EXPECT_NE(Number::boolean(true), Number::signedInteger(2));
     EXPECT_NE(Number::signedInteger(1), Number::real(1.5));
     EXPECT_NE(Number::real(kInfinity), Number::real(-kInfinity));
+}
+
+TEST(Number, EqualsWhereTheExactValuesDo) {
+    static_assert(std::numeric_limits<long double>::digits >= 64, "holds every value exactly");
+    std::vector<std::pair<Number, long double>> numbers;
+    for (int power = 0; power <= 64; ++power) {
+        const double real = std::ldexp(1.0, power);
+        for (double value : {real, -real, std::nextafter(real, 0), std::nextafter(real, 1e300),
+                             std::nextafter(-real, 0), std::nextafter(-real, -1e300)})
+            numbers.emplace_back(Number::real(value), value);
+        for (std::uint64_t step : {std::uint64_t{0}, std::uint64_t{1}, kMostUnsigned}) {
+            const std::uint64_t whole = (power < 64 ? 1ULL << power : 0) + step;
+            const auto sign = static_cast<std::int64_t>(whole);
+            numbers.emplace_back(Number::unsignedInteger(whole), whole);
+            numbers.emplace_back(Number::signedInteger(sign), sign);
+        }
+    }
+    for (const auto& [left, leftValue] : numbers) {
+        for (const auto& [right, rightValue] : numbers) {
+            ASSERT_EQ(left == right, leftValue == rightValue) << leftValue << " " << rightValue;
+            ASSERT_TRUE(leftValue != rightValue || left.hash() == right.hash()) << leftValue;
+        }
+    }
 }
 
 TEST(Number, NaNEqualsNaNAlone) {

@@ -1,9 +1,9 @@
 #include "parvel/foundation/PVDigest.h"
 
-#include <gtest/gtest.h>
-
 #include "parvel/platform/Digest.h"
 #include "parvel/platform/Service.h"
+
+#include <gtest/gtest.h>
 
 namespace parvel::testing {
 namespace {

@@ -1,14 +1,14 @@
 #include "parvel/foundation/PVParvelLog.h"
 
+#include "tests/support/RecordedLog.h"
+#include "tests/support/TestRounds.h"
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <atomic>
 #include <mutex>
 #include <thread>
-
-#include "tests/support/RecordedLog.h"
-#include "tests/support/TestRounds.h"
 
 namespace parvel::testing {
 namespace {

@@ -1,5 +1,8 @@
 #include "parvel/platform/DateText.h"
 
+#include "parvel/platform/linux/DateTextICU.h"
+#include "tests/support/TestRounds.h"
+
 #include <gtest/gtest.h>
 #include <stdlib.h>
 
@@ -9,9 +12,6 @@
 #include <limits>
 #include <map>
 #include <thread>
-
-#include "parvel/platform/linux/DateTextICU.h"
-#include "tests/support/TestRounds.h"
 
 namespace parvel::testing {
 namespace {

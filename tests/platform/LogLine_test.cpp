@@ -1,11 +1,11 @@
+#include "parvel/platform/LogSink.h"
+#include "parvel/platform/linux/JournalFields.h"
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <cerrno>
 #include <vector>
-
-#include "parvel/platform/LogSink.h"
-#include "parvel/platform/linux/JournalFields.h"
 
 namespace parvel::testing {
 namespace {

@@ -31,8 +31,6 @@ public:
         m_isKnown = url.isFileURL() && m_store.list(url.path(), m_names) == 0;
     }
 
-    /// Whether there is none at all.
-    [[nodiscard]] bool isEmpty() const { return m_isKnown && m_names.empty(); }
     /// Whether asking for the attribute could give anything but its absence.
     [[nodiscard]] bool mayHold(std::string_view name) const {
         if (!m_isKnown)
@@ -56,8 +54,6 @@ std::optional<Dictionary> attributeDictionaryAtURL(const URL& url) {
     const URL& carrier = placeholder ? *placeholder : url;
 
     const StandingNames standing(carrier);
-    if (standing.isEmpty())
-        return Dictionary();
 
     // The first name is asked for in any case: the list can be had of a file that can't be read.
     Dictionary attributes;

@@ -175,5 +175,13 @@ TEST_F(AttributeDictionary, LogsNothingForAFileThatIsThere) {
     EXPECT_TRUE(log.lines().empty());
 }
 
+TEST_F(AttributeDictionary, IsNoneForAFileThatCanNotBeReadAlsoWithoutAttributes) {
+    const URL url = file();
+    WatchedStore store;
+    store.m_refused = PNMetadataXattrAssetID;
+
+    EXPECT_EQ(attributeDictionaryAtURL(url), std::nullopt);
+}
+
 }  // namespace
 }  // namespace parvel::testing

@@ -182,6 +182,14 @@ TEST(IdentityMetadata, HasTheURLAlone) {
     EXPECT_EQ(record->assetID(), std::nullopt);
 }
 
+TEST(IdentityMetadata, GivesTheURLBackExactlyAsItWasGiven) {
+    const MutableAssetPtr record =
+        PVAssetMetadata::identityMetadataWithStoreID_generatedID_url_error(
+            nullptr, nullptr, URL::fromString("file:///B%6Fok.EPUB"));
+
+    EXPECT_EQ(record->url().value().absoluteString(), "file:///B%6Fok.EPUB");
+}
+
 TEST(IdentityMetadata, IsReadFromADictionarysThreeKeys) {
     const Dictionary dictionary{{"itemId", integerValue(7)},
                                 {"PVGeneratedItemId", "G"},
@@ -303,6 +311,27 @@ TEST(CopyWithUpdates, LeavesTheReceiverAlone) {
 
     EXPECT_EQ(*record->backingDictionary(), (Dictionary{{"genre", "g"}, {"year", "1900"}}));
     EXPECT_EQ(*copy->backingDictionary(), (Dictionary{{"itemName", "T"}, {"year", "1900"}}));
+}
+
+// Deliberate: the explicit URL is not copied, nor is the cached kind.
+TEST(CopyWithUpdates, HasTheURLAndTheKindOfItsPath) {
+    const MutableAssetPtr record = recordOver({{"path", "/a.epub"}});
+    record->setBackingURL(URL::fileURLWithPath("/elsewhere.m4a"));
+    record->setAssetType(PVAssetTypePDF);
+
+    const MutableAssetPtr copy = record->copyWithUpdates([](PVMutableAssetMetadata&) {});
+
+    EXPECT_EQ(copy->url(), URL::fileURLWithPath("/a.epub"));
+    EXPECT_EQ(copy->assetType(), PVAssetTypeEPub);
+}
+
+TEST(CopyWithUpdates, ChangesNoEntryOfItsOwn) {
+    const Dictionary dictionary{{"path", "/A.EPUB"}, {"itemId", integerValue(0)}};
+
+    const MutableAssetPtr copy =
+        recordOver(dictionary)->copyWithUpdates([](PVMutableAssetMetadata&) {});
+
+    EXPECT_EQ(*copy->backingDictionary(), dictionary);
 }
 
 TEST(CopyWithUpdates, KeepsAURLThatTheCallbackSets) {

@@ -244,6 +244,13 @@ TEST(KeptInAttributes, AreBooksAndPDFsAlone) {
     EXPECT_FALSE(emptyRecord()->shouldUpdateXattrMetadata());
 }
 
+TEST(KeptInAttributes, AreRecordsByTheirKindAndNotByTheirURL) {
+    const MutableAssetPtr record = recordOver({{"path", "/a.m4a"}});
+    record->setAssetType(PVAssetTypeEPub);
+
+    EXPECT_TRUE(record->shouldUpdateXattrMetadata());
+}
+
 // The description.
 
 TEST(Description, IsTheContentLibraryRepresentation) {

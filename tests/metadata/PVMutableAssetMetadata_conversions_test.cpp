@@ -195,6 +195,16 @@ TEST(PVMutableAssetMetadata, StoresAnUploadErrorsDomainAndCodeAlone) {
     EXPECT_EQ(record->uploadError(), Error("PVPOSIXErrorDomain", 5));
 }
 
+TEST(PVMutableAssetMetadata, KeepsAnUploadErrorsCodeExactly) {
+    const MutableAssetPtr record = emptyRecord();
+
+    record->setUploadError(Error("D", -9007199254740993));
+
+    EXPECT_EQ(entriesOf(record).find("PVUploadErrorCode")->as<Number>()->kind(),
+              Number::Kind::Signed);
+    EXPECT_EQ(record->uploadError(), Error("D", -9007199254740993));
+}
+
 TEST(PVMutableAssetMetadata, RemovesBothKeysOfTheUploadError) {
     const MutableAssetPtr record = recordOver(
         {{"PVUploadErrorDomain", "D"}, {"PVUploadErrorCode", integerValue(5)}, {"genre", "g"}});

@@ -106,26 +106,6 @@ std::string withReplacedInvalidUTF8(std::string_view text) {
     return valid;
 }
 
-void appendUTF8(std::string& text, std::uint32_t codePoint) {
-    const auto append = [&text](std::uint32_t byte) { text += static_cast<char>(byte); };
-    const auto appendTail = [&](int shift) { append(0x80 | (codePoint >> shift & 0x3F)); };
-    if (codePoint < 0x80) {
-        append(codePoint);
-    } else if (codePoint < 0x800) {
-        append(0xC0 | codePoint >> 6);
-        appendTail(0);
-    } else if (codePoint < 0x10000) {
-        append(0xE0 | codePoint >> 12);
-        appendTail(6);
-        appendTail(0);
-    } else {
-        append(0xF0 | codePoint >> 18);
-        appendTail(12);
-        appendTail(6);
-        appendTail(0);
-    }
-}
-
 std::size_t utf16Length(std::string_view text) {
     std::size_t length = 0;
     for (char character : text) {

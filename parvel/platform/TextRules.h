@@ -27,8 +27,6 @@ void appendUTF8(std::string& text, std::uint32_t codePoint);
 [[nodiscard]] bool isValidUTF8(std::string_view text);
 /// The text with U+FFFD for each byte that is no part of valid UTF-8.
 [[nodiscard]] std::string withReplacedInvalidUTF8(std::string_view text);
-/// Appends a code point, which is no surrogate.
-void appendUTF8(std::string& text, std::uint32_t codePoint);
 /// The length in UTF-16 units of valid UTF-8 text.
 [[nodiscard]] std::size_t utf16Length(std::string_view text);
 /// The first UTF-16 units of valid UTF-8 text. A cut through a surrogate pair leaves U+FFFD for the

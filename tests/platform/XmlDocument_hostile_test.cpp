@@ -103,6 +103,17 @@ TEST(HostileXml, VeryManyNamespacesAreRefused) {
     EXPECT_FALSE(isAccepted(nested + times(200, "</a>")));
 }
 
+TEST(HostileXml, NamespacesAreNotSoughtWithoutEnd) {
+    std::string prefixed = "<n0:b";
+    for (int i = 0; i < 250; ++i)
+        prefixed += " n0:x" + std::to_string(i) + "=''";
+    const std::string deep = "<a" + attributes(100, "xmlns:n", "urn:x") + ">" + times(200, "<a>");
+    const std::string end = times(201, "</a>");
+
+    EXPECT_TRUE(isAccepted(deep + times(100, prefixed + "/>") + end));
+    EXPECT_FALSE(isAccepted(deep + times(2'000, prefixed + "/>") + end));
+}
+
 TEST(HostileXml, VeryManyDeclaredAttributesAreRefused) {
     std::string list;
     for (int i = 0; i < 3'000; ++i)

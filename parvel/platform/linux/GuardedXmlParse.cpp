@@ -10,7 +10,7 @@ namespace parvel {
 namespace {
 
 constexpr std::size_t kMaximumAttributes = 256;
-constexpr int kMaximumNamespacesInScope = 512;
+constexpr int kMaximumNamespacesInScope = 128;
 /// In slots of five an attribute, and well above kMaximumAttributes: the array grows by doubling.
 constexpr int kMaximumAttributeSlots = 3000;
 constexpr std::size_t kMaximumDoctypeBytes = 64 << 10;
@@ -106,11 +106,9 @@ struct GuardedXmlParse::Callbacks {
             return xmlSAX2StartElementNs(context, name, prefix, namespaceName, namespaceCount,
                                          namespaces, attributeCount, 0, attributes);
         self.deliver([&] {
-            self.startElement({name,
-                               prefix,
-                               namespaceName,
-                               {namespaces, pairs},
-                               self.replacingReferences({attributes, slots})});
+            const auto values = self.replacingReferences({attributes, slots});
+            if (!self.m_stopped)
+                self.startElement({name, prefix, namespaceName, {namespaces, pairs}, values});
         });
     }
 
@@ -146,6 +144,7 @@ struct GuardedXmlParse::Callbacks {
         const bool tooDeep = static_cast<xmlParserCtxt*>(context)->depth > kMaximumEntityDepth;
         if (tooDeep || !self.charge(self.m_entityBytes, kCostOfReference + lengthOf(entity),
                                     kMaximumEntityBytes)) {
+            // Null alone has the parser look the entity up by itself.
             self.stop();
             xmlStopParser(static_cast<xmlParserCtxt*>(context));
             return nullptr;
@@ -226,11 +225,6 @@ bool GuardedXmlParse::run(const Data& bytes, int options) {
     return document && parser()->wellFormed && !m_stopped;
 }
 
-void GuardedXmlParse::stop() {
-    m_stopped = true;
-    xmlStopParser(parser());
-}
-
 /// Hands an event on. An exception must not pass through the parser, so it waits until that is
 /// done.
 template <class Handler>
@@ -290,6 +284,8 @@ std::span<const xmlChar*> GuardedXmlParse::replacingReferences(
         if (m_attributes.empty())
             m_attributes.assign(attributes.begin(), attributes.end());
         const std::string& value = m_values.emplace_back(replacingReferences(begin, end));
+        if (m_stopped)
+            return {};  // the parser has freed the values
         m_attributes[slot + 3] = reinterpret_cast<const xmlChar*>(value.data());
         m_attributes[slot + 4] = m_attributes[slot + 3] + value.size();
     }
@@ -298,7 +294,7 @@ std::span<const xmlChar*> GuardedXmlParse::replacingReferences(
 
 std::string GuardedXmlParse::replacingReferences(const xmlChar* begin, const xmlChar* end) {
     std::string value;
-    while (begin != end) {
+    while (begin != end && !m_stopped) {
         const xmlChar* reference = std::find(begin, end, '&');
         value.append(begin, reference);
         begin = std::find(reference, end, ';');

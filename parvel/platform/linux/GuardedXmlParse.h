@@ -68,8 +68,10 @@ protected:
     GuardedXmlParse();
 
     [[nodiscard]] xmlParserCtxt* parser() const { return m_parser.get(); }
-    /// Ends the parse without success.
-    void stop();
+    /// Ends the parse without success; no further event is reported. The parser goes on over the
+    /// bytes that it has: what it reported stays valid until the handler returns.
+    void stop() { m_stopped = true; }
+    [[nodiscard]] bool isStopped() const { return m_stopped; }
 
     virtual void startElement(const StartTag& tag) = 0;
     virtual void endElement() = 0;

@@ -95,7 +95,8 @@ bool isPlain(std::string_view expression) {
     do {
         scanner.take("@");
         const std::string_view name = scanner.takeName();
-        if (name.empty() || name.find("::") != std::string_view::npos)
+        const bool isName = !name.empty() && name.find("::") == std::string_view::npos;
+        if (!isName && !(name.empty() && scanner.take("*")))
             return false;
         while (scanner.take("[")) {
             if (!takePlainPredicate(scanner))

@@ -14,6 +14,8 @@ constexpr std::size_t kMaximumElements = 200'000;
 constexpr int kMaximumNames = 50'000;
 /// Of bytes and tree together. A book's store metadata file is held beside them.
 constexpr std::size_t kMaximumMemory = 160 << 20;
+/// libxml2 seeks the namespace of each prefixed attribute from its element up to the root.
+constexpr std::size_t kMaximumNamespaceSearch = 50'000'000;
 /// What libxml2 and the allocator take for one.
 constexpr std::size_t kNodeBytes = 128;
 constexpr std::size_t kContentBytes = 32;  ///< besides the content's own length
@@ -39,7 +41,9 @@ void XmlTreeParse::startElement(const StartTag& tag) {
     std::size_t bytes = kNodeBytes + tag.namespaces.size() / 2 * kNamespaceBytes;
     for (std::size_t pair = 0; pair < tag.namespaces.size(); pair += 2)
         bytes += lengthOf(tag.namespaces[pair + 1]);
+    const auto way = static_cast<std::size_t>(parser()->nodeNr + parser()->nsNr / 2);
     for (std::size_t slot = 0; slot < tag.attributes.size(); slot += 5) {
+        m_namespaceSearch += tag.attributes[slot + 1] ? way : 0;
         const auto length =
             static_cast<std::size_t>(tag.attributes[slot + 4] - tag.attributes[slot + 3]);
         const bool isIdentifier = tag.attributes[slot + 1] == parser()->str_xml;
@@ -47,8 +51,10 @@ void XmlTreeParse::startElement(const StartTag& tag) {
         m_tree.scope.textBytes += length;
     }
     charge(1 + tag.namespaces.size() / 2 + tag.attributes.size() / 5 * 2, bytes);
-    if (++m_elements > kMaximumElements)
-        return stop();
+    if (++m_elements > kMaximumElements || m_namespaceSearch > kMaximumNamespaceSearch)
+        stop();
+    if (isStopped())
+        return;
     m_inText = false;
 
     // The values are final: without this libxml2 would look for references in them.

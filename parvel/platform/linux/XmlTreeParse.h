@@ -36,6 +36,7 @@ private:
     XmlTree m_tree;
     std::size_t m_memory = 0;
     std::size_t m_elements = 0;
+    std::size_t m_namespaceSearch = 0;
     bool m_inText = false;
 };
 

@@ -11,6 +11,7 @@
 
 #include <cstddef>
 #include <filesystem>
+#include <ostream>
 
 #include "tests/support/TemporaryDirectory.h"
 
@@ -36,6 +37,10 @@ std::string outcomeOf(Opener open, const std::string& directory, const char* pat
 struct PathAndOutcome {
     const char* path;
     const char* outcome;
+
+    friend void PrintTo(const PathAndOutcome& value, std::ostream* out) {
+        *out << '"' << value.path << '"';
+    }
 };
 
 class OpenBeneathTest : public ::testing::TestWithParam<PathAndOutcome> {

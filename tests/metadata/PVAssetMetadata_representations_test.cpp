@@ -268,6 +268,12 @@ TEST(Description, ShowsACoverAsText) {
     EXPECT_EQ(record->description(), "{PVCoverImageData = \"<data>\"; genre = \"g\"}");
 }
 
+TEST(Description, ShowsACoverOfAnyKindAsTheSameText) {
+    for (const Value& value : valuesOfEveryKind())
+        EXPECT_EQ(recordOver({{"PVCoverImageData", value}})->description(),
+                  "{PVCoverImageData = \"<data>\"}");
+}
+
 TEST(Description, LeavesTheRecordAlone) {
     const MutableAssetPtr record = recordOver(manyEntries());
 

@@ -3,61 +3,81 @@
 
 #include "cli/JsonMarks.h"
 #include "cli/ResultFormat.h"
+#include "cli/Utf8.h"
 #include "parvel/foundation/PropertyList.h"
 
 namespace parvel::cli {
 namespace {
 
-/// U+FFFD in place of each control character that XML has no form for.
-std::string withoutControls(std::string_view text) {
+/// How deep the library writes and reads property lists.
+constexpr int kDeepest = 512;
+/// The array that holds the results is the first level.
+constexpr int kResultDepth = 2;
+
+bool isNoXmlCharacter(char32_t codePoint) {
+    const bool isControl =
+        codePoint < 0x20 && codePoint != '\t' && codePoint != '\n' && codePoint != '\r';
+    return isControl || codePoint == 0xFFFE || codePoint == 0xFFFF;
+}
+
+/// U+FFFD in place of each character that XML has no form for.
+std::string writableText(std::string_view text) {
     std::string out;
-    for (const char c : text) {
-        const bool refused =
-            static_cast<unsigned char>(c) < 0x20 && c != '\t' && c != '\n' && c != '\r';
-        out += refused ? std::string_view("\uFFFD") : std::string_view(&c, 1);
+    out.reserve(text.size());
+    for (std::size_t offset = 0; offset < text.size();) {
+        const Character character = characterAt(text, offset).value_or(Character{0xFFFE, 1});
+        if (isNoXmlCharacter(character.codePoint))
+            out += "\uFFFD";
+        else
+            out += text.substr(offset, character.length);
+        offset += character.length;
     }
     return out;
 }
 
-std::optional<Value> writable(const Value& value);
+std::optional<Value> writable(const Value& value, int depth);
 
-Value writableArray(const Array& array) {
+Value writableArray(const Array& array, int depth) {
     std::vector<Value> values;
     for (const Value& value : array) {
-        if (std::optional<Value> kept = writable(value))
+        if (std::optional<Value> kept = writable(value, depth + 1))
             values.push_back(std::move(*kept));
     }
     return Array(std::move(values));
 }
 
-Value writableDictionary(const Dictionary& dictionary) {
+Value writableDictionary(const Dictionary& dictionary, int depth) {
     std::vector<Dictionary::Entry> entries;
     for (const auto& [key, value] : dictionary) {
-        if (std::optional<Value> kept = writable(value))
-            entries.push_back({withoutControls(key), std::move(*kept)});
+        if (std::optional<Value> kept = writable(value, depth + 1))
+            entries.push_back({writableText(key), std::move(*kept)});
     }
     return Dictionary(std::move(entries));
 }
 
-/// The value as a property list can hold it: without null markers, and a date outside the years 1
-/// to 9999 as JSON has it.
-std::optional<Value> writable(const Value& value) {
+Value writableDate(const Date& date) {
+    if (!isoText(date).empty())
+        return date;
+    return Dictionary{{std::string(kDateMark), Number::real(date.secondsSinceReferenceDate)}};
+}
+
+/// The value as a property list can hold it: without null markers and what is nested too deep, and
+/// a date outside the years 1 to 9999 as JSON has it.
+std::optional<Value> writable(const Value& value, int depth) {
+    const bool isContainer = value.as<Array>() || value.as<Dictionary>() || value.as<Date>();
+    if (isContainer && depth > kDeepest)
+        return std::nullopt;
     switch (value.typeID()) {
         case TypeID::Null:
             return std::nullopt;
         case TypeID::String:
-            return withoutControls(*value.as<String>());
-        case TypeID::Date: {
-            const Date date = *value.as<Date>();
-            if (!isoText(date).empty())
-                return value;
-            return Dictionary{
-                {std::string(kDateMark), Number::real(date.secondsSinceReferenceDate)}};
-        }
+            return writableText(*value.as<String>());
+        case TypeID::Date:
+            return writableDate(*value.as<Date>());
         case TypeID::Array:
-            return writableArray(*value.as<Array>());
+            return writableArray(*value.as<Array>(), depth);
         case TypeID::Dictionary:
-            return writableDictionary(*value.as<Dictionary>());
+            return writableDictionary(*value.as<Dictionary>(), depth);
         case TypeID::Number:
         case TypeID::Data:
             break;
@@ -92,7 +112,9 @@ Dictionary dictionaryOf(const Result& result) {
 class PropertyListFormat : public ResultFormat {
 public:
     void append(const Result& result, std::string& out) const override {
-        const std::optional<Data> list = xmlPropertyList(writableDictionary(dictionaryOf(result)));
+        // Never none, since all that the form can't hold was taken out.
+        const std::optional<Data> list =
+            xmlPropertyList(writableDictionary(dictionaryOf(result), kResultDepth));
         if (!list)
             return;
         std::vector<std::uint8_t> storage;

@@ -1,21 +1,50 @@
 #!/usr/bin/env python3
-"""Interrupts a command after its first result.
+"""Interrupts a command while it runs.
 
-usage: interrupt.py SIGNAL WORDS...      SIGNAL is INT or TERM; "a.epub" goes in, then nothing more
+usage: interrupt.py SIGNAL WORDS...        after its first result; "a.epub" goes in, then nothing more
+       interrupt.py --twice SIGNAL WORDS...  while it waits for somebody to read its results
 
-Prints what came out before the signal and the exit status.
+SIGNAL is INT or TERM. Prints what came out and the exit status.
 """
 
 import signal
 import subprocess
 import sys
+import time
 
-command = subprocess.Popen(sys.argv[2:], stdin=subprocess.PIPE, stdout=subprocess.PIPE, text=True)
-command.stdin.write("a.epub\n")
-command.stdin.flush()
-first = command.stdout.read(16)
-command.send_signal(signal.Signals["SIG" + sys.argv[1]])
-rest = command.stdout.read()  # ends although standard input stays open
-print(first)
-print("ends with", rest[-2:].strip())
-print("status", command.wait())
+
+def once(name, words):
+    command = subprocess.Popen(words, stdin=subprocess.PIPE, stdout=subprocess.PIPE, text=True)
+    command.stdin.write("a.epub\n")
+    command.stdin.flush()
+    print(command.stdout.read(16))
+    command.send_signal(signal.Signals["SIG" + name])
+    rest = command.stdout.read()  # ends although standard input stays open
+    print("ends with", rest[-2:].strip())
+    print("status", command.wait())
+
+
+def state_of(command):
+    with open(f"/proc/{command.pid}/stat") as file:
+        return file.read().rsplit(")", 1)[1].split()[0]
+
+
+def twice(name, words):
+    command = subprocess.Popen(words, stdin=subprocess.DEVNULL, stdout=subprocess.PIPE)
+    command.stdout.read(1)
+    idle = 0
+    while idle < 20:  # until it does nothing but wait, which it does for as long as nobody reads
+        time.sleep(0.01)
+        idle = idle + 1 if state_of(command) == "S" else 0
+    command.send_signal(signal.Signals["SIG" + name])
+    time.sleep(0.2)
+    print("after the first:", "runs" if command.poll() is None else "has ended")
+    command.send_signal(signal.Signals["SIG" + name])
+    print("status", command.wait(10))
+
+
+if __name__ == "__main__":
+    if sys.argv[1] == "--twice":
+        twice(sys.argv[2], sys.argv[3:])
+    else:
+        once(sys.argv[1], sys.argv[2:])

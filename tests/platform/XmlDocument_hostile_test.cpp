@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include "parvel/platform/XmlDocument.h"
+#include "tests/support/TestRounds.h"
 
 namespace parvel::testing {
 namespace {
@@ -194,6 +195,48 @@ TEST(HostileXml, ALookupInALongListIsEvaluated) {
     ASSERT_TRUE(last.first);
     EXPECT_EQ(book->stringValue(last.first->node), "found");
     EXPECT_TRUE(book->evaluate(nullptr, "/a/b[@id='same']").first);
+}
+
+/// How many of a document's damaged copies still parse. Those are asked for all that they hold.
+int readableAfterDamage(std::string_view good, std::size_t rounds) {
+    int readable = 0;
+    std::uint32_t random = 1;
+    const auto next = [&](std::size_t limit) {
+        random = random * 1664525 + 1013904223;
+        return (random >> 8) % limit;
+    };
+    for (std::size_t round = 0; round < rounds; ++round) {
+        std::string bad(good);
+        for (std::size_t changes = 1 + next(3); changes > 0; --changes) {
+            const std::size_t place = next(bad.size());
+            if (next(2) == 0)
+                bad[place] = static_cast<char>(next(256));
+            else
+                bad.insert(place, good, next(good.size()), next(16));
+        }
+        const auto book = document(bad);
+        if (!book)
+            continue;
+        ++readable;
+        for (const char* expression :
+             {"/*", "/a/b[@y='x']", "//@*", "//text()", "//namespace::*"}) {
+            const XPathResult found = book->evaluate(nullptr, expression);
+            if (found.first)
+                (void)book->stringValue(found.first->node);
+        }
+    }
+    return readable;
+}
+
+TEST(HostileXml, DamagedDocumentsEndWell) {
+    constexpr std::string_view good =
+        "<?xml version='1.0'?><!DOCTYPE a [<!ENTITY e 'x&f;'><!ENTITY f '&#38;#60;<i>y</i>'>"
+        "<!ENTITY % p '<!ENTITY g \"z\">'>%p;<!ATTLIST b x CDATA 'd' y ID #IMPLIED>"
+        "<!ENTITY s SYSTEM 'file:///nowhere'>]><a xmlns:n='urn:n'>&e;<b y='&g;&amp;' n:z=''/>"
+        "<n:c xmlns='urn:c'><!-- c --><?p i?><![CDATA[<]]>&s;&e;</n:c></a>";
+    ASSERT_TRUE(isAccepted(good));
+
+    EXPECT_GT(readableAfterDamage(good, testRounds(5'000)), 0);
 }
 
 }  // namespace

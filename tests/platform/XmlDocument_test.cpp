@@ -2,6 +2,10 @@
 
 #include <gtest/gtest.h>
 
+#include <atomic>
+#include <thread>
+#include <vector>
+
 #include "parvel/foundation/Error.h"
 #include "tests/support/TemporaryDirectory.h"
 
@@ -221,6 +225,23 @@ TEST(XmlDocument, OpensNoExternalEntity) {
     EXPECT_EQ(valueIn("<!DOCTYPE a [<!ENTITY % p SYSTEM '" + pe + "'>%p;]><a>--</a>", "/a"), "--");
     EXPECT_EQ(valueIn("<!DOCTYPE a [<!ENTITY e SYSTEM '" + canary + "'>]><a x='&e;'/>", "/a/@x"),
               "no document");
+}
+
+TEST(XmlDocument, ReadsDifferentDocumentsOnDifferentThreads) {
+    std::atomic<int> good = 0;
+    std::vector<std::thread> threads;
+    for (int thread = 0; thread < 4; ++thread) {
+        threads.emplace_back([&good] {
+            for (int round = 0; round < 100; ++round) {
+                good += valueAt(metadataOf(parsed(kBook)), "dc:identifier[2]") == "second";
+                good += parsed("<a>&undefined;</b>") == nullptr;
+            }
+        });
+    }
+    for (std::thread& thread : threads)
+        thread.join();
+
+    EXPECT_EQ(good, 800);
 }
 
 TEST(XmlDocument, IsQuietOnStandardError) {

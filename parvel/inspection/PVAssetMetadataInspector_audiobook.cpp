@@ -15,7 +15,7 @@ PVAssetMetadataInspector::_audiobook_metadataForAssetAtURL_preloadedMetadata_inc
     if (!asset)
         return fail(error, makeNoAssetIDError(url));
 
-    const MutableAssetPtr record = PVAssetMetadata::metadataWithURL_dictionary(url, nullptr);
+    MutableAssetPtr record = PVAssetMetadata::metadataWithURL_dictionary(url, nullptr);
     const auto songID = asset->text(MediaTag::SongID);
     const auto storeID = songID ? std::optional<Value>(*songID) : std::nullopt;
     record->setStoreID(storeID ? &*storeID : nullptr);

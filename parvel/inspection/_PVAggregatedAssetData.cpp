@@ -59,6 +59,7 @@ _PVAggregatedAssetData::metadataWithPreloadedMetadata_includeCover_error(
         m_url, opf, shared_from_this());
     aggregate->setBazaarMetadata(store);
     aggregate->setPreloadedMetadata(preloadedMetadata);
+    // Deliberate: the start line has another prefix.
     PVParvelLog().debug("aggregateMetadata: end {success: %d}", true);
     return aggregate;
 }

@@ -74,6 +74,7 @@ AssetPtr _PVxPubMetadataInspector::bazaarMetadataFromData_url_error(const Data* 
         return PVAssetMetadata::metadataWithURL_dictionary(
             url, PVDynamicCast(classOf<Dictionary>, &*list));
     } catch (const MalformedInput&) {
+        // Deliberate: the misspelling is part of the text.
         PVParvelLog().error("Exception while parsing Bazaar Metadta");
         return nullptr;
     }

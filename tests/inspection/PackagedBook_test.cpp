@@ -2,8 +2,6 @@
 #include <gtest/gtest.h>
 
 #include "parvel/inspection/_PVxPubMetadataInspector.h"
-#include "parvel/platform/ResourceQueries.h"
-#include "parvel/platform/Service.h"
 #include "tests/support/EpubBuilder.h"
 #include "tests/support/RecordedLog.h"
 #include "tests/support/Records.h"
@@ -130,6 +128,18 @@ TEST_P(PackagedBookOfEitherShape, TheStoreFilesCoverIsTheOnlyOneTried) {
     EXPECT_EQ(m_error, std::nullopt);
 }
 
+TEST_P(PackagedBookOfEitherShape, APreviewsStoreFileNamesTheCoverToo) {
+    const URL url = build(EpubBuilder{}
+                              .opf(opfWithCover("c.jpg"))
+                              .file("OPS/c.jpg", "the OPF's")
+                              .store(storeFileText("<key>isPreview</key><true/><key>book-info</key>"
+                                                   "<dict><key>cover-image-path</key>"
+                                                   "<string>store.jpg</string></dict>"))
+                              .file("store.jpg", "the store's"));
+
+    EXPECT_EQ(coverOf(url), bytes("the store's"));
+}
+
 TEST_P(PackagedBookOfEitherShape, AMissingCoverNeverFailsIt) {
     const URL url = build(EpubBuilder{}.opf(opfWithCover("absent.jpg")));
 
@@ -158,6 +168,18 @@ TEST_P(PackagedBookOfEitherShape, AnUnusableOPFIsNone) {
     m_error.reset();
     EXPECT_FALSE(read(build(EpubBuilder{}.opf("<package/>"), "b.epub")));
     EXPECT_EQ(m_error, std::nullopt);
+}
+
+TEST_P(PackagedBookOfEitherShape, AnEmptyOPFPathNamesNoOPF) {
+    const URL url = build(EpubBuilder{}.container(containerText("")));
+    const RecordedLog log;
+
+    EXPECT_FALSE(read(url));
+
+    ASSERT_TRUE(m_error);
+    EXPECT_EQ(m_error->code(), static_cast<std::int64_t>(PVFileErrorCode::Corrupt));
+    EXPECT_EQ(log.lines()[1], GetParam() == Shape::Zipped ? "default Failed to extract opf data"
+                                                          : "default Failed to get opf data");
 }
 
 TEST_F(PackagedBook, WithoutAURLIsMissingTheURL) {
@@ -279,7 +301,6 @@ TEST_F(PackagedBook, ExpandedDropsALeadingSlashOfAPath) {
 TEST_F(PackagedBook, ExpandedReadsNothingOutsideThePackage) {
     m_folder.write("outside.opf", opfText(""));
     m_folder.write("outside.jpg", "secret");
-    std::filesystem::create_directory(m_folder / "links.epub");
     const URL opfOutside =
         EpubBuilder{}.container(containerText("../outside.opf")).expand(m_folder / "a.epub");
     const URL coverOutside =
@@ -338,13 +359,14 @@ TEST_F(PackagedBook, ThatIsNoArchiveGivesTheArchiveReadersError) {
                             "debug metadataCompressed: end {success: 0"));
 }
 
-TEST_F(PackagedBook, ZippedWithoutAContainerGivesNoErrorAndNoLineOfItsOwn) {
+TEST_F(PackagedBook, ZippedWithoutAContainerLeavesTheErrorAndHasNoLineOfItsOwn) {
     const URL url = EpubBuilder{}.without("META-INF/container.xml").zip(m_folder / "book.epub");
+    m_error = makeNoIdentityError();
     const RecordedLog log;
 
     EXPECT_FALSE(read(url));
 
-    EXPECT_EQ(m_error, std::nullopt);
+    EXPECT_EQ(m_error, makeNoIdentityError());
     EXPECT_THAT(log.lines(),
                 ElementsAre("debug metadataCompressed: start", "default Failed to get opf data",
                             "debug metadataCompressed: end {success: 0"));

@@ -5,8 +5,6 @@
 
 #include "parvel/inspection/PVAssetMetadataInspector.h"
 #include "parvel/inspection/_PVxPubMetadataInspector.h"
-#include "parvel/metadata/PVAssetMetadataKeys.h"
-#include "parvel/platform/FileReader.h"
 #include "parvel/platform/MalformedInput.h"
 #include "parvel/platform/PropertyList.h"
 #include "parvel/platform/Service.h"

@@ -54,7 +54,6 @@ std::optional<Dictionary> attributeDictionaryAtURL(const URL& url) {
     const URL& carrier = placeholder ? *placeholder : url;
 
     const StandingNames standing(carrier);
-
     // The first name is asked for in any case: the list can be had of a file that can't be read.
     Dictionary attributes;
     for (const std::string_view name : readNames) {

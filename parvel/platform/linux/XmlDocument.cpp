@@ -103,7 +103,8 @@ std::optional<std::string> Libxml2Document::attribute(const void* element,
 xmlNode* Libxml2Document::nodeFrom(const void* node) const {
     if (!node)
         return reinterpret_cast<xmlNode*>(m_tree.document.get());
-    return static_cast<xmlNode*>(const_cast<void*>(node));
+    void* const handle = const_cast<void*>(node);  // NOLINT(*-const-cast): libxml2 has no const
+    return static_cast<xmlNode*>(handle);
 }
 
 /// Makes the context ready: its prefixes bound, its limit set.

@@ -41,8 +41,8 @@ void XmlTreeParse::startElement(const StartTag& tag) {
     std::size_t bytes = kNodeBytes + tag.namespaces.size() / 2 * kNamespaceBytes;
     for (std::size_t pair = 0; pair < tag.namespaces.size(); pair += 2)
         bytes += lengthOf(tag.namespaces[pair + 1]);
-    const auto way = static_cast<std::size_t>(parser()->nodeNr) +
-                     static_cast<std::size_t>(parser()->nsNr / 2);
+    const auto way =
+        static_cast<std::size_t>(parser()->nodeNr) + static_cast<std::size_t>(parser()->nsNr / 2);
     for (std::size_t slot = 0; slot < tag.attributes.size(); slot += 5) {
         m_namespaceSearch += tag.attributes[slot + 1] ? way : 0;
         const auto length =

@@ -536,7 +536,7 @@ def folders():
                 out.write(plistlib.dumps({'book-info': {'cover-image-path': path}}))
         f('stored-' + n, swapped('BazaarMetadata.plist', store), 'record', 'the cover path of the store file')
 
-    put('asset-link', link('folder-control.epub'), 'record', 'a link to a sound book')
+    put('asset-link', link(FOLDER + '/folder-control.epub'), 'record', 'a link to a sound book')
     put('asset-link-self', link('asset-link-self.epub'), 'error', 'a link to itself')
     put('asset-link-root', link('/'), 'error', 'a link to the root folder')
     put('asset-link-zero', link('/dev/zero'), 'error', 'a link to an endless device')

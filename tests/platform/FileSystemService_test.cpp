@@ -1,6 +1,7 @@
 #include "parvel/platform/FileSystemService.h"
 
 #include <fcntl.h>
+#include <sys/fsuid.h>
 #include <sys/stat.h>
 #include <sys/xattr.h>
 #include <unistd.h>
@@ -34,6 +35,8 @@ std::vector<std::string> namesIn(const fs::path& folder) {
 }
 
 using Names = std::vector<std::string>;
+
+constexpr uid_t kNobody = 65534;
 
 void setAttribute(const std::string& path, const char* name, std::string_view value) {
     ASSERT_EQ(setxattr(path.c_str(), name, value.data(), value.size(), 0), 0) << strerror(errno);
@@ -358,6 +361,22 @@ TEST_F(FileSystem, RemovingALinkLeavesItsTarget) {
     EXPECT_TRUE(m_service->removeItem(m_folder.url("link")));
 
     EXPECT_EQ(namesIn(m_folder.path()), Names{"target"});
+}
+
+TEST_F(FileSystem, APackageOfFoldersThatForbidChangesIsRemovedByItsOwner) {
+    m_folder.write("a/b/c", "1");
+    fs::permissions(m_folder / "a/b", fs::perms{0});
+    fs::permissions(m_folder / "a", fs::perms{0500});
+    // The system's first user may do anything; another one, here nobody, has to be let in.
+    for (const char* name : {"", "a", "a/b", "a/b/c"})
+        (void)!chown((m_folder / name).c_str(), kNobody, kNobody);
+    setfsuid(geteuid() == 0 ? kNobody : geteuid());
+
+    const bool isRemoved = m_service->removeItem(m_folder.url("a"), &m_error);
+    setfsuid(geteuid());
+
+    EXPECT_TRUE(isRemoved);
+    EXPECT_EQ(namesIn(m_folder.path()), Names{});
 }
 
 TEST_F(FileSystem, RemovingNothingIsAnError) {

@@ -23,6 +23,8 @@ namespace parvel::host {
 
 namespace {
 
+constexpr std::string_view kAsidePrefix = ".parvel-aside-";
+
 int status(const std::string& path, struct stat& result) {
     return ::lstat(path.c_str(), &result) == 0 ? 0 : errno;
 }
@@ -115,16 +117,24 @@ int publish(const StagedCopy& staged, const std::string& destination) {
     return error;
 }
 
+/// Removes the item that a copy now stands for. An error means that it still stands whole under its
+/// name; what may be left of it elsewhere, hidden, is none.
+int discardCopied(const std::string& source) {
+    const int error = discardItem(source);
+    return error != 0 && itemStandsAt(source) ? error : 0;
+}
+
 int moveAcrossFileSystems(const std::string& source, const std::string& destination) {
     if (const int error = copyExclusively(source, destination))
         return error;
-    const int error = discardItem(source);
+    const int error = discardCopied(source);
     if (error != 0)
         (void)discardItem(destination);
     return error;
 }
 
-/// For file systems that can't exchange two names: the old item steps aside, and back on a failure.
+/// For file systems that can't exchange two names: the old item steps aside, under a hidden name
+/// that nobody clears, and goes once the new one stands in its place; it comes back on a failure.
 int exchangeWithoutFlag(const std::string& replacement, const std::string& existing) {
     struct stat oldItem {};
     struct stat newItem {};
@@ -134,17 +144,15 @@ int exchangeWithoutFlag(const std::string& replacement, const std::string& exist
         return error;
     if (!S_ISDIR(oldItem.st_mode) && !S_ISDIR(newItem.st_mode))
         return plainRename(replacement, existing);
-    int error = 0;
-    const auto folder = StagingFolder::makeIn(parentFolderOf(existing), error);
-    if (!folder)
+    const std::string aside = pathAppending(parentFolderOf(existing), randomName(kAsidePrefix));
+    if (const int error = renameExclusively(existing, aside))
         return error;
-    const std::string aside = pathAppending(folder->path(), "item");
-    if ((error = plainRename(existing, aside)) != 0)
+    if (const int error = renameExclusively(replacement, existing)) {
+        (void)renameExclusively(aside, existing);
         return error;
-    if ((error = renameExclusively(replacement, existing)) == 0)
-        return 0;
-    (void)renameExclusively(aside, existing);
-    return error;
+    }
+    (void)discardItem(aside);
+    return 0;
 }
 
 /// After it the new item stands at `existing`, and the old one, if anywhere, at `replacement`.
@@ -170,7 +178,7 @@ int replaceAcrossFileSystems(const std::string& existing, const std::string& rep
         return error;
     error = syncFolder(parentFolderOf(existing));
     if (error == 0)
-        error = discardItem(replacement);
+        error = discardCopied(replacement);
     // The old item, where it still stands in the staging folder, comes back after a failure.
     if (error != 0)
         (void)renameWithFlags(staged->path, existing, RENAME_EXCHANGE);

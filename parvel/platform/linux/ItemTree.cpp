@@ -254,6 +254,26 @@ FileDescriptor folderAbove(int folder, const struct stat& expected) {
     return above;
 }
 
+/// Removes one entry. A folder of our own that forbids it is opened up first.
+int unlinkEntry(int folder, const char* name, int flags) {
+    if (::unlinkat(folder, name, flags) == 0)
+        return 0;
+    if (errno != EACCES)
+        return errno;
+    if (::fchmod(folder, 0700) != 0)
+        return EACCES;
+    return ::unlinkat(folder, name, flags) == 0 ? 0 : errno;
+}
+
+/// Opens a folder on the way down, made readable first where it is our own and was not.
+FileDescriptor openForRemoval(int folder, const char* name) {
+    const int flags = O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
+    FileDescriptor below(::openat(folder, name, flags));
+    if (below || errno != EACCES || ::fchmodat(folder, name, 0700, AT_SYMLINK_NOFOLLOW) != 0)
+        return below;
+    return FileDescriptor(::openat(folder, name, flags));
+}
+
 /// Empties a folder with one descriptor at a time, however deep it is.
 int emptyFolder(FileDescriptor folder, bool& removedAny) {
     std::vector<Descent> path;
@@ -263,15 +283,14 @@ int emptyFolder(FileDescriptor folder, bool& removedAny) {
             return lastError();
         bool isDescending = false;
         while (const char* name = nextName(listing.get())) {
-            if (::unlinkat(folder.get(), name, 0) == 0) {
+            const int error = unlinkEntry(folder.get(), name, 0);
+            if (error == 0) {
                 removedAny = true;
                 continue;
             }
-            if (errno != EISDIR && errno != EPERM)
-                return errno;
-            const int error = errno;
-            FileDescriptor below(
-                ::openat(folder.get(), name, O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+            if (error != EISDIR && error != EPERM)
+                return error;
+            FileDescriptor below = openForRemoval(folder.get(), name);
             if (!below)
                 return errno == ENOTDIR || errno == ELOOP ? error : errno;
             struct stat status {};
@@ -289,8 +308,10 @@ int emptyFolder(FileDescriptor folder, bool& removedAny) {
         if (path.empty())
             return 0;
         folder = folderAbove(folder.get(), path.back().above);
-        if (!folder || ::unlinkat(folder.get(), path.back().name.c_str(), AT_REMOVEDIR) != 0)
+        if (!folder)
             return lastError();
+        if (const int error = unlinkEntry(folder.get(), path.back().name.c_str(), AT_REMOVEDIR))
+            return error;
         removedAny = true;
         path.pop_back();
     }
@@ -309,7 +330,7 @@ int removeTree(const std::string& path, bool* removedAny) {
         return errno;
     if (!S_ISDIR(status.st_mode))
         return ::unlink(path.c_str()) == 0 ? 0 : errno;
-    FileDescriptor folder(::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+    FileDescriptor folder = openForRemoval(AT_FDCWD, path.c_str());
     int error = folder ? emptyFolder(std::move(folder), any) : lastError();
     if (error == 0 && ::rmdir(path.c_str()) != 0)
         error = errno;
@@ -329,7 +350,14 @@ int discardItem(const std::string& path) {
     if (!staging)
         return error;
     const std::string aside = pathAppending(staging->path(), "discarded");
-    return ::rename(path.c_str(), aside.c_str()) == 0 ? 0 : errno;
+    if (::rename(path.c_str(), aside.c_str()) != 0)
+        return errno;
+    bool removedAny = false;
+    error = removeTree(aside, &removedAny);
+    // An item of which nothing could go is whole, and comes back.
+    if (error != 0 && !removedAny)
+        (void)::rename(aside.c_str(), path.c_str());
+    return error;
 }
 
 int syncItem(const std::string& path) {

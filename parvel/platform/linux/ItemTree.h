@@ -19,7 +19,9 @@ namespace parvel::host {
 /// before a failure.
 [[nodiscard]] int removeTree(const std::string& path, bool* removedAny = nullptr);
 
-/// Makes the item's name free in one step, then removes the item as far as it can be.
+/// Makes the item's name free in one step, then removes the item. Where nothing of it can be
+/// removed it stands under its name again; what is left of one that went in part is hidden, and
+/// cleared later.
 [[nodiscard]] int discardItem(const std::string& path);
 
 /// Writes an item's data and metadata through to the disk.

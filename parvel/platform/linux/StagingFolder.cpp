@@ -20,18 +20,6 @@ namespace {
 constexpr std::string_view kStagingPrefix = ".parvel-stage-";
 constexpr int kStagingAttempts = 100;
 
-std::string randomStagingName() {
-    static constexpr std::string_view letters = "abcdefghijklmnopqrstuvwxyz234567";
-    std::array<unsigned char, 12> bytes{};
-    // Twelve bytes come whole; a name that is taken all the same is only tried again.
-    if (::getrandom(bytes.data(), bytes.size(), 0) < 0)
-        bytes.fill(static_cast<unsigned char>(::getpid()));
-    std::string name(kStagingPrefix);
-    for (const unsigned char byte : bytes)
-        name += letters[byte % letters.size()];
-    return name;
-}
-
 /// Opens and locks the folder; closed when another holds it or it is gone.
 FileDescriptor lockedFolder(const std::string& path) {
     FileDescriptor folder(::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
@@ -65,6 +53,18 @@ void clearStale(const std::string& parent) {
 
 }  // namespace
 
+std::string randomName(std::string_view prefix) {
+    static constexpr std::string_view letters = "abcdefghijklmnopqrstuvwxyz234567";
+    std::array<unsigned char, 12> bytes{};
+    // Twelve bytes come whole; a name that is taken all the same is only tried again.
+    if (::getrandom(bytes.data(), bytes.size(), 0) < 0)
+        bytes.fill(static_cast<unsigned char>(::getpid()));
+    std::string name(prefix);
+    for (const unsigned char byte : bytes)
+        name += letters[byte % letters.size()];
+    return name;
+}
+
 bool isStagingName(std::string_view name) {
     return name.starts_with(kStagingPrefix);
 }
@@ -72,7 +72,7 @@ bool isStagingName(std::string_view name) {
 std::optional<StagingFolder> StagingFolder::makeIn(const std::string& parent, int& error) {
     clearStale(parent);
     for (int attempt = 0; attempt < kStagingAttempts; ++attempt) {
-        std::string path = pathAppending(parent, randomStagingName());
+        std::string path = pathAppending(parent, randomName(kStagingPrefix));
         if (::mkdir(path.c_str(), 0700) != 0) {
             if (errno == EEXIST)
                 continue;

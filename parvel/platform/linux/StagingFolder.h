@@ -2,6 +2,7 @@
 
 #include <optional>
 #include <string>
+#include <string_view>
 
 #include "parvel/platform/linux/FileDescriptor.h"
 
@@ -30,6 +31,9 @@ private:
     std::string m_path;
     FileDescriptor m_descriptor;  ///< holds the lock
 };
+
+/// The prefix and twelve letters and digits by chance.
+[[nodiscard]] std::string randomName(std::string_view prefix);
 
 /// Whether a name, one path component, is that of a staging folder.
 [[nodiscard]] bool isStagingName(std::string_view name);

@@ -350,8 +350,12 @@ int discardItem(const std::string& path) {
     if (!staging)
         return error;
     const std::string aside = pathAppending(staging->path(), "discarded");
-    if (::rename(path.c_str(), aside.c_str()) != 0)
-        return errno;
+    if (::rename(path.c_str(), aside.c_str()) != 0) {
+        // A folder that forbids changes can't change its parent either; it is going anyway.
+        if (errno != EACCES || ::fchmodat(AT_FDCWD, path.c_str(), 0700, AT_SYMLINK_NOFOLLOW) != 0 ||
+            ::rename(path.c_str(), aside.c_str()) != 0)
+            return errno;
+    }
     bool removedAny = false;
     error = removeTree(aside, &removedAny);
     // An item of which nothing could go is whole, and comes back.

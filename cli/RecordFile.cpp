@@ -13,6 +13,9 @@
 namespace parvel::cli {
 namespace {
 
+/// No record's file is this long; a device that has no end would be.
+constexpr std::size_t longestRecordFile = std::size_t{256} << 20;
+
 /// The whole file; none with errno set.
 std::optional<std::string> contentsOf(const std::string& path) {
     static constexpr std::size_t piece = 256 * 1024;
@@ -26,6 +29,10 @@ std::optional<std::string> contentsOf(const std::string& path) {
         contents.resize(size + piece);
         count = read(descriptor, contents.data() + size, piece);
         contents.resize(size + (count > 0 ? static_cast<std::size_t>(count) : 0));
+        if (contents.size() > longestRecordFile) {
+            count = -1;
+            errno = EFBIG;
+        }
     } while (count > 0 || (count < 0 && errno == EINTR));
     const int readErrno = errno;
     close(descriptor);

@@ -73,8 +73,10 @@ AssetPtr PVAssetMetadataFileManager::replaceUbiquitousAsset_withAsset_error(
         *existing, WritingIntent::ForReplacing, &coordinationError,
         [&](const std::optional<URL>& url) {
             if (url) {
-                m_fileManager->replaceItem(*url, *replacement, ReplaceOptions::Default, &resulting,
-                                           &kept);
+                const bool isReplaced = m_fileManager->replaceItem(
+                    *url, *replacement, ReplaceOptions::Default, &resulting, &kept);
+                if (isReplaced && !resulting)
+                    resulting = url;
                 return;
             }
             PVParvelLog().error("replaceUbiquitousAsset: Failed due to nil newURL provided.");

@@ -14,15 +14,12 @@ namespace {
 
 /// The item's place in the trash under its display name. None where that is no single name, which
 /// is a failed rename: nothing out of a book leads out of the trash or into another item there.
-std::optional<URL> renamedInTrash(const URL& trashed, const String& displayName,
-                                  std::string_view extension) {
-    // Deliberate: a missing extension is joined as a component, so that this rename fails and the
-    // item stays under the name that the trash gave it.
-    const String name =
-        extensionOfPath(displayName).empty() ? pathAppending(displayName, extension) : displayName;
-    if (!isOneComponent(name))
+std::optional<URL> renamedInTrash(const URL& trashed, const String& displayName) {
+    // Deliberate: a missing extension would be joined as a component of its own, so that the rename
+    // fails and the item stays under the name that the trash gave it.
+    if (extensionOfPath(displayName).empty() || !isOneComponent(displayName))
         return std::nullopt;
-    return trashed.deletingLastPathComponent().appendingPathComponent(name);
+    return trashed.deletingLastPathComponent().appendingPathComponent(displayName);
 }
 
 }  // namespace
@@ -40,7 +37,7 @@ AssetPtr PVAssetMetadataFileManager::trashAsset_error(const AssetPtr& asset, Err
     }
 
     if (const String* name = PVDynamicCast(classOf<String>, asset->displayName())) {
-        const auto renamed = renamedInTrash(*trashed, *name, url->pathExtension());
+        const auto renamed = renamedInTrash(*trashed, *name);
         if (renamed && m_fileManager->moveItem(*trashed, *renamed)) {
             PVParvelLog().debug("trashAsset: renamed asset in trash directory");
             trashed = renamed;

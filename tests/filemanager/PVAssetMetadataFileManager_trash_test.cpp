@@ -103,6 +103,16 @@ TEST_F(TakingAway, ADisplayNameDoesNotMoveTheAssetIntoAnotherTrashedItem) {
     EXPECT_EQ(names("data/Trash/files/My Book"), Names{});
 }
 
+TEST_F(TakingAway, AnEmptyDisplayNameKeepsTheTrashsOwnName) {
+    const auto book = asset("a.epub");
+    book->setDisplayName("");
+
+    const AssetPtr trashed = m_manager->trashAsset_error(book, &m_error);
+
+    ASSERT_TRUE(trashed);
+    EXPECT_EQ(trashed->trashedURL(), inTrash("a.epub"));
+}
+
 TEST_F(TakingAway, AMissingAssetCanNotBeTrashed) {
     const auto book = PVAssetMetadata::metadataWithURL_dictionary(m_folder.url("a.epub"), nullptr);
     RecordedLog log;

@@ -314,6 +314,15 @@ TEST_F(FileSystem, ACopyOfAPipeIsRefusedAndLeavesNothing) {
     EXPECT_EQ(namesIn(m_folder.path()), Names{"a"});
 }
 
+TEST_F(FileSystem, AFolderIsNotCopiedIntoItself) {
+    m_folder.write("a/b/x", "1");
+
+    EXPECT_FALSE(m_service->copyItem(m_folder.url("a"), m_folder.url("a/b/copy"), &m_error));
+
+    EXPECT_EQ(m_error, makePOSIXError(EINVAL, m_folder.url("a/b/copy")));
+    EXPECT_EQ(namesIn(m_folder.path() / "a/b"), Names{"x"});
+}
+
 TEST_F(FileSystem, ACopyDropsSetIdBits) {
     const std::string source = m_folder.write("a", "1");
     ASSERT_EQ(chmod(source.c_str(), 06755), 0);

@@ -44,12 +44,14 @@ bool isFlagUnsupported(int error) {
 
 /// Takes a free name by an exclusively made file, which the rename then replaces in one step.
 int renameOntoPlaceholder(const std::string& source, const std::string& destination) {
+    struct stat made {};
+    struct stat named {};
     const FileDescriptor placeholder(
         ::open(destination.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600));
-    if (!placeholder)
+    if (!placeholder || ::fstat(placeholder.get(), &made) != 0)
         return errno;
     const int error = plainRename(source, destination);
-    if (error != 0)
+    if (error != 0 && status(destination, named) == 0 && isSameItem(made, named))
         ::unlink(destination.c_str());
     return error;
 }
@@ -92,8 +94,30 @@ struct StagedCopy {
     std::string path;
 };
 
+/// Whether a folder is the item or lies below it: a copy into it would copy itself.
+bool liesWithin(const std::string& folder, const std::string& item) {
+    struct stat sought {};
+    struct stat here {};
+    if (::lstat(item.c_str(), &sought) != 0 || !S_ISDIR(sought.st_mode))
+        return false;
+    FileDescriptor place(::open(folder.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+    while (place && ::fstat(place.get(), &here) == 0) {
+        if (isSameItem(here, sought))
+            return true;
+        struct stat above {};
+        FileDescriptor parent(::openat(place.get(), "..", O_PATH | O_DIRECTORY | O_CLOEXEC));
+        if (!parent || ::fstat(parent.get(), &above) != 0 || isSameItem(above, here))
+            return false;
+        place = std::move(parent);
+    }
+    return false;
+}
+
 std::optional<StagedCopy> stageCopy(const std::string& source, const std::string& target,
                                     int& error) {
+    error = EINVAL;
+    if (liesWithin(parentFolderOf(target), source))
+        return std::nullopt;
     auto folder = StagingFolder::makeIn(parentFolderOf(target), error);
     if (!folder)
         return std::nullopt;
@@ -155,9 +179,11 @@ int exchangeWithoutFlag(const std::string& replacement, const std::string& exist
     return 0;
 }
 
-/// After it the new item stands at `existing`, and the old one, if anywhere, at `replacement`.
-int exchange(const std::string& replacement, const std::string& existing) {
+/// After it the new item stands at `existing`. The old one is gone, unless the two were exchanged
+/// in one step: then it stands at `replacement`, and the step can be taken back.
+int exchange(const std::string& replacement, const std::string& existing, bool& isExchanged) {
     const int error = renameWithFlags(replacement, existing, RENAME_EXCHANGE);
+    isExchanged = error == 0;
     return isFlagUnsupported(error) ? exchangeWithoutFlag(replacement, existing) : error;
 }
 
@@ -174,14 +200,17 @@ int replaceAcrossFileSystems(const std::string& existing, const std::string& rep
         return error;
     if ((error = inheritIfAsked(existing, staged->path, options)) != 0)
         return error;
-    if ((error = exchange(staged->path, existing)) != 0)
+    bool isExchanged = false;
+    if ((error = exchange(staged->path, existing, isExchanged)) != 0)
         return error;
     error = syncFolder(parentFolderOf(existing));
     if (error == 0)
         error = discardCopied(replacement);
-    // The old item, where it still stands in the staging folder, comes back after a failure.
-    if (error != 0)
-        (void)renameWithFlags(staged->path, existing, RENAME_EXCHANGE);
+    // The old item comes back from the staging folder after a failure; where it is gone, the new
+    // stays.
+    if (error == 0 || !isExchanged)
+        return 0;
+    (void)renameWithFlags(staged->path, existing, RENAME_EXCHANGE);
     return error;
 }
 
@@ -196,6 +225,12 @@ int replaceByOtherName(const std::string& existing, const std::string& replaceme
                             lastComponentOfPath(existing) == lastComponentOfPath(replacement);
     if (isSameName)
         return 0;
+    struct stat item {};
+    if (const int error = status(replacement, item))
+        return error;
+    // One name in two spellings, on a file system that ignores case: only its spelling changes.
+    if (item.st_nlink < 2 || S_ISDIR(item.st_mode))
+        return plainRename(replacement, existing);
     return ::unlink(replacement.c_str()) == 0 ? 0 : errno;
 }
 
@@ -243,17 +278,22 @@ int replace(const std::string& existing, const std::string& replacement, Replace
         return error;
     if (const int error = inheritIfAsked(existing, replacement, options))
         return error;
-    int error = exchange(replacement, existing);
+    bool isExchanged = false;
+    int error = exchange(replacement, existing, isExchanged);
     if (error == EXDEV)
         return replaceAcrossFileSystems(existing, replacement, options);
     if (error != 0)
         return error;
-    if ((error = syncParents(replacement, existing)) != 0) {
+    error = syncParents(replacement, existing);
+    if (!isExchanged)
+        return 0;
+    if (error != 0) {
         (void)renameWithFlags(replacement, existing, RENAME_EXCHANGE);
         return error;
     }
-    // The old item that can't go stays under the replacement's old name; the replacement stands.
-    if (itemStandsAt(replacement))
+    // An old item that can't go stays under the replacement's old name; the replacement stands.
+    struct stat left {};
+    if (status(replacement, left) == 0 && isSameItem(left, oldItem))
         (void)discardItem(replacement);
     return 0;
 }

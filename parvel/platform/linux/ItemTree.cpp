@@ -21,7 +21,7 @@ namespace parvel::host {
 
 namespace {
 
-constexpr int kMaximumDepth = 400;
+constexpr int kMaximumDepth = 200;  // three descriptors a level
 constexpr std::size_t kCopyPiece = std::size_t{1} << 20;
 constexpr long kFuseMagic = 0x65735546;
 constexpr std::string_view kUserAttributes = "user.";

@@ -11,7 +11,7 @@ namespace parvel::host {
 
 /// Copies an item to a name where nothing stands: data, `user.` attributes, mode without set-id
 /// bits, owner and group as far as allowed, times. A link is copied as a link. A device, pipe or
-/// socket is refused with EOPNOTSUPP, a tree deeper than 400 folders with ELOOP. What was made
+/// socket is refused with EOPNOTSUPP, a tree deeper than 200 folders with ELOOP. What was made
 /// stays after a failure: copy into a staging folder.
 [[nodiscard]] int copyTree(const std::string& source, const std::string& destination);
 

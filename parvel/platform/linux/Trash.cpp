@@ -16,6 +16,7 @@
 #include "parvel/foundation/URL.h"
 #include "parvel/platform/linux/FileDescriptor.h"
 #include "parvel/platform/linux/ItemMoves.h"
+#include "parvel/platform/linux/ItemTree.h"
 #include "parvel/platform/linux/Paths.h"
 
 namespace parvel::host {
@@ -107,7 +108,10 @@ std::optional<TrashFolder> volumeTrash(const std::string& topDirectory) {
                         (status.st_mode & S_ISVTX) != 0;
     for (const std::string& path : {isSafe ? pathAppending(shared, number) : std::string(),
                                     pathAppending(topDirectory, ".Trash-" + number)}) {
-        if (!path.empty() && makeTrash(path) == 0 && isOwnRealFolder(path))
+        if (path.empty() || (::mkdir(path.c_str(), 0700) != 0 && errno != EEXIST))
+            continue;
+        // Nothing is made in it before it is known to be no link to somewhere else.
+        if (isOwnRealFolder(path) && makeTrash(path) == 0)
             return TrashFolder{path, topDirectory};
     }
     return std::nullopt;
@@ -199,7 +203,9 @@ int moveInto(const TrashFolder& trash, const std::string& item, const std::strin
         if (error != 0)
             return error;
         resulting = pathAppending(pathAppending(trash.path, "files"), candidate);
-        error = moveExclusively(item, resulting);
+        error = syncFolder(pathAppending(trash.path, "info"));
+        if (error == 0)
+            error = moveExclusively(item, resulting);
         if (error == 0)
             return 0;
         ::unlink(info.c_str());

@@ -57,6 +57,7 @@ std::optional<Dictionary> PVAssetMetadataFileManager::extendedAttributesForAsset
     const std::optional<URL> url = asset ? asset->url() : std::nullopt;
     if (!url)
         return fail(error, makeMissingURLError());
+    // Deliberate: a failed read's error stays inside.
     return attributeDictionaryAtURL(*url);
 }
 

@@ -89,6 +89,7 @@ AssetPtr PVAssetMetadataInspector::_metadataForAssetAtURL_includeCover_error(
                 _typeSpecificMetadtaForAssetAtURL_includeCover_error(*url, includeCover, &failure);
         } catch (const MalformedInput&) {
             PVParvelLog().fault("Caught exception while trying to get asset metadata: %@", url);
+            // Deliberate: no error is made of it.
             failure.reset();
         }
     }
@@ -97,6 +98,7 @@ AssetPtr PVAssetMetadataInspector::_metadataForAssetAtURL_includeCover_error(
         PVParvelLog().info("Parsed Metadata: %@", asset);
     else
         PVParvelLog().info("Failed to get metadata: %@ url error: %@", url, failure);
+    // Deliberate: on success too.
     assign(error, std::move(failure));
     return asset;
 }

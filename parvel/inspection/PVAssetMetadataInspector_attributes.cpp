@@ -74,6 +74,7 @@ AssetPtr PVAssetMetadataInspector::immediatelyAvailableMetadataForAssetAtURL_err
     CloudStore& cloud = Service<CloudStore>::current();
     if (!url || !cloud.isPromisedItemReachable(*url, error))
         return nullptr;
+    // Deliberate: a failed status read gives no error.
     std::optional<DownloadingStatus> status;
     if (!cloud.downloadingStatus(*url, status))
         return nullptr;

@@ -16,6 +16,7 @@ PVAssetMetadataInspector::_audiobook_metadataForAssetAtURL_preloadedMetadata_inc
         return fail(error, makeNoAssetIDError(url));
 
     MutableAssetPtr record = PVAssetMetadata::metadataWithURL_dictionary(url, nullptr);
+    // Deliberate: as text, so that it stays as it is, 0 too.
     const auto songID = asset->text(MediaTag::SongID);
     const auto storeID = songID ? std::optional<Value>(*songID) : std::nullopt;
     record->setStoreID(storeID ? &*storeID : nullptr);

@@ -26,7 +26,8 @@ public:
     /// The tag's value as text, integers in decimal. None when the tag is missing, or its value
     /// can't be text or is longer than 1 MiB.
     [[nodiscard]] virtual std::optional<std::string> text(MediaTag tag) = 0;
-    /// The bytes as embedded, of a tag whose value is no text. None over the limit.
+    /// The bytes as embedded, of a tag whose value is neither text nor a number. None over the
+    /// limit.
     [[nodiscard]] virtual std::optional<Data> bytes(MediaTag tag, std::uint64_t limit) = 0;
 };
 

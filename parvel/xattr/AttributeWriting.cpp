@@ -46,10 +46,10 @@ void putChanged(Dictionary& changes, const Dictionary& stored, std::string_view 
         changes.set(name, *value);
 }
 
+/// A value that is no text is passed over: writing never removes an attribute.
 bool writeAttribute(const URL& url, std::string_view name, const Value& value, ErrorOut error) {
     const String* text = PVDynamicCast(classOf<String>, &value);
-    return pvamfm_setExtendedAttributeString_forKey_error(
-        url, text ? std::optional(*text) : std::nullopt, name, error);
+    return !text || pvamfm_setExtendedAttributeString_forKey_error(url, *text, name, error);
 }
 
 std::uint64_t fixPermissionsOfPackage(const URL& url) {
@@ -71,6 +71,7 @@ bool setAttributesForAsset(const AssetPtr& asset, ErrorOut error) {
     if (!url)
         return fail(error, makeMissingURLError());
 
+    // Deliberate: a failed read leaves its error with the caller and stops nothing.
     std::optional<String> identity;
     if (pvamfm_extendedAttributeString_forKey_error(*url, &identity, PNMetadataXattrAssetID,
                                                     error) &&
@@ -141,7 +142,7 @@ std::uint64_t fixPermissionsAndCalculateAllocatedSize(const URL& url, ErrorOut e
     } else {
         PVParvelLog().error("Failed to stat file for size");
     }
-    // Deliberate: whatever the size query left, the caller sees the directory query's error alone.
+    // Deliberate: written in every case, and an error only of the directory query.
     assign(error, directoryError);
     return size;
 }

@@ -12,7 +12,9 @@ namespace parvel {
 /// on it.
 
 /// Writes identity, title, author, genre and the explicit mark once: true, with nothing written,
-/// where the file carries an identity already. -1002 without a URL, -1006 without an asset ID.
+/// where the file carries an identity already. -1002 without a URL, -1006 without an asset ID. An
+/// identity that can't be read leaves its error in the slot, beside a writing that succeeds too.
+/// Deliberate.
 [[nodiscard]] bool setAttributesForAsset(const AssetPtr& asset, ErrorOut error);
 
 /// Writes those of title, author, genre and the explicit mark that differ. False without an error

@@ -3,6 +3,8 @@
 #include "parvel/foundation/ValueReadings.h"
 #include "parvel/inspection/PVAssetMetadataInspector.h"
 #include "parvel/metadata/PVMutableAssetMetadata.h"
+#include "parvel/platform/MediaTags.h"
+#include "parvel/platform/Service.h"
 #include "parvel/xattr/ExtendedAttributes.h"
 #include "parvel/xattr/PNMetadataXattr.h"
 #include "tests/support/MP4Builder.h"
@@ -119,6 +121,57 @@ TEST_F(Audiobook, TheInspectorReadsTheWholeWay) {
     ASSERT_TRUE(record);
     EXPECT_EQ(record->assetID(), "42");
     EXPECT_TRUE(record->coverImageData());
+}
+
+/// An audio file without tags that notes what is asked of it.
+class WatchedTags : public MediaTags {
+public:
+    class Asset : public MediaAsset {
+    public:
+        explicit Asset(std::vector<MediaTag>& asked) : m_asked(asked) {}
+        std::optional<std::string> text(MediaTag tag) override {
+            m_asked.push_back(tag);
+            return std::nullopt;
+        }
+        std::optional<Data> bytes(MediaTag tag, std::uint64_t) override {
+            m_asked.push_back(tag);
+            return std::nullopt;
+        }
+
+    private:
+        std::vector<MediaTag>& m_asked;
+    };
+    std::unique_ptr<MediaAsset> open(const URL&) override { return std::make_unique<Asset>(asked); }
+    std::vector<MediaTag> asked;
+
+private:
+    Service<MediaTags>::Replacement m_replacement{*this};
+};
+
+TEST_F(Audiobook, ACoverIsNotTouchedUnlessAskedFor) {
+    WatchedTags tags;
+
+    const auto record = read(m_folder.url("a.m4a"));
+
+    EXPECT_EQ(tags.asked,
+              (std::vector<MediaTag>{MediaTag::SongID, MediaTag::Artist, MediaTag::SongName}));
+    EXPECT_FALSE(record->storeID());
+    EXPECT_FALSE(record->author());
+    EXPECT_FALSE(record->title());
+}
+
+TEST_F(Audiobook, ASongIDIsKeptAsTextAlsoWhereItIsZero) {
+    const auto record = read(write(mp4::file(mp4::item("cnID", 21, mp4::number(0, 4)))));
+
+    ASSERT_TRUE(record->storeID());
+    EXPECT_EQ(*record->storeID(), Value("0"));
+}
+
+TEST_F(Audiobook, ItsCoverIsTheOneOfTheWholeRead) {
+    const auto cover =
+        PVAssetMetadataInspector::coverImageDataForAssetAtURL_error(write(soundAudiobook()));
+
+    EXPECT_EQ(cover, Data::copyOf(std::string_view("jpeg")));
 }
 
 }  // namespace

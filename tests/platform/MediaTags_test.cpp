@@ -205,6 +205,20 @@ TEST_F(AudioTags, APipeIsNoAssetAndIsNotWaitedFor) {
     EXPECT_FALSE(MediaTags::host().open(m_folder.url("missing.m4a")));
 }
 
+TEST_F(AudioTags, AURLOfNoFileIsNoAsset) {
+    m_folder.write("a.m4a", file(""));
+
+    EXPECT_FALSE(MediaTags::host().open(
+        *URL::fromString("http://example.com" + m_folder.url("a.m4a").path())));
+}
+
+TEST_F(AudioTags, ATextOrNumberIsNoCover) {
+    for (const unsigned type : {1U, 2U, 21U, 22U, 65U, 78U}) {
+        const auto asset = open(file(item("covr", type, number(1, 4))));
+        EXPECT_FALSE(asset->bytes(MediaTag::CoverArt, kLimit)) << type;
+    }
+}
+
 TEST_F(AudioTags, ALinkToAFileIsFollowed) {
     m_folder.write("a.m4a", file(item(kArtist, 1, "a")));
     ASSERT_EQ(symlink("a.m4a", (m_folder / "link.m4a").c_str()), 0);

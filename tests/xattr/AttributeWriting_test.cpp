@@ -7,6 +7,9 @@
 #include <gtest/gtest.h>
 
 #include "parvel/metadata/PVMutableAssetMetadata.h"
+#include "parvel/platform/DirectoryEnumerator.h"
+#include "parvel/platform/ResourceQueries.h"
+#include "parvel/platform/Service.h"
 #include "parvel/xattr/PNMetadataXattr.h"
 #include "tests/support/AttributeFolder.h"
 #include "tests/support/ForwardingXattrStore.h"
@@ -259,6 +262,139 @@ TEST_F(AttributeWriting, AnItemThatCanNotBeQueriedHasNoSizeAndSaysWhy) {
 
     EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::NoSuchFile, m_folder.url("gone")));
     EXPECT_EQ(log.lines(), std::vector<std::string>{"error Failed to state file for directory"});
+}
+
+/// A host that can't tell a file's size.
+class SizelessQueries : public ResourceQueries {
+public:
+    bool isReachable(const URL& url, ErrorOut error) override {
+        return host().isReachable(url, error);
+    }
+    std::optional<bool> isDirectory(const URL& url, ErrorOut error) override {
+        return host().isDirectory(url, error);
+    }
+    std::optional<std::uint64_t> totalAllocatedSize(const URL& url, ErrorOut error) override {
+        return fail(error, makePOSIXError(EIO, url));
+    }
+    std::optional<DirectoryRelationship> relationship(const URL& directory, const URL& item,
+                                                      ErrorOut error) override {
+        return host().relationship(directory, item, error);
+    }
+
+private:
+    Service<ResourceQueries>::Replacement m_replacement{*this};
+};
+
+TEST_F(AttributeWriting, AFileWhoseSizeCanNotBeToldGivesNoneAndNoError) {
+    const URL url = file();
+    m_error = makeNoIdentityError();
+    const SizelessQueries queries;
+    RecordedLog log;
+
+    EXPECT_EQ(fixPermissionsAndCalculateAllocatedSize(url, &m_error), 0U);
+
+    EXPECT_FALSE(m_error);
+    EXPECT_EQ(log.lines(), std::vector<std::string>{"error Failed to stat file for size"});
+}
+
+/// Shows one entry of which nothing can be told.
+class UnknownEntries : public DirectoryEnumerator {
+public:
+    class Unknown : public Entry {
+    public:
+        explicit Unknown(std::vector<unsigned>& modes) : m_modes(modes) {}
+        std::optional<bool> isDirectory() const override { return std::nullopt; }
+        std::optional<std::uint64_t> totalAllocatedSize() const override { return std::nullopt; }
+        bool setPermissions(unsigned mode) const override {
+            m_modes.push_back(mode);
+            return false;
+        }
+
+    private:
+        std::vector<unsigned>& m_modes;
+    };
+    void enumerate(const URL&, const std::function<void(const Entry&)>& visit) override {
+        visit(Unknown(modes));
+    }
+    std::vector<unsigned> modes;
+
+private:
+    Service<DirectoryEnumerator>::Replacement m_replacement{*this};
+};
+
+TEST_F(AttributeWriting, AnEntryOfUnknownKindGetsTheModeAndCountsNothing) {
+    fs::create_directory(m_folder / "p.epub");
+    UnknownEntries entries;
+
+    EXPECT_EQ(fixPermissionsAndCalculateAllocatedSize(m_folder.url("p.epub"), &m_error), 0U);
+
+    EXPECT_EQ(entries.modes, std::vector<unsigned>{0600U});
+    EXPECT_FALSE(m_error);
+}
+
+class UnreadableIdentity : public ForwardingXattrStore {
+public:
+    int size(const std::string&, const std::string&, std::size_t&) override { return EIO; }
+};
+
+TEST_F(AttributeWriting, AFailedReadOfTheIdentityIsTheErrorOfASetThatWrites) {
+    const URL url = file();
+    UnreadableIdentity store;
+
+    EXPECT_TRUE(setAttributesForAsset(record(url), &m_error));
+
+    EXPECT_EQ(m_error, makePOSIXError(EIO, std::nullopt));
+    EXPECT_EQ(stored(url, PNMetadataXattrTitle), "Title");
+}
+
+TEST_F(AttributeWriting, AFileWithoutAnIdentityIsNotUpdated) {
+    const URL url = file();
+
+    EXPECT_FALSE(updateAttributesForAsset(record(url), &m_error));
+
+    EXPECT_EQ(m_error, makeNoIdentityError());
+    EXPECT_EQ(stored(url, PNMetadataXattrTitle), Text());
+}
+
+TEST_F(AttributeWriting, AStoreIDIsTheIdentityThatIsWritten) {
+    const URL url = file();
+    const auto asset = record(url);
+    const Value storeID("42");
+    asset->setStoreID(&storeID);
+
+    EXPECT_TRUE(setAttributesForAsset(asset, &m_error));
+
+    EXPECT_EQ(stored(url, PNMetadataXattrAssetID), "42");
+}
+
+TEST_F(AttributeWriting, AValueThatIsNoTextRemovesNothing) {
+    const URL url = file();
+    setStored(url, PNMetadataXattrTitle, "kept");
+
+    EXPECT_TRUE(writeAttributes({{String(PNMetadataXattrTitle), Number::real(1)}}, url, &m_error));
+
+    EXPECT_EQ(stored(url, PNMetadataXattrTitle), "kept");
+}
+
+TEST(AttributeNames, AreTheseEighteen) {
+    EXPECT_EQ(PNMetadataXattrAssetID, "com.kestrel.Folium.assetID");
+    EXPECT_EQ(PNMetadataXattrTitle, "com.kestrel.Folium.title");
+    EXPECT_EQ(PNMetadataXattrSortTitle, "com.kestrel.Folium.sortTitle");
+    EXPECT_EQ(PNMetadataXattrAuthor, "com.kestrel.Folium.author");
+    EXPECT_EQ(PNMetadataXattrSortAuthor, "com.kestrel.Folium.sortAuthor");
+    EXPECT_EQ(PNMetadataXattrGenre, "com.kestrel.Folium.genre");
+    EXPECT_EQ(PNMetadataXattrComments, "com.kestrel.Folium.comments");
+    EXPECT_EQ(PNMetadataXattrBookDescription, "com.kestrel.Folium.bookDescription");
+    EXPECT_EQ(PNMetadataXattrYear, "com.kestrel.Folium.year");
+    EXPECT_EQ(PNMetadataXattrExplicit, "com.kestrel.Folium.explicit");
+    EXPECT_EQ(PNMetadataXattrLastOpened, "com.kestrel.Folium.lastOpened");
+    EXPECT_EQ(PNMetadataXattrFirstOpened, "com.kestrel.Folium.firstOpened");
+    EXPECT_EQ(PNMetadataXattrRating, "com.kestrel.Folium.rating");
+    EXPECT_EQ(PNMetadataXattrCollectionID, "com.kestrel.Folium.collectionID");
+    EXPECT_EQ(PNMetadataXattrReadingLocation, "com.kestrel.Folium.readingLocation");
+    EXPECT_EQ(PNMetadataXattrHighWaterMark, "com.kestrel.Folium.highWaterMark");
+    EXPECT_EQ(PNMetadataXattrOptionFlags, "com.kestrel.Folium.optionFlags");
+    EXPECT_EQ(PNMetadataXattrThumbnail, "com.kestrel.Folium.thumbnail");
 }
 
 }  // namespace

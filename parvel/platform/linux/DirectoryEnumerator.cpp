@@ -64,6 +64,8 @@ void enumerateFolder(FileDescriptor folder, int depth,
 class LinuxDirectoryEnumerator : public DirectoryEnumerator {
 public:
     void enumerate(const URL& directory, const std::function<void(const Entry&)>& visit) override {
+        if (!directory.isFileURL())
+            return;
         enumerateFolder(
             FileDescriptor(::open(directory.path().c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC)), 0,
             visit);

@@ -17,6 +17,7 @@
 #include "parvel/platform/MediaTags.h"
 #include "parvel/platform/TextRules.h"
 #include "parvel/platform/linux/FileDescriptor.h"
+#include "parvel/platform/linux/SystemCall.h"
 
 namespace parvel {
 
@@ -176,7 +177,7 @@ public:
 
     std::optional<Data> bytes(MediaTag tag, std::uint64_t limit) override {
         const auto value = valueOf(tag);
-        if (!value || value->type == kUTF8 || value->size > limit)
+        if (!value || isTextType(value->type) || isIntegerType(value->type) || value->size > limit)
             return std::nullopt;
         auto buffer = std::make_unique_for_overwrite<std::uint8_t[]>(value->size);
         if (!m_file.read(value->offset, buffer.get(), value->size))
@@ -187,6 +188,10 @@ public:
 private:
     static constexpr std::uint32_t kUTF8 = 1;
     static constexpr std::uint32_t kUTF16 = 2;
+    static constexpr bool isTextType(std::uint32_t type) { return type == kUTF8 || type == kUTF16; }
+    static constexpr bool isIntegerType(std::uint32_t type) {
+        return type == 21 || type == 22 || (type >= 65 && type <= 67) || (type >= 74 && type <= 78);
+    }
 
     struct TagValue {
         std::uint32_t type;
@@ -270,8 +275,7 @@ private:
 
     static std::optional<std::string> textOf(MediaTag tag, std::uint32_t type,
                                              const std::string& bytes) {
-        const bool isInteger = type == 21 || type == 22 || (type >= 65 && type <= 67) ||
-                               (type >= 74 && type <= 78) || (type == 0 && tag == MediaTag::SongID);
+        const bool isInteger = isIntegerType(type) || (type == 0 && tag == MediaTag::SongID);
         if (isInteger)
             return integerText(bytes);
         if (type == kUTF16)
@@ -308,7 +312,11 @@ bool beginsLikeMP4(WindowedFile& file) {
 class MP4Tags : public MediaTags {
 public:
     std::unique_ptr<MediaAsset> open(const URL& url) override {
-        FileDescriptor file(::open(url.path().c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
+        if (!url.isFileURL())
+            return nullptr;
+        FileDescriptor file(host::retried([&] {
+            return ::open(url.path().c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY);
+        }));
         struct stat status {};
         if (!file || ::fstat(file.get(), &status) != 0 || !S_ISREG(status.st_mode))
             return nullptr;

@@ -4,18 +4,18 @@
 // has moved the item leaves the new path in the lock file for whoever waits.
 
 #include <fcntl.h>
-#include <openssl/evp.h>
 #include <stdlib.h>
 #include <sys/stat.h>
 
 #include <algorithm>
-#include <array>
 #include <cerrno>
 #include <filesystem>
 #include <string>
 #include <vector>
 
+#include "parvel/platform/Digest.h"
 #include "parvel/platform/FileCoordinator.h"
+#include "parvel/platform/Service.h"
 #include "parvel/platform/linux/FileDescriptor.h"
 #include "parvel/platform/linux/Paths.h"
 
@@ -69,18 +69,16 @@ std::string lockFolder() {
     return {};
 }
 
+/// Empty, which is no lock file's name and fails the lock, where the host has no digest.
 std::string hexSHA256(std::string_view text) {
-    std::array<unsigned char, EVP_MAX_MD_SIZE> digest{};
-    unsigned length = 0;
-    if (EVP_Digest(text.data(), text.size(), digest.data(), &length, EVP_sha256(), nullptr) != 1)
-        return {};
     static constexpr std::string_view digits = "0123456789abcdef";
+    const auto digest = Service<Digest>::current().sha256(Data::copyOf(text));
     std::string hex;
-    for (unsigned i = 0; i < length; ++i) {
-        hex += digits[digest[i] >> 4];
-        hex += digits[digest[i] & 15];
+    for (const std::uint8_t byte : digest.value_or(Digest::SHA256{})) {
+        hex += digits[byte >> 4];
+        hex += digits[byte & 15];
     }
-    return hex;
+    return digest ? hex : std::string();
 }
 
 /// One name an item, by whatever links its folder is reached.

@@ -15,6 +15,8 @@
 #include <cerrno>
 
 #include "parvel/foundation/URL.h"
+#include "parvel/platform/ResourceQueries.h"
+#include "parvel/platform/Service.h"
 #include "parvel/platform/linux/ItemTree.h"
 #include "parvel/platform/linux/Paths.h"
 #include "parvel/platform/linux/StagingFolder.h"
@@ -96,21 +98,13 @@ struct StagedCopy {
 
 /// Whether a folder is the item or lies below it: a copy into it would copy itself.
 bool liesWithin(const std::string& folder, const std::string& item) {
-    struct stat sought {};
-    struct stat here {};
-    if (::lstat(item.c_str(), &sought) != 0 || !S_ISDIR(sought.st_mode))
+    struct stat copied {};
+    if (status(item, copied) != 0 || !S_ISDIR(copied.st_mode))
         return false;
-    FileDescriptor place(::open(folder.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
-    while (place && ::fstat(place.get(), &here) == 0) {
-        if (isSameItem(here, sought))
-            return true;
-        struct stat above {};
-        FileDescriptor parent(::openat(place.get(), "..", O_PATH | O_DIRECTORY | O_CLOEXEC));
-        if (!parent || ::fstat(parent.get(), &above) != 0 || isSameItem(above, here))
-            return false;
-        place = std::move(parent);
-    }
-    return false;
+    const auto relationship = Service<ResourceQueries>::current().relationship(
+        URL::fileURLWithPath(item), URL::fileURLWithPath(folder));
+    return relationship == DirectoryRelationship::Contains ||
+           relationship == DirectoryRelationship::Same;
 }
 
 std::optional<StagedCopy> stageCopy(const std::string& source, const std::string& target,

@@ -5,6 +5,8 @@
 #include <cerrno>
 #include <csignal>
 #include <cstdint>
+#include <system_error>
+#include <thread>
 
 #include <poll.h>
 #include <sys/eventfd.h>
@@ -17,26 +19,20 @@ std::atomic<bool> s_interrupted{false};
 /// Readable from the first interrupt on, so that a thread which waits for input wakes up.
 int s_wakeUp = -1;
 
-static_assert(std::atomic<bool>::is_always_lock_free, "the handler may only use lock-free data");
-
-void onSignal(int) {
-    if (s_interrupted.exchange(true))
-        _exit(kInterruptedExit);
-    const int savedErrno = errno;
-    const std::uint64_t one = 1;
-    // A full counter would wake the thread all the same.
-    static_cast<void>(!write(s_wakeUp, &one, sizeof one));
-    errno = savedErrno;
+bool isIgnored(int signal) {
+    struct sigaction action {};
+    return sigaction(signal, nullptr, &action) == 0 && action.sa_handler == SIG_IGN;
 }
 
-void watch(int signal) {
-    struct sigaction action {};
-    if (sigaction(signal, nullptr, &action) != 0 || action.sa_handler == SIG_IGN)
-        return;
-    action = {};
-    action.sa_handler = onSignal;
-    sigemptyset(&action.sa_mask);
-    sigaction(signal, &action, nullptr);
+void waitForSignals(sigset_t signals) {
+    int signal = 0;
+    while (sigwait(&signals, &signal) == 0) {
+        if (s_interrupted.exchange(true))
+            _exit(kInterruptedExit);
+        const std::uint64_t one = 1;
+        // A full counter would wake the thread all the same.
+        static_cast<void>(!write(s_wakeUp, &one, sizeof one));
+    }
 }
 
 }  // namespace
@@ -44,8 +40,20 @@ void watch(int signal) {
 void watchForInterrupts() {
     s_wakeUp = eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK);
     std::signal(SIGPIPE, SIG_IGN);
-    watch(SIGINT);
-    watch(SIGTERM);
+    sigset_t watched;
+    sigemptyset(&watched);
+    for (const int signal : {SIGINT, SIGTERM}) {
+        if (!isIgnored(signal))
+            sigaddset(&watched, signal);
+    }
+    // A thread of its own takes the signals, so that no thread's lock or wait can hold one up.
+    pthread_sigmask(SIG_BLOCK, &watched, nullptr);
+    try {
+        std::thread(waitForSignals, watched).detach();
+    } catch (const std::system_error&) {
+        // The system has no more threads: an interrupt then ends the program at once.
+        pthread_sigmask(SIG_UNBLOCK, &watched, nullptr);
+    }
 }
 
 bool interrupted() {

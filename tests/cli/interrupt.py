@@ -44,6 +44,9 @@ def twice(name, words):
 
 
 if __name__ == "__main__":
+    # A signal that this process ignores, as a background job's, would be ignored by the command too.
+    for name in ("SIGINT", "SIGTERM"):
+        signal.signal(signal.Signals[name], signal.SIG_DFL)
     if sys.argv[1] == "--twice":
         twice(sys.argv[2], sys.argv[3:])
     else:

@@ -38,7 +38,7 @@ public:
         : m_options(options),
           m_source(source),
           m_work(work),
-          m_format(ResultFormat::make(options.form)),
+          m_format(ResultFormat::make(options.form, options.makeText)),
           m_output(STDOUT_FILENO) {}
 
     int run();

@@ -18,6 +18,7 @@ using PathWork = std::function<Result(const std::string& path)>;
 struct BatchOptions {
     std::string_view command;
     OutputForm form = OutputForm::Text;
+    MakeResultFormat makeText = makeTextFormat;
     unsigned jobs = 1;
     LogLevel reasonLevel = LogLevel::Default;  ///< the least level that may hold a failure's reason
 };

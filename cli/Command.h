@@ -41,6 +41,7 @@ struct CommandEntry {
 /// and its `make…` function, and a line in Commands.cpp.
 std::span<const CommandEntry> commands();
 
+std::unique_ptr<Command> makeAttributesCommand();
 std::unique_ptr<Command> makeInspectCommand();
 std::unique_ptr<Command> makeMatchCommand();
 

@@ -43,6 +43,7 @@ private:
     [[nodiscard]] Result inspect(const std::string& path) const;
 
     bool m_cover = false;
+    bool m_immediate = false;
     bool m_store = false;
     std::optional<std::string> m_extraFile;
     std::optional<std::string> m_flavorName;
@@ -65,8 +66,13 @@ void InspectCommand::declare(CommandLine& line) {
                 "the part of the record to print: full, content-library,\n"
                 "store, progress or identity",
                 m_flavorName);
+    line.flag("--immediate",
+              "read what is known without a download: the whole asset\n"
+              "where synchronised storage has it on this device, else\n"
+              "the attributes on the file alone",
+              m_immediate);
     line.flag("--store", "read PATH itself as a store metadata file", m_store);
-    line.exclusive({"--cover", "--extra", "--store"});
+    line.exclusive({"--cover", "--extra", "--immediate", "--store"});
     m_paths.declare(line);
     line.option("-j,--jobs", "N", "inspect N assets at once; one a core if not given", m_jobs);
     m_output.declare(line);
@@ -84,7 +90,8 @@ int InspectCommand::run(std::vector<std::string> operands) {
         m_extra = PVMutableAssetMetadata::initWithURL_dictionary_validate(std::nullopt, extra.get(),
                                                                           /*validate=*/false);
     }
-    BatchOptions options{"inspect", m_output.form(), jobsFromOption(m_jobs)};
+    BatchOptions options{
+        .command = "inspect", .form = m_output.form(), .jobs = jobsFromOption(m_jobs)};
     // Why a store metadata file can't be read is said at the debug level alone.
     if (m_store)
         options.reasonLevel = LogLevel::Debug;
@@ -96,6 +103,8 @@ AssetPtr InspectCommand::recordAt(const URL& url, ErrorOut error) const {
     using Inspector = PVAssetMetadataInspector;
     if (m_store)
         return Inspector::bazaarMetadataForBookAssetAtURL_error(url, error);
+    if (m_immediate)
+        return Inspector::immediatelyAvailableMetadataForAssetAtURL_error(url, error);
     if (m_extra)
         return Inspector::metadataForAssetAtURL_extraMetadata_error(url, m_extra, error);
     if (m_cover)

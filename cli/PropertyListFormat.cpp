@@ -99,7 +99,7 @@ Dictionary dictionaryOf(const Result& result) {
     if (result.assetID)
         dictionary.set("assetID", *result.assetID);
     if (result.record)
-        dictionary.set("record", result.record);
+        dictionary.set(result.recordKey, result.record);
     if (result.error)
         dictionary.set("error", dictionaryOf(*result.error));
     for (const auto& [key, value] : result.fields)

@@ -18,10 +18,12 @@ struct Result {
     PVAssetType assetType = PVAssetTypeUnknown;
     std::optional<String> assetID;
     std::shared_ptr<const Dictionary> record;  ///< null is none
+    std::string_view recordKey = "record";     ///< what stands in its place has a key of its own
     std::optional<Error> error;
     std::vector<Dictionary::Entry> fields;  ///< what the command adds to the keys of every result
     std::string_view nothing = "no metadata";  ///< what there is where there is no record
-    std::string reason;  ///< what the log said about a failure, in words for a person
+    std::string reason;   ///< what the log said about a failure, in words for a person
+    std::string outcome;  ///< what was done, in words for a person, where that is the result's text
 
     [[nodiscard]] bool succeeded() const { return record && !error; }
 };

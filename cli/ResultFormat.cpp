@@ -28,7 +28,9 @@ void appendResult(const Result& result, std::string& out) {
         out += "null";
     out += R"(,"assetType":")";
     out += assetTypeName(result.assetType);
-    out += R"(","record":)";
+    out += "\",";
+    appendJsonString(result.recordKey, out);
+    out.push_back(':');
     if (result.record)
         appendJson(*result.record, out);
     else
@@ -68,10 +70,10 @@ public:
 
 }  // namespace
 
-std::unique_ptr<ResultFormat> ResultFormat::make(OutputForm form) {
+std::unique_ptr<ResultFormat> ResultFormat::make(OutputForm form, MakeResultFormat makeText) {
     switch (form) {
         case OutputForm::Text:
-            return makeTextFormat();
+            return makeText();
         case OutputForm::Json:
             return std::make_unique<JsonFormat>();
         case OutputForm::JsonLines:

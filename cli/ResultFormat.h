@@ -11,6 +11,17 @@ namespace parvel::cli {
 /// list.
 enum class OutputForm { Text, Json, JsonLines, PropertyList };
 
+class ResultFormat;
+using MakeResultFormat = std::unique_ptr<ResultFormat> (*)();
+
+/// A title in bold, and a line a field of the record.
+std::unique_ptr<ResultFormat> makeTextFormat();
+/// A line a result, with what was done.
+std::unique_ptr<ResultFormat> makeOutcomeFormat();
+/// A line an attribute.
+std::unique_ptr<ResultFormat> makeAttributesFormat();
+std::unique_ptr<ResultFormat> makePropertyListFormat();
+
 /// Writes results in one form. `append` may be called from many threads at once.
 class ResultFormat {
 public:
@@ -23,10 +34,9 @@ public:
     /// Whether results stand in the order of their PATHs.
     [[nodiscard]] virtual bool keepsOrder() const { return true; }
 
-    static std::unique_ptr<ResultFormat> make(OutputForm form);
+    /// `makeText` is the text that people get.
+    static std::unique_ptr<ResultFormat> make(OutputForm form,
+                                              MakeResultFormat makeText = makeTextFormat);
 };
-
-std::unique_ptr<ResultFormat> makeTextFormat();
-std::unique_ptr<ResultFormat> makePropertyListFormat();
 
 }  // namespace parvel::cli

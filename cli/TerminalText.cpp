@@ -135,6 +135,17 @@ std::vector<std::string> wrapped(std::string_view text, std::size_t width) {
     return lines;
 }
 
+void appendField(std::string_view label, std::string_view text, std::size_t labelWidth,
+                 std::size_t width, std::string& out) {
+    static constexpr std::size_t indent = 2;
+    std::string left = std::string(indent, ' ') + std::string(label);
+    for (const std::string& line : wrapped(text, width - labelWidth - indent)) {
+        left.resize(labelWidth + indent, ' ');
+        out += left + line + "\n";
+        left.clear();
+    }
+}
+
 Terminal Terminal::ofStandardOutput() {
     Terminal terminal;
     const bool isTerminal = isatty(STDOUT_FILENO) == 1;

@@ -19,6 +19,11 @@ std::size_t columns(std::string_view text);
 /// White space, line breaks too, only separates words.
 std::vector<std::string> wrapped(std::string_view text, std::size_t width);
 
+/// Appends the label and, beside it, the text below each other in lines of `width` columns. The
+/// label takes `labelWidth` columns.
+void appendField(std::string_view label, std::string_view text, std::size_t labelWidth,
+                 std::size_t width, std::string& out);
+
 /// What is known of the place that standard output goes to.
 struct Terminal {
     std::size_t width = 80;

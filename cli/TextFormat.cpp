@@ -207,12 +207,7 @@ void TextFormat::appendTitle(const Result& result, std::string& out) const {
 
 void TextFormat::appendField(std::string_view label, std::string_view text,
                              std::string& out) const {
-    std::string left = "  " + std::string(label);
-    for (const std::string& line : wrapped(text, m_terminal.width - kLabelWidth - 2)) {
-        left.resize(kLabelWidth + 2, ' ');
-        out += left + line + "\n";
-        left.clear();
-    }
+    cli::appendField(label, text, kLabelWidth, m_terminal.width, out);
 }
 
 void TextFormat::append(const Result& result, std::string& out) const {

@@ -3,8 +3,12 @@
 _parvel_options() {
     case $1 in
         '') echo '--log --version --json --help -h' ;;
+        attributes)
+            echo '--write --record --files-from --null -0 --recursive -r --jobs -j
+                --json --jsonl --plist --log --help -h'
+            ;;
         inspect)
-            echo '--cover --extra --flavor --store --files-from --null -0 --recursive -r --jobs -j
+            echo '--cover --extra --flavor --immediate --store --files-from --null -0 --recursive -r --jobs -j
                 --json --jsonl --plist --log --help -h'
             ;;
         match) echo '--key --json --jsonl --plist --log --help -h' ;;
@@ -41,7 +45,7 @@ _parvel() {
     if [[ $current == -* ]]; then
         mapfile -t COMPREPLY < <(compgen -W "$(_parvel_options "$command")" -- "$current")
     elif [[ -z $command ]]; then
-        mapfile -t COMPREPLY < <(compgen -W 'inspect match' -- "$current")
+        mapfile -t COMPREPLY < <(compgen -W 'attributes inspect match' -- "$current")
     else
         compopt -o filenames
         mapfile -t COMPREPLY < <(compgen -f -- "$current")

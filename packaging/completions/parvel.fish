@@ -1,32 +1,41 @@
 # Completion of parvel(1) for fish.
 
 function __parvel_needs_command
-    not __fish_seen_subcommand_from inspect match
+    not __fish_seen_subcommand_from attributes inspect match
 end
 
 set -l levels 'off fault error default debug'
 set -l flavors 'full content-library store progress identity'
 
 complete -c parvel -n __parvel_needs_command -f -a inspect -d 'Print what is known of assets'
+complete -c parvel -n __parvel_needs_command -f -a attributes -d 'What is kept on the files themselves'
 complete -c parvel -n __parvel_needs_command -f -a match -d 'Tell whether two are the same'
 complete -c parvel -n __parvel_needs_command -l version -d 'Print the version'
 complete -c parvel -n __parvel_needs_command -l json -d 'Print the version as JSON'
 complete -c parvel -l log -x -a $levels -d 'Print log lines'
 complete -c parvel -s h -l help -d 'Print the options'
 
-for command in inspect match
+for command in attributes inspect match
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l json -d 'Print one JSON array'
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l jsonl -d 'Print lines of JSON'
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l plist -d 'Print a property list'
 end
 
+for command in attributes inspect
+    complete -c parvel -n "__fish_seen_subcommand_from $command" -l files-from -r -d 'Read PATHs from a file'
+    complete -c parvel -n "__fish_seen_subcommand_from $command" -s 0 -l null -d 'PATHs end with a NUL'
+    complete -c parvel -n "__fish_seen_subcommand_from $command" -s r -l recursive -d 'Take all assets below a folder'
+end
+
+complete -c parvel -n '__fish_seen_subcommand_from attributes' -l write -d 'Write what the record says'
+complete -c parvel -n '__fish_seen_subcommand_from attributes' -l record -r -d 'Take the record from a file'
+complete -c parvel -n '__fish_seen_subcommand_from attributes' -s j -l jobs -x -d 'How many at once'
+
 complete -c parvel -n '__fish_seen_subcommand_from inspect' -l cover -d 'Read the cover image too'
 complete -c parvel -n '__fish_seen_subcommand_from inspect' -l extra -r -d 'Lay entries over what is read'
 complete -c parvel -n '__fish_seen_subcommand_from inspect' -l flavor -x -a $flavors -d 'The part of the record'
+complete -c parvel -n '__fish_seen_subcommand_from inspect' -l immediate -d 'Read what is known without a download'
 complete -c parvel -n '__fish_seen_subcommand_from inspect' -l store -d 'Read a store metadata file'
-complete -c parvel -n '__fish_seen_subcommand_from inspect' -l files-from -r -d 'Read PATHs from a file'
-complete -c parvel -n '__fish_seen_subcommand_from inspect' -s 0 -l null -d 'PATHs end with a NUL'
-complete -c parvel -n '__fish_seen_subcommand_from inspect' -s r -l recursive -d 'Take all assets below a folder'
 complete -c parvel -n '__fish_seen_subcommand_from inspect' -s j -l jobs -x -d 'How many at once'
 
 complete -c parvel -n '__fish_seen_subcommand_from match' -l key -x -d 'Compare one value'

@@ -55,8 +55,8 @@ def in_zsh(root, command):
     text = (root / "packaging/completions/_parvel").read_text()
     body = re.search(r"^_parvel%s\(\) \{\n(.*?)^\}" % ("_" + command if command else ""), text,
                      re.MULTILINE | re.DOTALL).group(1)
-    if "$_parvel_printed" in body:
-        body += re.search(r"^_parvel_printed=\(\n(.*?)^\)", text, re.MULTILINE | re.DOTALL).group(1)
+    for name in re.findall(r"\$(_parvel_\w+)", body):
+        body += re.search(r"^%s=\(\n(.*?)^\)" % name, text, re.MULTILINE | re.DOTALL).group(1)
     found = set()
     for entry in re.findall(r"'(?:\([^)]*\))?(-[\w-]+)\[|\{(-[^}]*)\}", body):
         found |= set(OPTION.findall(entry[0] or entry[1]))
@@ -67,10 +67,13 @@ def in_fish(root, command):
     text = (root / "packaging/completions/parvel.fish").read_text()
     everywhere = re.compile(r"complete -c parvel -[sl]")
     found = set()
+    looped = []
     for line in text.split("\n"):
         line = line.strip()
+        if line.startswith("for command in "):
+            looped = line.split()[3:]
         named = f"__fish_seen_subcommand_from {command}'" in line or \
-            "__fish_seen_subcommand_from $command" in line
+            (command in looped and "__fish_seen_subcommand_from $command" in line)
         before = "__parvel_needs_command" in line
         if everywhere.match(line) or (named if command else before):
             found |= {"-" + name for name in re.findall(r" -s (\w)", line)}

@@ -70,6 +70,39 @@ public:
     AssetPtr updateWithKeyAttributesAssetMetadata_error(const AssetPtr& asset,
                                                         ErrorOut error = nullptr);
 
+    // Updates.
+
+    /// Renames a PDF after its own display name; any other asset comes back as it is. A display
+    /// name that ends in ".pdf" gets a second one. Deliberate.
+    AssetPtr normalizeNamingForAsset_error(const AssetPtr& asset, ErrorOut error = nullptr);
+    /// Brings a freshly placed asset into the directory under its ID's name, over what stands
+    /// there; or, where the existing one lies in synchronised storage, into that one's place. The
+    /// existing record, where there is one, comes back with the new one's entries, also after a
+    /// failed move: the error tells. Deliberate.
+    AssetPtr applyUpdate_onExistingAsset_targetDirectory_error(const AssetPtr& update,
+                                                               const AssetPtr& existing,
+                                                               const URL& directory,
+                                                               ErrorOut error = nullptr);
+    /// Writes the store metadata file of an expanded book, whose first version is backed up, and
+    /// the extended attributes of any asset. The log alone tells of failures; nothing is written
+    /// into a zip file.
+    void persistMetadata(const AssetPtr& asset);
+    /// Writes the extended attributes that differ.
+    void persistXattrMetadata(const AssetPtr& asset);
+    /// Copies the store metadata file to its backup, which is never replaced.
+    void _backupMetadataIfNeeded(const AssetPtr& asset);
+    /// Renames a PDF within its folder; slashes and colons become low lines. Never overwrites:
+    /// general error 516 with the new URL where that is taken, 4 with the old one where nothing
+    /// stands there. -1002 without a URL, and for a name that is empty or holds a NUL.
+    AssetPtr _renameExistingPDFMetadata_toDisplayName_error(
+        const AssetPtr& asset, const std::optional<String>& displayName, ErrorOut error = nullptr);
+    /// Puts the updates' cover in a package's cover file, which is moved aside first; a null marker
+    /// removes it and brings back the first one. A record of a kind without such a file is only
+    /// given the cover. The record comes back unchanged without a new cover; none for an empty one.
+    AssetPtr _updateImageCoverDataForMetadta_updates_error(const AssetPtr& asset,
+                                                           const AssetPtr& updates,
+                                                           ErrorOut error = nullptr);
+
     // Synchronised storage, trash, removal, redaction.
 
     /// Moves the asset into synchronised storage or out of it, under its sanitised name. -1009 for

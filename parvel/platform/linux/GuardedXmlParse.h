@@ -46,15 +46,6 @@ private:
 /// entities are empty; nothing is opened.
 class GuardedXmlParse {
 public:
-    GuardedXmlParse(const GuardedXmlParse&) = delete;
-    GuardedXmlParse& operator=(const GuardedXmlParse&) = delete;
-    virtual ~GuardedXmlParse() = default;
-
-    /// True when the document is well-formed and stayed within the budgets. What a handler throws
-    /// passes out.
-    [[nodiscard]] bool run(const Data& bytes, int options);
-
-protected:
     /// The attributes as libxml2 lays them out, five pointers each: local name, prefix, namespace
     /// name, begin and end of the value. DTD defaults are among them.
     struct StartTag {
@@ -65,6 +56,15 @@ protected:
         std::span<const xmlChar*> attributes;
     };
 
+    GuardedXmlParse(const GuardedXmlParse&) = delete;
+    GuardedXmlParse& operator=(const GuardedXmlParse&) = delete;
+    virtual ~GuardedXmlParse() = default;
+
+    /// True when the document is well-formed and stayed within the budgets. What a handler throws
+    /// passes out.
+    [[nodiscard]] bool run(const Data& bytes, int options);
+
+protected:
     GuardedXmlParse();
 
     [[nodiscard]] xmlParserCtxt* parser() const { return m_parser.get(); }

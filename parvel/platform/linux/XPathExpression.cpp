@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <cstdint>
 
+#include "parvel/platform/linux/XPathScanner.h"
+
 namespace parvel {
 namespace {
 
@@ -11,77 +13,15 @@ constexpr std::size_t kFreeOperations = 50'000'000;
 constexpr std::uint64_t kMaximumWork = 2'000'000'000;
 constexpr std::uint64_t kMaximumTextMemory = 64 << 20;
 
-bool isSpace(char c) {
-    return c == ' ' || c == '\t' || c == '\n' || c == '\r';
-}
-
-bool isDigit(char c) {
-    return c >= '0' && c <= '9';
-}
-
-/// Any character of a name, the colon of a qualified one too.
-bool isNameCharacter(char c) {
-    return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || isDigit(c) || c == '_' || c == '-' ||
-           c == ':' || static_cast<unsigned char>(c) >= 0x80;
-}
-
-/// Takes pieces off the front of a text. Each `take` skips white space first.
-class Scanner {
-public:
-    explicit Scanner(std::string_view text) : m_rest(text) {}
-
-    [[nodiscard]] std::string_view rest() const { return m_rest; }
-    [[nodiscard]] bool atEnd() {
-        skipSpace();
-        return m_rest.empty();
-    }
-    bool take(std::string_view piece) {
-        skipSpace();
-        if (!m_rest.starts_with(piece))
-            return false;
-        m_rest.remove_prefix(piece.size());
-        return true;
-    }
-    std::string_view takeName() { return takeWhile(isNameCharacter); }
-    bool takeNumber() { return !takeWhile(isDigit).empty(); }
-    /// A quoted text; its content, or nothing taken.
-    bool takeLiteral(std::string_view& content) {
-        skipSpace();
-        if (m_rest.empty() || (m_rest[0] != '"' && m_rest[0] != '\''))
-            return false;
-        const std::size_t end = m_rest.find(m_rest[0], 1);
-        if (end == std::string_view::npos)
-            return false;
-        content = m_rest.substr(1, end - 1);
-        m_rest.remove_prefix(end + 1);
-        return true;
-    }
-
-private:
-    void skipSpace() {
-        while (!m_rest.empty() && isSpace(m_rest[0]))
-            m_rest.remove_prefix(1);
-    }
-    std::string_view takeWhile(bool (*accepts)(char)) {
-        skipSpace();
-        const auto end = std::find_if_not(m_rest.begin(), m_rest.end(), accepts);
-        const std::string_view taken(m_rest.begin(), end);
-        m_rest.remove_prefix(taken.size());
-        return taken;
-    }
-
-    std::string_view m_rest;
-};
-
-bool takeOperand(Scanner& scanner) {
+bool takeOperand(XPathScanner& scanner) {
     std::string_view content;
     if (scanner.takeLiteral(content))
         return true;
-    return scanner.take("@") ? !scanner.takeName().empty() : scanner.takeNumber();
+    return scanner.take("@") ? !scanner.takeName().empty() : !scanner.takeNumber().empty();
 }
 
 /// A position, or tests of attributes joined by `and` and `or`.
-bool takePlainPredicate(Scanner& scanner) {
+bool takePlainPredicate(XPathScanner& scanner) {
     do {
         if (!takeOperand(scanner) || (scanner.take("=") && !takeOperand(scanner)))
             return false;
@@ -90,7 +30,7 @@ bool takePlainPredicate(Scanner& scanner) {
 }
 
 bool isPlain(std::string_view expression) {
-    Scanner scanner(expression);
+    XPathScanner scanner(expression);
     scanner.take("/");
     do {
         scanner.take("@");
@@ -119,7 +59,7 @@ bool searchesText(std::string_view expression) {
 
 XPathText splitPrologue(std::string_view text) {
     XPathText result;
-    Scanner scanner(text);
+    XPathScanner scanner(text);
     std::string_view rest = text;
     while (scanner.take("declare namespace ")) {
         const std::string_view prefix = scanner.takeName();

@@ -1,11 +1,9 @@
 #pragma once
 
-#include <cstddef>
 #include <memory>
 #include <optional>
 
-#include "parvel/platform/linux/GuardedXmlParse.h"
-#include "parvel/platform/linux/XPathExpression.h"
+#include "parvel/platform/linux/XmlTreeBudget.h"
 
 namespace parvel {
 
@@ -18,11 +16,12 @@ struct XmlTree {
     XPathScope scope;
 };
 
-/// Builds a tree of at most 200,000 elements. The bytes and the tree together stay within a fixed
-/// amount of memory; the parse stops before the tree would exceed it.
+/// Builds libxml2's tree of a document, within the budget of a tree.
 class XmlTreeParse : private GuardedXmlParse {
 public:
-    [[nodiscard]] std::optional<XmlTree> run(const Data& bytes);
+    explicit XmlTreeParse(const Data& bytes) : m_bytes(bytes), m_budget(bytes.size()) {}
+
+    [[nodiscard]] std::optional<XmlTree> run();
 
 private:
     void startElement(const StartTag& tag) override;
@@ -31,13 +30,8 @@ private:
     void comment(const xmlChar* text) override;
     void processingInstruction(const xmlChar* target, const xmlChar* data) override;
 
-    void charge(std::size_t nodes, std::size_t bytes);
-
-    XmlTree m_tree;
-    std::size_t m_memory = 0;
-    std::size_t m_elements = 0;
-    std::size_t m_namespaceSearch = 0;
-    bool m_inText = false;
+    const Data& m_bytes;
+    XmlTreeBudget m_budget;
 };
 
 }  // namespace parvel

@@ -55,13 +55,19 @@ void CommandLine::group(std::string_view title) {
 
 void CommandLine::flag(std::string_view names, std::string_view help, bool& target) {
     m_groups.back().options.push_back(
-        {std::string(names), {}, std::string(help), &target, nullptr});
+        {std::string(names), {}, std::string(help), &target, nullptr, nullptr});
 }
 
 void CommandLine::option(std::string_view names, std::string_view value, std::string_view help,
                          std::optional<std::string>& target) {
     m_groups.back().options.push_back(
-        {std::string(names), std::string(value), std::string(help), nullptr, &target});
+        {std::string(names), std::string(value), std::string(help), nullptr, &target, nullptr});
+}
+
+void CommandLine::list(std::string_view names, std::string_view value, std::string_view help,
+                       std::vector<std::string>& target) {
+    m_groups.back().options.push_back(
+        {std::string(names), std::string(value), std::string(help), nullptr, nullptr, &target});
 }
 
 void CommandLine::exclusive(std::vector<std::string_view> names) {
@@ -75,7 +81,7 @@ void CommandLine::note(std::string_view text) {
 bool CommandLine::takesValue(std::string_view longName) const {
     for (const Group& group : m_groups) {
         for (const Option& option : group.options) {
-            if (option.text && longNameOf(option.names) == longName)
+            if (option.takesValue() && longNameOf(option.names) == longName)
                 return true;
         }
     }
@@ -105,12 +111,19 @@ std::vector<std::string> CommandLine::parse(std::span<const std::string> argumen
     parser.set_help_flag();
     parser.allow_extras();
     parser.add_flag(std::string(kHelpNames), m_help);
+    std::string lastOfList;
     for (const Group& group : m_groups) {
         for (const Option& option : group.options) {
             if (option.flag)
                 parser.add_flag(option.names, *option.flag);
-            else
+            else if (option.text)
                 parser.add_option(option.names, *option.text)->take_last();
+            else
+                parser.add_option(option.names, lastOfList)
+                    ->take_last()
+                    ->each([&texts = *option.texts](const std::string& text) {
+                        texts.push_back(text);
+                    });
         }
     }
     for (const auto& names : m_exclusive) {

@@ -29,6 +29,9 @@ public:
     void flag(std::string_view names, std::string_view help, bool& target);
     void option(std::string_view names, std::string_view value, std::string_view help,
                 std::optional<std::string>& target);
+    /// An option that may be given many times, each with one value, kept in their order.
+    void list(std::string_view names, std::string_view value, std::string_view help,
+              std::vector<std::string>& target);
     /// At most one of these long names may be given.
     void exclusive(std::vector<std::string_view> names);
     /// Lines that the help shows below the options.
@@ -48,6 +51,9 @@ private:
         std::string help;
         bool* flag;
         std::optional<std::string>* text;
+        std::vector<std::string>* texts;
+
+        [[nodiscard]] bool takesValue() const { return text || texts; }
     };
     struct Group {
         std::string title;

@@ -12,6 +12,7 @@ using Words = std::vector<std::string>;
 struct Parsed {
     bool flag = false;
     std::optional<std::string> value;
+    Words list;
     Words operands;
 
     explicit Parsed(const Words& words) {
@@ -19,6 +20,7 @@ struct Parsed {
         line.group("Options");
         line.flag("-f,--flag", "a flag", flag);
         line.option("-v,--value", "TEXT", "a value", value);
+        line.list("--list", "TEXT", "many values", list);
         operands = line.parse(words);
     }
 };
@@ -32,6 +34,13 @@ TEST(CommandLine, TakesEverythingBehindTwoDashesForOperands) {
     const Parsed parsed({"a", "--", "-f", "--", "--value"});
     EXPECT_EQ(parsed.operands, (Words{"a", "-f", "--", "--value"}));
     EXPECT_FALSE(parsed.flag);
+}
+
+TEST(CommandLine, KeepsAllValuesOfAListInOrderAsTheyWereTyped) {
+    const Parsed parsed(
+        {"--list", "b", "x", "--list=[a,b]", "--list", "", "--list=", "--list", "b"});
+    EXPECT_EQ(parsed.list, (Words{"b", "[a,b]", "", "", "b"}));
+    EXPECT_EQ(parsed.operands, Words{"x"});
 }
 
 TEST(CommandLine, TakesOptionsAmongOperands) {

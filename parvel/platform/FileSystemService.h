@@ -28,7 +28,7 @@ public:
     [[nodiscard]] virtual bool itemExistsAtPath(const std::string& path) = 0;
     /// Renames, or copies across file systems (synced before the source goes). Fails where anything
     /// stands at the destination, also against a competitor in the same instant. Within one trash
-    /// folder the item's info file follows.
+    /// folder the item's info file follows; it goes when the item leaves the trash.
     virtual bool moveItem(const URL& source, const URL& destination, ErrorOut error = nullptr) = 0;
     /// Puts the replacement at the existing item's place in one atomic step and removes the old
     /// item; moves it there when nothing stands there. The resulting URL is the existing item's.

@@ -1,9 +1,11 @@
+#include "parvel/platform/FileSystemService.h"
+
 #include <cerrno>
 
 #include "parvel/platform/CloudStore.h"
-#include "parvel/platform/FileSystemService.h"
 #include "parvel/platform/Service.h"
 #include "parvel/platform/linux/ItemMoves.h"
+#include "parvel/platform/linux/ItemOperations.h"
 #include "parvel/platform/linux/ItemTree.h"
 #include "parvel/platform/linux/Paths.h"
 #include "parvel/platform/linux/Trash.h"
@@ -12,11 +14,26 @@ namespace parvel {
 
 namespace {
 
-/// Which of the two items a failed move or copy is about: the source where that is missing, the
-/// destination where the new item can't be made.
-Error makeTransferError(int errnoValue, const URL& source, const URL& destination) {
-    return makeServiceError(errnoValue, host::itemStandsAt(source.path()) ? destination : source);
-}
+/// The acts on the disk itself.
+class HostItems : public host::ItemOperations {
+public:
+    bool itemStandsAt(const std::string& path) override { return host::itemStandsAt(path); }
+    int move(const std::string& source, const std::string& destination) override {
+        return host::isTrashed(source) ? host::moveTrashed(source, destination)
+                                       : host::moveExclusively(source, destination);
+    }
+    int replace(const std::string& existing, const std::string& replacement,
+                ReplaceOptions options) override {
+        return host::replace(existing, replacement, options);
+    }
+    int copy(const std::string& source, const std::string& destination) override {
+        return host::copyExclusively(source, destination);
+    }
+    int remove(const std::string& path) override { return host::discardItem(path); }
+    int trash(const std::string& item, std::string& resulting) override {
+        return host::trashItem(item, resulting);
+    }
+};
 
 /// Moving a file that only stands for a book does not move the book.
 bool isNotDownloaded(const URL& item) {
@@ -27,19 +44,19 @@ bool isNotDownloaded(const URL& item) {
 
 class LinuxFileSystemService : public FileSystemService {
 public:
-    bool itemExistsAtPath(const std::string& path) override { return host::itemStandsAt(path); }
+    explicit LinuxFileSystemService(std::shared_ptr<host::ItemOperations> items)
+        : m_items(std::move(items)) {}
+
+    bool itemExistsAtPath(const std::string& path) override { return m_items->itemStandsAt(path); }
 
     bool moveItem(const URL& source, const URL& destination, ErrorOut error) override {
-        const std::string& from = source.path();
-        const std::string& to = destination.path();
-        const int failure = host::isRenameWithinTrash(from, to) ? host::renameWithinTrash(from, to)
-                                                                : host::moveExclusively(from, to);
+        const int failure = m_items->move(source.path(), destination.path());
         return failure == 0 || fail(error, makeTransferError(failure, source, destination));
     }
 
     bool replaceItem(const URL& existing, const URL& replacement, ReplaceOptions options,
                      std::optional<URL>* resulting, ErrorOut error) override {
-        const int failure = host::replace(existing.path(), replacement.path(), options);
+        const int failure = m_items->replace(existing.path(), replacement.path(), options);
         if (failure != 0)
             return fail(error, makeTransferError(failure, replacement, existing));
         if (resulting)
@@ -48,16 +65,16 @@ public:
     }
 
     bool copyItem(const URL& source, const URL& destination, ErrorOut error) override {
-        const int failure = host::copyExclusively(source.path(), destination.path());
+        const int failure = m_items->copy(source.path(), destination.path());
         return failure == 0 || fail(error, makeTransferError(failure, source, destination));
     }
 
     bool removeItem(const URL& item, ErrorOut error) override {
-        int failure = host::discardItem(item.path());
+        int failure = m_items->remove(item.path());
         // What stands for an item that is not on this device goes without a download.
         if (failure == ENOENT) {
             if (const auto placeholder = Service<CloudStore>::current().placeholderFile(item))
-                failure = host::discardItem(placeholder->path());
+                failure = m_items->remove(placeholder->path());
         }
         return failure == 0 || fail(error, makeServiceError(failure, item));
     }
@@ -66,7 +83,7 @@ public:
         if (isNotDownloaded(item))
             return fail(error, makePOSIXError(ETIMEDOUT, item));
         std::string place;
-        const int failure = host::trashItem(item.path(), place);
+        const int failure = m_items->trash(item.path(), place);
         if (failure != 0)
             return fail(error, makeServiceError(failure, item));
         if (resulting)
@@ -82,12 +99,28 @@ public:
             return fail(error, makePOSIXError(ETIMEDOUT, item));
         return moveItem(item, destination, error);
     }
+
+private:
+    /// Which of the two items a failed move or copy is about: the source where that is missing, the
+    /// destination where the new item can't be made.
+    [[nodiscard]] Error makeTransferError(int errnoValue, const URL& source,
+                                          const URL& destination) const {
+        return makeServiceError(errnoValue,
+                                m_items->itemStandsAt(source.path()) ? destination : source);
+    }
+
+    std::shared_ptr<host::ItemOperations> m_items;
 };
 
 }  // namespace
 
 std::shared_ptr<FileSystemService> FileSystemService::makeDefault() {
-    return std::make_shared<LinuxFileSystemService>();
+    return host::makeFileSystemService(std::make_shared<HostItems>());
+}
+
+std::shared_ptr<FileSystemService> host::makeFileSystemService(
+    std::shared_ptr<ItemOperations> operations) {
+    return std::make_shared<LinuxFileSystemService>(std::move(operations));
 }
 
 }  // namespace parvel

@@ -20,4 +20,10 @@ inline bool itemStandsAt(const std::string& path) {
     return ::lstat(path.c_str(), &status) == 0;
 }
 
+/// Whether the path lies below the folder, by their texts.
+inline bool isBelow(std::string_view path, std::string_view folder) {
+    return path.size() > folder.size() && path.starts_with(folder) &&
+           (folder.ends_with('/') || path[folder.size()] == '/');
+}
+
 }  // namespace parvel::host

@@ -11,10 +11,11 @@ namespace parvel::host {
 /// first, exclusively, and goes again when the move fails. ENOENT for a missing item.
 [[nodiscard]] int trashItem(const std::string& item, std::string& resulting);
 
-/// Whether both names lie in one trash's "files" folder and the first has its info file there.
-[[nodiscard]] bool isRenameWithinTrash(const std::string& source, const std::string& destination);
+/// Whether the item lies in a trash's "files" folder and has its info file there.
+[[nodiscard]] bool isTrashed(const std::string& item);
 
-/// Renames a trashed item and, before it, its info file, which comes back when the move fails.
-[[nodiscard]] int renameWithinTrash(const std::string& source, const std::string& destination);
+/// Moves a trashed item. Within its trash the info file is renamed before it and comes back when
+/// the move fails; of an item that leaves the trash it goes after the move.
+[[nodiscard]] int moveTrashed(const std::string& source, const std::string& destination);
 
 }  // namespace parvel::host

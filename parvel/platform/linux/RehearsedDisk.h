@@ -1,0 +1,70 @@
+#pragma once
+
+#include <cstddef>
+#include <map>
+#include <mutex>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "parvel/platform/linux/ItemOperations.h"
+
+namespace parvel::host {
+
+/// The disk as it would be after operations that were only rehearsed: the real one under a layer of
+/// names that have gone or come. Every act gives the errno value that the real one would give, as
+/// far as looking tells, and touches nothing. Callable from any thread.
+class RehearsedDisk : public ItemOperations {
+public:
+    /// Attributes that would differ from the disk, by name; none for one that would be removed.
+    using Attributes = std::map<std::string, std::optional<std::vector<std::byte>>, std::less<>>;
+
+    bool itemStandsAt(const std::string& path) override;
+    int move(const std::string& source, const std::string& destination) override;
+    int replace(const std::string& existing, const std::string& replacement,
+                ReplaceOptions options) override;
+    int copy(const std::string& source, const std::string& destination) override;
+    int remove(const std::string& path) override;
+    int trash(const std::string& item, std::string& resulting) override;
+
+    /// Where on the real disk that lies which would stand at the path; none where nothing would.
+    [[nodiscard]] std::optional<std::string> realPath(const std::string& path) const;
+    /// Of the item that the path leads to.
+    [[nodiscard]] Attributes attributesAt(const std::string& path) const;
+    void setAttribute(const std::string& path, const std::string& name,
+                      std::optional<std::vector<std::byte>> value);
+
+private:
+    enum class Kind { Gone, Real, MadeFile, MadeFolder };
+    /// What stands at a name.
+    struct Entry {
+        Kind kind;
+        std::string real;  ///< where a Real one lies on the disk
+    };
+
+    // By the name's key, its path with the folder's links resolved. The caller holds the lock.
+    [[nodiscard]] Entry entryAt(const std::string& key) const;
+    [[nodiscard]] int lookUp(const std::string& key) const;
+    [[nodiscard]] bool isFolder(const std::string& key) const;
+    [[nodiscard]] int folderError(const std::string& folder) const;
+    [[nodiscard]] int changeError(const std::string& key) const;
+    [[nodiscard]] int removalError(const std::string& key) const;
+    [[nodiscard]] bool isSameMount(const std::string& folder, const std::string& other) const;
+    [[nodiscard]] int renameError(const std::string& source, const std::string& destination) const;
+    [[nodiscard]] int copyError(const std::string& source, const std::string& destination) const;
+    [[nodiscard]] int moveError(const std::string& source, const std::string& destination) const;
+    [[nodiscard]] int replaceError(const std::string& existing,
+                                   const std::string& replacement) const;
+    [[nodiscard]] std::string attributeKey(const std::string& path) const;
+    [[nodiscard]] int makeFolders(const std::string& path);
+    void set(const std::string& key, Entry entry);
+    void relocate(const std::string& source, const std::string& destination);
+    [[nodiscard]] int moveByKey(const std::string& source, const std::string& destination);
+
+    mutable std::mutex m_mutex;
+    std::map<std::string, Entry, std::less<>> m_entries;
+    std::map<std::string, Attributes, std::less<>> m_attributes;
+};
+
+}  // namespace parvel::host

@@ -53,7 +53,8 @@ TEST_F(Trash, ATrashedItemLiesInTheHomeTrashWithItsInfoFile) {
     const std::string info = m_folder.read("data/Trash/info/Ein Buch ü.epub.trashinfo");
     const std::regex expected("\\[Trash Info\\]\nPath=" + m_folder.path().string() +
                               "/Ein%20Buch%20%C3%BC\\.epub\n"
-                              "DeletionDate=\\d{4}-\\d\\d-\\d\\dT\\d\\d:\\d\\d:\\d\\d\n");
+                              "DeletionDate=\\d{4}-\\d\\d-\\d\\dT\\d\\d:\\d\\d:\\d\\d\n"
+                              "X-ParvelFoundation=1\n");
     EXPECT_TRUE(std::regex_match(info, expected)) << info;
     struct stat status {};
     ASSERT_EQ(stat(trash("info/Ein Buch ü.epub.trashinfo").c_str(), &status), 0);

@@ -178,7 +178,13 @@ int exchangeWithoutFlag(const std::string& replacement, const std::string& exist
 int exchange(const std::string& replacement, const std::string& existing, bool& isExchanged) {
     const int error = renameWithFlags(replacement, existing, RENAME_EXCHANGE);
     isExchanged = error == 0;
-    return isFlagUnsupported(error) ? exchangeWithoutFlag(replacement, existing) : error;
+    if (!isFlagUnsupported(error))
+        return error;
+    // The kernel says the same of a folder and what lies in it; that may not step aside.
+    if (liesWithin(parentFolderOf(replacement), existing) ||
+        liesWithin(parentFolderOf(existing), replacement))
+        return EINVAL;
+    return exchangeWithoutFlag(replacement, existing);
 }
 
 int inheritIfAsked(const std::string& existing, const std::string& replacement,

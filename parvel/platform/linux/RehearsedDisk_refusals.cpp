@@ -74,6 +74,8 @@ int RehearsedDisk::changeError(const std::string& key) const {
 }
 
 int RehearsedDisk::removalError(const std::string& key) const {
+    if (isDots(lastComponentOfPath(key)))
+        return EBUSY;
     if (const int error = changeError(key))
         return error;
     const Entry folder = entryAt(parentFolderOf(key));

@@ -13,6 +13,8 @@ constexpr std::size_t kMaximumAttributes = 256;
 constexpr int kMaximumNamespacesInScope = 128;
 /// In slots of five an attribute, and well above kMaximumAttributes: the array grows by doubling.
 constexpr int kMaximumAttributeSlots = 3000;
+/// No tag of one this long can hold enough attributes to take long.
+constexpr std::size_t kSmallDocument = 16 << 10;
 constexpr std::size_t kMaximumDoctypeBytes = 64 << 10;
 constexpr std::size_t kMaximumParameterEntityBytes = 64 << 10;
 constexpr std::size_t kMaximumEntityBytes = 16 << 20;
@@ -215,10 +217,17 @@ GuardedXmlParse::GuardedXmlParse() {
 
 bool GuardedXmlParse::run(const Data& bytes, int options) {
     const QuietXml quiet;
+    options |= XML_PARSE_NONET | XML_PARSE_NOERROR | XML_PARSE_NOWARNING | XML_PARSE_COMPACT;
     m_ranges = bytes.ranges();
-    xmlDoc* document = xmlCtxtReadIO(
-        parser(), Callbacks::read, nullptr, this, nullptr, nullptr,
-        options | XML_PARSE_NONET | XML_PARSE_NOERROR | XML_PARSE_NOWARNING | XML_PARSE_COMPACT);
+    xmlDoc* document = nullptr;
+    if (m_ranges.size() == 1 && bytes.size() <= kSmallDocument) {
+        const auto* text = reinterpret_cast<const char*>(m_ranges[0].data());
+        document = xmlCtxtReadMemory(parser(), text, static_cast<int>(bytes.size()), nullptr,
+                                     nullptr, options);
+    } else {
+        document =
+            xmlCtxtReadIO(parser(), Callbacks::read, nullptr, this, nullptr, nullptr, options);
+    }
     parser()->myDoc = document;
     if (m_thrown)
         std::rethrow_exception(m_thrown);

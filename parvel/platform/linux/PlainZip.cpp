@@ -170,9 +170,24 @@ bool recordIsPlain(const DirectoryRecord& record) {
     return extraIsPlain(record.extra());
 }
 
-/// Whether another end record than the last may stand in the tail.
+/// Whether another end record than the last may stand in the tail. Sought by the signature's third
+/// byte: its first two begin every record of a directory.
 bool holdsEndRecord(Data::Bytes bytes) {
-    return ::memmem(bytes.data(), bytes.size(), zip::endSignature, zip::signatureLength) != nullptr;
+    constexpr std::size_t ahead = 2;
+    const std::uint8_t* const end = bytes.data() + bytes.size();
+    const std::uint8_t* from = bytes.data() + std::min(ahead, bytes.size());
+    while (from < end) {
+        const void* found =
+            std::memchr(from, zip::endSignature[ahead], static_cast<std::size_t>(end - from));
+        if (!found)
+            return false;
+        const auto* start = static_cast<const std::uint8_t*>(found) - ahead;
+        if (static_cast<std::size_t>(end - start) >= zip::signatureLength &&
+            std::memcmp(start, zip::endSignature, zip::signatureLength) == 0)
+            return true;
+        from = start + ahead + 1;
+    }
+    return false;
 }
 
 bool isSaid(std::uint32_t field, std::uint64_t value) {

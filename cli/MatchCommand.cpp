@@ -80,6 +80,8 @@ int MatchCommand::run(std::vector<std::string> operands) {
     }
     const bool known = side.record && other.record;
     const bool matching = known && matches(*side.record, *other.record);
+    if (!side.result.error)
+        side.result.error = other.result.error;
     side.result.fields.push_back({"matches", known ? Value(Number::boolean(matching)) : Value()});
 
     Output output(STDOUT_FILENO);

@@ -7,6 +7,7 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+#include "cli/Interrupt.h"
 #include "cli/JsonReader.h"
 #include "parvel/foundation/PropertyList.h"
 
@@ -16,10 +17,23 @@ namespace {
 /// No record's file is this long; a device that has no end would be.
 constexpr std::size_t longestRecordFile = std::size_t{256} << 20;
 
-/// The whole file; none with errno set.
+/// As `read`, but waits for a pipe's writer, and no longer than until an interrupt.
+ssize_t readWaiting(int descriptor, char* bytes, std::size_t size) {
+    for (;;) {
+        const ssize_t count = read(descriptor, bytes, size);
+        if (count >= 0 || (errno != EAGAIN && errno != EINTR))
+            return count;
+        if (!waitForInput(descriptor)) {
+            errno = EINTR;
+            return -1;
+        }
+    }
+}
+
+/// The whole file; none with errno set. A pipe that nobody writes to is empty.
 std::optional<std::string> contentsOf(const std::string& path) {
     static constexpr std::size_t piece = 256 * 1024;
-    const int descriptor = open(path.c_str(), O_RDONLY | O_CLOEXEC);
+    const int descriptor = open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY);
     if (descriptor < 0)
         return std::nullopt;
     std::string contents;
@@ -27,13 +41,13 @@ std::optional<std::string> contentsOf(const std::string& path) {
     do {
         const std::size_t size = contents.size();
         contents.resize(size + piece);
-        count = read(descriptor, contents.data() + size, piece);
+        count = readWaiting(descriptor, contents.data() + size, piece);
         contents.resize(size + (count > 0 ? static_cast<std::size_t>(count) : 0));
         if (contents.size() > longestRecordFile) {
             count = -1;
             errno = EFBIG;
         }
-    } while (count > 0 || (count < 0 && errno == EINTR));
+    } while (count > 0);
     const int readErrno = errno;
     close(descriptor);
     errno = readErrno;

@@ -3,7 +3,10 @@
 #include "cli/Command.h"
 #include "cli/OutputOptions.h"
 #include "cli/PathSource.h"
+#include "cli/PropertyValue.h"
 #include "parvel/filemanager/PVAssetMetadataFileManager.h"
+#include "parvel/metadata/PVMutableAssetMetadata.h"
+#include "parvel/platform/Rehearsal.h"
 #include "parvel/xattr/ExtendedAttributes.h"
 #include "parvel/xattr/PNMetadataXattr.h"
 
@@ -18,8 +21,12 @@ public:
 private:
     [[nodiscard]] Result read(const std::string& path) const;
     [[nodiscard]] Result write(const std::string& path) const;
+    [[nodiscard]] Result update(const std::string& path) const;
 
     bool m_write = false;
+    bool m_dryRun = false;
+    std::vector<std::string> m_updates;
+    std::vector<PropertyValue> m_updateValues;
     std::optional<std::string> m_jobs;
     AssetRecord m_record{Uninspectable::HasItsURLAlone};
     OutputOptions m_output;
@@ -29,10 +36,15 @@ private:
 void AttributesCommand::declare(CommandLine& line) {
     line.group("What is done");
     line.flag("--write", "write what the record says, where no identity is kept yet", m_write);
+    line.list("--update", "KEY=VALUE",
+              "change KEY of the record to VALUE, and write what then\n"
+              "differs of title, author, genre and the explicit mark",
+              m_updates);
+    line.flag("--dry-run", "say what would be written, and write nothing", m_dryRun);
     m_record.declare(line);
     m_paths.declare(line);
     line.option("-j,--jobs", "N", "read N files at once; one a core if not given", m_jobs);
-    line.exclusive({"--write", "--jobs"});
+    line.exclusive({"--write", "--update", "--jobs"});
     m_output.declare(line);
 }
 
@@ -40,21 +52,39 @@ int AttributesCommand::run(std::vector<std::string> operands) {
     m_output.applyLog();
     m_record.read();
     BatchOptions options{.command = "attributes", .form = m_output.form()};
+    for (const std::string& update : m_updates)
+        m_updateValues.push_back(PropertyValue::fromText("--update", update));
+    std::optional<Rehearsal> rehearsal;
+    if (m_dryRun)
+        rehearsal.emplace();
+    const bool reads = !m_write && m_updates.empty();
     // What is written is written in the order given.
-    options.jobs = m_write ? 1 : jobsFromOption(m_jobs);
-    options.makeText = m_write ? makeOutcomeFormat : makeAttributesFormat;
+    options.jobs = reads ? jobsFromOption(m_jobs) : 1;
+    options.makeText = reads ? makeAttributesFormat : makeOutcomeFormat;
     PathSource source(std::move(operands), m_paths);
-    return runOverPaths(options, source, [this](const std::string& path) {
-        return m_write ? write(path) : read(path);
+    return runOverPaths(options, source, [this, reads](const std::string& path) {
+        if (reads)
+            return read(path);
+        return m_write ? write(path) : update(path);
     });
 }
 
-/// Why not even the first attribute can be read: the library's own read tells nobody.
-std::string reasonAgainstReading(const URL& url) {
+/// The identity that the file keeps. The error tells what the library's own read tells nobody.
+std::optional<String> keptIdentity(const URL& url, std::optional<Error>& error) {
     std::optional<String> identity;
-    std::optional<Error> error;
     pvamfm_extendedAttributeString_forKey_error(url, &identity, PNMetadataXattrAssetID, &error);
-    return error ? error->message() : std::string();
+    return identity;
+}
+
+/// Why an update was refused.
+std::string_view adviceOnUpdate(const URL& url) {
+    std::optional<Error> error;
+    const std::optional<String> identity = keptIdentity(url, error);
+    if (error)
+        return "its attributes can't be read";
+    if (!identity)
+        return "it keeps no attributes yet; write them first, with --write";
+    return "the attributes that it keeps are another asset's";
 }
 
 Result AttributesCommand::read(const std::string& path) const {
@@ -66,8 +96,8 @@ Result AttributesCommand::read(const std::string& path) const {
     if (auto attributes = PVAssetMetadataFileManager::init()->extendedAttributesForAsset_error(
             asset, &result.error))
         result.record = std::make_shared<const Dictionary>(std::move(*attributes));
-    else
-        result.reason = reasonAgainstReading(urlOfPath(path));
+    else if (std::optional<Error> error; !keptIdentity(urlOfPath(path), error) && error)
+        result.reason = error->message();
     return result;
 }
 
@@ -78,7 +108,30 @@ Result AttributesCommand::write(const std::string& path) const {
         asset, &result.error);
     result.fields.push_back({"written", Number::boolean(written)});
     setRecord(result, asset, PVAssetMetadataFlavorFull);
+    result.advice = "nothing in it or on it says which asset it is; --record can say it";
     result.outcome = written ? "has its attributes" : "nothing to write";
+    return result;
+}
+
+Result AttributesCommand::update(const std::string& path) const {
+    Result result = resultForPath(path);
+    const AssetPtr asset = m_record.forResult(result);
+    Dictionary changes;
+    for (const PropertyValue& value : m_updateValues)
+        value.storeIn(changes, *asset->dictionaryRepresentation());
+    const AssetPtr updates = PVMutableAssetMetadata::initWithURL_dictionary_validate(
+        std::nullopt, &changes, /*validate=*/false);
+    const AssetPtr changed = asset->copyWithUpdates([&](PVMutableAssetMetadata& copy) {
+        copy.combineWithMetadata(updates.get());
+        copy.setUrl(asset->url());  // its extension as it was typed
+    });
+    const bool written = PVAssetMetadataFileManager::init()->updateExtendedAttributesForAsset_error(
+        changed, &result.error);
+    result.fields.push_back({"written", Number::boolean(written)});
+    setRecord(result, changed, PVAssetMetadataFlavorFull);
+    if (result.error && result.error->domain() == PVParvelFoundationErrorDomain)
+        result.advice = adviceOnUpdate(urlOfPath(path));
+    result.outcome = written ? "attributes updated" : "nothing to write";
     return result;
 }
 

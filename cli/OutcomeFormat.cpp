@@ -7,7 +7,7 @@ namespace {
 class OutcomeFormat : public ResultFormat {
 public:
     void append(const Result& result, std::string& out) const override {
-        if (!result.outcome.empty())
+        if (result.succeeded() && !result.outcome.empty())
             out += safeText(result.path) + ": " + safeText(result.outcome) + "\n";
     }
 };

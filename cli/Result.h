@@ -22,7 +22,8 @@ struct Result {
     std::optional<Error> error;
     std::vector<Dictionary::Entry> fields;  ///< what the command adds to the keys of every result
     std::string_view nothing = "no metadata";  ///< what there is where there is no record
-    std::string reason;   ///< what the log said about a failure, in words for a person
+    std::string reason;       ///< what the log said about a failure, in words for a person
+    std::string_view advice;  ///< what to do about a failure, where the command knows
     std::string outcome;  ///< what was done, in words for a person, where that is the result's text
 
     [[nodiscard]] bool succeeded() const { return record && !error; }

@@ -4,7 +4,7 @@ _parvel_options() {
     case $1 in
         '') echo '--log --version --json --help -h' ;;
         attributes)
-            echo '--write --record --files-from --null -0 --recursive -r --jobs -j
+            echo '--write --update --dry-run --record --files-from --null -0 --recursive -r --jobs -j
                 --json --jsonl --plist --log --help -h'
             ;;
         inspect)
@@ -40,7 +40,7 @@ _parvel() {
                 compgen -W 'full content-library store progress identity' -- "$current")
             return
             ;;
-        -j | --jobs | --key) return ;;
+        -j | --jobs | --key | --update) return ;;
     esac
     if [[ $current == -* ]]; then
         mapfile -t COMPREPLY < <(compgen -W "$(_parvel_options "$command")" -- "$current")

@@ -28,6 +28,8 @@ for command in attributes inspect
 end
 
 complete -c parvel -n '__fish_seen_subcommand_from attributes' -l write -d 'Write what the record says'
+complete -c parvel -n '__fish_seen_subcommand_from attributes' -l update -x -d 'Change KEY=VALUE and write that'
+complete -c parvel -n '__fish_seen_subcommand_from attributes' -l dry-run -d 'Write nothing'
 complete -c parvel -n '__fish_seen_subcommand_from attributes' -l record -r -d 'Take the record from a file'
 complete -c parvel -n '__fish_seen_subcommand_from attributes' -s j -l jobs -x -d 'How many at once'
 

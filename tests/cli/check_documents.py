@@ -58,7 +58,7 @@ def in_zsh(root, command):
     for name in re.findall(r"\$(_parvel_\w+)", body):
         body += re.search(r"^%s=\(\n(.*?)^\)" % name, text, re.MULTILINE | re.DOTALL).group(1)
     found = set()
-    for entry in re.findall(r"'(?:\([^)]*\))?(-[\w-]+)\[|\{(-[^}]*)\}", body):
+    for entry in re.findall(r"'(?:\([^)]*\))?\*?(-[\w-]+)\[|\{(-[^}]*)\}", body):
         found |= set(OPTION.findall(entry[0] or entry[1]))
     return found
 

@@ -15,6 +15,8 @@
 
 namespace parvel {
 
+class PVInstallAssetMetadataIOTask;
+
 /// Every file operation on an asset passes through here. It takes a record, which it leaves as it
 /// is, and gives a new one that says what became of the asset; none, with an error, where the
 /// operation failed. A null record, or one without URL, names no item.
@@ -22,7 +24,8 @@ namespace parvel {
 /// A manager holds nothing but its two platform services, may be made freely, and is for one thread
 /// at a time. What a failed operation had completed is not undone; a file or package that the host
 /// moves, copies or replaces is whole at its old place or whole at its new one.
-class PV_EXPORT PVAssetMetadataFileManager {
+class PV_EXPORT PVAssetMetadataFileManager
+    : public std::enable_shared_from_this<PVAssetMetadataFileManager> {
 public:
     /// With the host's file-system service.
     static std::shared_ptr<PVAssetMetadataFileManager> init();
@@ -102,6 +105,12 @@ public:
     AssetPtr _updateImageCoverDataForMetadta_updates_error(const AssetPtr& asset,
                                                            const AssetPtr& updates,
                                                            ErrorOut error = nullptr);
+
+    // Installing.
+
+    /// A new task that brings the asset into the library: a book expanded or copied as a package,
+    /// anything else copied as a file. The caller sets its flags; it keeps this manager.
+    std::shared_ptr<PVInstallAssetMetadataIOTask> taskToInstallAsset(const AssetPtr& asset);
 
     // Synchronised storage, trash, removal, redaction.
 

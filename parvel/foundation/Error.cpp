@@ -95,7 +95,7 @@ Error makeNoIdentityError() {
     return makeLibraryError(PVParvelFoundationErrorCode::NoIdentity);
 }
 
-Error makeCancelledError(const URL& source) {
+Error makeCancelledError(const std::optional<URL>& source) {
     return makeLibraryError(PVParvelFoundationErrorCode::Cancelled, userInfoWithURL(source));
 }
 

@@ -82,8 +82,8 @@ PV_EXPORT Error makeNoAssetIDError(const URL& url);
 /// Store ID, generated ID and path are all absent where an identity is needed; a dictionary has no
 /// usable "path"; attributes are to be updated or set for a record without asset ID. No user info.
 PV_EXPORT Error makeNoIdentityError();
-/// A copy found itself cancelled; the URL is the source's.
-PV_EXPORT Error makeCancelledError(const URL& source);
+/// A copy found itself cancelled; the URL, where there is one, is the source's.
+PV_EXPORT Error makeCancelledError(const std::optional<URL>& source);
 /// An asset without record or URL was to go into or out of synchronised storage.
 PV_EXPORT Error makeCorruptAssetError(std::string reason);
 

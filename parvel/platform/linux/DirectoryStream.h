@@ -2,6 +2,8 @@
 
 #include <dirent.h>
 
+#include <cerrno>
+
 #include "parvel/platform/linux/FileDescriptor.h"
 
 namespace parvel::host {
@@ -25,14 +27,17 @@ public:
     [[nodiscard]] bool isOpen() const { return m_stream; }
     [[nodiscard]] int descriptor() const { return ::dirfd(m_stream); }
 
-    /// Null at the end, and where the rest can't be read. Valid until the next call.
+    /// Null at the end, with errno 0, and where the rest can't be read. Valid until the next call.
     [[nodiscard]] const dirent* next() {
-        while (const dirent* entry = ::readdir(m_stream)) {
+        for (;;) {
+            errno = 0;
+            const dirent* entry = ::readdir(m_stream);
+            if (!entry)
+                return nullptr;
             const char* name = entry->d_name;
             if (name[0] != '.' || (name[1] && (name[1] != '.' || name[2])))
                 return entry;
         }
-        return nullptr;
     }
 
 private:

@@ -2,8 +2,6 @@
 
 #include <dirent.h>
 #include <fcntl.h>
-#include <sys/vfs.h>
-#include <sys/xattr.h>
 
 #include <array>
 #include <climits>
@@ -14,6 +12,7 @@
 
 #include "parvel/foundation/URL.h"
 #include "parvel/platform/linux/FileDescriptor.h"
+#include "parvel/platform/linux/ItemContent.h"
 #include "parvel/platform/linux/Paths.h"
 #include "parvel/platform/linux/StagingFolder.h"
 
@@ -22,9 +21,6 @@ namespace parvel::host {
 namespace {
 
 constexpr int kMaximumDepth = 200;  // three descriptors a level
-constexpr std::size_t kCopyPiece = std::size_t{1} << 20;
-constexpr long kFuseMagic = 0x65735546;
-constexpr std::string_view kUserAttributes = "user.";
 
 int lastError() {
     return errno;
@@ -54,124 +50,15 @@ const char* nextName(DIR* listing) {
     }
 }
 
-// Attributes
-
-std::optional<std::vector<std::string>> userAttributeNames(int file) {
-    const ssize_t size = ::flistxattr(file, nullptr, 0);
-    if (size < 0)
-        return std::nullopt;
-    std::string list(static_cast<std::size_t>(size), '\0');
-    const ssize_t length = ::flistxattr(file, list.data(), list.size());
-    if (length < 0)
-        return std::nullopt;
-    std::vector<std::string> names;
-    for (std::size_t at = 0; at < static_cast<std::size_t>(length);) {
-        const std::string name = list.c_str() + at;
-        at += name.size() + 1;
-        if (name.starts_with(kUserAttributes))
-            names.push_back(name);
-    }
-    return names;
-}
-
-/// File systems without attributes lose them silently; some FUSE mounts say EIO for that.
-bool isLossTolerated(int error, int file) {
-    if (error == ENOTSUP || error == EPERM || error == EACCES)
-        return true;
-    struct statfs system {};
-    return error == EIO && ::fstatfs(file, &system) == 0 && system.f_type == kFuseMagic;
-}
-
-int copyAttribute(int from, int to, const std::string& name, int flags) {
-    const ssize_t size = ::fgetxattr(from, name.c_str(), nullptr, 0);
-    if (size < 0)
-        return errno == ENODATA ? 0 : errno;
-    std::string value(static_cast<std::size_t>(size), '\0');
-    const ssize_t length = ::fgetxattr(from, name.c_str(), value.data(), value.size());
-    if (length < 0)
-        return errno == ENODATA ? 0 : errno;
-    if (::fsetxattr(to, name.c_str(), value.data(), static_cast<std::size_t>(length), flags) == 0)
-        return 0;
-    const int error = errno;
-    return isLossTolerated(error, to) ? 0 : error;
-}
-
-int copyAttributes(int from, int to, bool onlyMissing) {
-    const auto names = userAttributeNames(from);
-    if (!names)
-        return errno == ENOTSUP || isLossTolerated(errno, from) ? 0 : errno;
-    for (const std::string& name : *names) {
-        const int error = copyAttribute(from, to, name, onlyMissing ? XATTR_CREATE : 0);
-        if (error != 0 && !(onlyMissing && error == EEXIST))
-            return error;
-    }
-    return 0;
-}
-
 // Copying
-
-/// Owner and group first, since a change of owner drops mode bits; times last.
-int copyStatus(const struct stat& status, int to) {
-    if (::fchown(to, status.st_uid, status.st_gid) != 0 &&
-        ::fchown(to, static_cast<uid_t>(-1), status.st_gid) != 0 && errno == EIO)
-        return EIO;
-    if (::fchmod(to, status.st_mode & 01777) != 0 && errno != EPERM && errno != ENOTSUP)
-        return errno;
-    const std::array<timespec, 2> times{status.st_atim, status.st_mtim};
-    if (::futimens(to, times.data()) != 0 && errno != EPERM && errno != ENOTSUP)
-        return errno;
-    return 0;
-}
-
-int copyByBuffer(int from, int to, std::uint64_t& copied) {
-    std::vector<char> buffer(kCopyPiece);
-    for (;;) {
-        const ssize_t length = ::read(from, buffer.data(), buffer.size());
-        if (length == 0)
-            return 0;
-        if (length < 0) {
-            if (errno == EINTR)
-                continue;
-            return errno;
-        }
-        for (ssize_t at = 0; at < length;) {
-            const ssize_t written =
-                ::write(to, buffer.data() + at, static_cast<std::size_t>(length - at));
-            if (written < 0 && errno != EINTR)
-                return errno;
-            if (written > 0)
-                at += written;
-        }
-        copied += static_cast<std::uint64_t>(length);
-    }
-}
-
-int copyData(int from, int to, std::uint64_t& copied) {
-    for (;;) {
-        const ssize_t length = ::copy_file_range(from, nullptr, to, nullptr, kCopyPiece, 0);
-        if (length > 0) {
-            copied += static_cast<std::uint64_t>(length);
-            continue;
-        }
-        if (length < 0 && errno == EINTR)
-            continue;
-        const bool canFallBack = length == 0 || errno == EXDEV || errno == EINVAL ||
-                                 errno == ENOSYS || errno == EOPNOTSUPP || errno == EBADF;
-        // What is left, nothing as a rule, is read the plain way: some file systems answer 0 early.
-        return canFallBack ? copyByBuffer(from, to, copied) : errno;
-    }
-}
 
 int copyFile(int from, const struct stat& status, int toFolder, const char* name) {
     FileDescriptor to(
         ::openat(toFolder, name, O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600));
     if (!to)
         return lastError();
-    std::uint64_t copied = 0;
-    if (const int error = copyData(from, to.get(), copied))
+    if (const int error = copyContent(from, to.get(), static_cast<std::uint64_t>(status.st_size)))
         return error;
-    if (copied != static_cast<std::uint64_t>(status.st_size))
-        return EIO;  // cut short, or grown, while it was copied
     if (const int error = copyAttributes(from, to.get(), /*onlyMissing=*/false))
         return error;
     if (const int error = copyStatus(status, to.get()))

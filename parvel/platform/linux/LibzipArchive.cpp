@@ -1,6 +1,8 @@
 #include "parvel/platform/linux/LibzipArchive.h"
 
 #include <algorithm>
+#include <cerrno>
+#include <vector>
 
 #include "parvel/platform/linux/ZipFormat.h"
 
@@ -8,9 +10,8 @@ namespace parvel::host {
 
 namespace {
 
-/// What opening may read: a directory of some 90,000 entries with names of the usual length, which
-/// libzip keeps in about three times as much memory.
-constexpr std::uint64_t openingBudget = 8ULL << 20;
+/// Up to here an entry is inflated in one piece also where a cancel may come in between.
+constexpr std::uint64_t largestDeliveredWhole = 8ULL << 20;
 constexpr std::uint64_t pieceLength = 1ULL << 20;
 
 struct CloseEntry {
@@ -32,11 +33,12 @@ bool readFully(zip_file_t* entry, std::uint8_t* buffer, std::uint64_t size) {
 
 }  // namespace
 
-std::unique_ptr<LibzipArchive> LibzipArchive::open(int file, std::uint64_t fileSize) {
+std::unique_ptr<LibzipArchive> LibzipArchive::open(int file, std::uint64_t fileSize,
+                                                   std::uint64_t budget) {
     if (fileSize < zip::endLength)  // libzip takes an empty file for an empty archive
         return nullptr;
     std::unique_ptr<LibzipArchive> archive(new LibzipArchive(file, fileSize));
-    archive->m_archive = archive->m_source.open(openingBudget);
+    archive->m_archive = archive->m_source.open(budget);
     if (!archive->m_archive)
         return nullptr;
     return archive;
@@ -54,14 +56,21 @@ std::optional<Data> LibzipArchive::readEntry(std::string_view name, std::uint64_
 /// it gives as the stored bytes has a space for each NUL, and is the name of the Unicode field
 /// where an entry has one.
 std::optional<std::uint64_t> LibzipArchive::find(std::string_view name) const {
-    const zip_int64_t count = zip_get_num_entries(m_archive.get(), 0);
-    for (zip_int64_t i = 0; i < count; ++i) {
-        const auto index = static_cast<std::uint64_t>(i);
-        const char* stored = zip_get_name(m_archive.get(), index, ZIP_FL_ENC_RAW);
+    const std::uint64_t count = entryCount();
+    for (std::uint64_t index = 0; index < count; ++index) {
+        const char* stored = this->name(index);
         if (stored && stored == name)
             return index;
     }
     return std::nullopt;
+}
+
+std::uint64_t LibzipArchive::entryCount() const {
+    return static_cast<std::uint64_t>(zip_get_num_entries(m_archive.get(), 0));
+}
+
+const char* LibzipArchive::name(std::uint64_t index) const {
+    return zip_get_name(m_archive.get(), index, ZIP_FL_ENC_RAW);
 }
 
 bool LibzipArchive::describe(std::uint64_t index, ZipEntry& entry) const {
@@ -103,6 +112,40 @@ std::optional<Data> LibzipArchive::readInPieces(std::uint64_t index, const ZipEn
         zip_fread(file.get(), &beyond, 1) != 0)
         return std::nullopt;
     return Data::adopt(std::move(content), entry.size);
+}
+
+int LibzipArchive::deliver(std::uint64_t index, const ZipEntry& entry, const Sink& sink) {
+    if (std::max(entry.size, entry.compressedSize) > largestDeliveredWhole)
+        return deliverInPieces(index, entry, sink);
+    const std::optional<Data> content = readWhole(index, entry);
+    if (!content)
+        return readError();
+    std::vector<std::uint8_t> storage;
+    return sink(content->contiguous(storage));
+}
+
+/// The end is read too: libzip checks size and checksum when it meets it.
+int LibzipArchive::deliverInPieces(std::uint64_t index, const ZipEntry& entry, const Sink& sink) {
+    const EntryHandle file(zip_fopen_index(m_archive.get(), index, 0));
+    if (!file)
+        return readError();
+    const auto piece = std::make_unique_for_overwrite<std::uint8_t[]>(pieceLength);
+    for (std::uint64_t delivered = 0;;) {
+        const zip_int64_t count = zip_fread(file.get(), piece.get(), pieceLength);
+        if (count < 0)
+            return readError();
+        if (count == 0)
+            return delivered == entry.size ? 0 : EBADMSG;
+        delivered += static_cast<std::uint64_t>(count);
+        if (delivered > entry.size)
+            return EBADMSG;
+        if (const int error = sink({piece.get(), static_cast<std::size_t>(count)}))
+            return error;
+    }
+}
+
+int LibzipArchive::readError() const {
+    return m_source.readError() != 0 ? m_source.readError() : EBADMSG;
 }
 
 }  // namespace parvel::host

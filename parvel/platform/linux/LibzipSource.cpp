@@ -160,6 +160,8 @@ zip_int64_t LibzipSource::readAt(std::uint64_t position, std::uint8_t* data, std
 }
 
 zip_int64_t LibzipSource::fail(int zipError, int errnoValue) {
+    if (errnoValue != 0)
+        m_readError = errnoValue;
     zip_error_set(&m_error, zipError, errnoValue);
     return -1;
 }

@@ -25,6 +25,8 @@ public:
 
     /// Null when libzip does not take the file for an archive. The source must outlive the handle.
     [[nodiscard]] LibzipHandle open(std::uint64_t budget);
+    /// The errno value of the last read that failed; 0 where none has.
+    [[nodiscard]] int readError() const { return m_readError; }
 
 private:
     static zip_int64_t command(void* source, void* data, zip_uint64_t length,
@@ -44,6 +46,7 @@ private:
     std::uint64_t m_budget = 0;
     bool m_isOpening = false;
     zip_error_t m_error = {};
+    int m_readError = 0;
 
     std::array<std::uint8_t, 4096> m_ahead;  ///< libzip reads a directory in pieces of a few bytes
     std::uint64_t m_aheadPosition = 0;

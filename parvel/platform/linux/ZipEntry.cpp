@@ -22,10 +22,7 @@ constexpr std::uint64_t largestWholeEntry = 32ULL << 20;
 constexpr std::uint64_t mostBytesPerByte = 1032;
 
 bool isLinkOrFolder(const ZipEntry& entry) {
-    if (entry.hostSystem != unixSystem && entry.hostSystem != darwinSystem)
-        return false;
-    const mode_t mode = entry.externalAttributes >> modeShift;
-    return S_ISLNK(mode) || S_ISDIR(mode);
+    return S_ISLNK(entry.unixMode()) || S_ISDIR(entry.unixMode());
 }
 
 bool canGiveItsSize(const ZipEntry& entry) {
@@ -40,6 +37,15 @@ bool canGiveItsSize(const ZipEntry& entry) {
 
 bool ZipEntry::isLarge() const {
     return size > largestWholeEntry || compressedSize > largestWholeEntry;
+}
+
+bool ZipEntry::hasKnownMethod() const {
+    return method == storedMethod || method == deflatedMethod;
+}
+
+std::uint32_t ZipEntry::unixMode() const {
+    const bool isUnix = hostSystem == unixSystem || hostSystem == darwinSystem;
+    return isUnix ? externalAttributes >> modeShift : 0;
 }
 
 bool canBeDelivered(const ZipEntry& entry, std::uint64_t limit) {

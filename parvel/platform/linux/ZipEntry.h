@@ -24,6 +24,9 @@ struct ZipEntry {
 
     /// Too large to be inflated in one piece.
     [[nodiscard]] bool isLarge() const;
+    [[nodiscard]] bool hasKnownMethod() const;
+    /// Type and permissions as Unix has them; 0 where another system made the entry.
+    [[nodiscard]] std::uint32_t unixMode() const;
 };
 
 /// Whether what is said of the entry lets it be delivered: a plain, stored or deflated file within

@@ -1,0 +1,296 @@
+// Expands an archive that is hostile until read. Its claims are weighed before anything is made;
+// then each entry in the directory's order: its name is checked, its folder opened, or made, one
+// component at a time without following a link, its file made exclusively there, and its content
+// held to the claimed size and checksum.
+
+#include "parvel/platform/linux/ArchiveExpansion.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <sys/statvfs.h>
+
+#include <algorithm>
+#include <cstring>
+#include <limits>
+#include <memory>
+#include <string_view>
+
+#include "parvel/foundation/URL.h"
+#include "parvel/platform/linux/FileDescriptor.h"
+#include "parvel/platform/linux/ItemContent.h"
+#include "parvel/platform/linux/LibzipArchive.h"
+#include "parvel/platform/linux/OpenBeneath.h"
+#include "parvel/platform/linux/Paths.h"
+#include "parvel/platform/linux/SystemCall.h"
+#include "parvel/platform/linux/ZipFormat.h"
+
+namespace parvel::host {
+
+namespace {
+
+/// A directory of some 350,000 entries; libzip takes about 100 MB for it.
+constexpr std::uint64_t kDirectoryBudget = 32ULL << 20;
+constexpr std::size_t kLongestPath = 4095;
+constexpr std::size_t kLongestComponent = 255;
+constexpr int kMostComponents = 200;
+constexpr std::size_t kWrittenAtOnce = std::size_t{1} << 20;
+
+std::uint64_t saturatingSum(std::uint64_t left, std::uint64_t right) {
+    return left > std::numeric_limits<std::uint64_t>::max() - right
+               ? std::numeric_limits<std::uint64_t>::max()
+               : left + right;
+}
+
+struct OpenArchive {
+    FileDescriptor file;
+    std::uint64_t size = 0;
+    std::unique_ptr<LibzipArchive> archive;
+
+    /// 0 or the errno value.
+    [[nodiscard]] int open(const std::string& path) {
+        file = FileDescriptor(retried(
+            [&] { return ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY); }));
+        struct stat status {};
+        if (!file || ::fstat(file.get(), &status) != 0)
+            return errno;
+        if (S_ISDIR(status.st_mode))
+            return EISDIR;
+        if (!S_ISREG(status.st_mode))
+            return EBADMSG;
+        size = static_cast<std::uint64_t>(status.st_size);
+        archive = LibzipArchive::open(file.get(), size, kDirectoryBudget);
+        return archive ? 0 : EBADMSG;
+    }
+};
+
+bool isFolder(std::string_view name, const ZipEntry& entry) {
+    return name.ends_with('/') || S_ISDIR(entry.unixMode());
+}
+
+/// 0 for a name that stays below the folder, one component after the other.
+int checkName(std::string_view name) {
+    if (name.size() > kLongestPath)
+        return ENAMETOOLONG;
+    for (int count = 1;; ++count) {
+        const std::size_t slash = name.find('/');
+        const std::string_view component = name.substr(0, slash);
+        if (component.empty() || component == "." || component == "..")
+            return EPERM;
+        if (component.size() > kLongestComponent || count > kMostComponents)
+            return ENAMETOOLONG;
+        if (slash == std::string_view::npos)
+            return 0;
+        name.remove_prefix(slash + 1);
+    }
+}
+
+/// 0 for a kind of entry that is expanded.
+int checkKind(const ZipEntry& entry) {
+    const mode_t type = entry.unixMode() & S_IFMT;
+    if (type == S_IFLNK)
+        return ELOOP;
+    return type == 0 || type == S_IFREG || type == S_IFDIR ? 0 : EOPNOTSUPP;
+}
+
+int checkContent(const ZipEntry& entry) {
+    if (entry.isEncrypted)
+        return EACCES;
+    if (!entry.hasKnownMethod())
+        return EOPNOTSUPP;
+    return canBeDelivered(entry, std::numeric_limits<std::uint64_t>::max()) ? 0 : EBADMSG;
+}
+
+/// The folders below one that holds all; the one used last stays open.
+class FoldersBelow {
+public:
+    explicit FoldersBelow(FileDescriptor root) : m_root(std::move(root)) {}
+
+    [[nodiscard]] int root() const { return m_root.get(); }
+
+    /// The open folder of that path, made with those on the way to it; negative with errno set.
+    [[nodiscard]] int open(std::string_view path) {
+        if (path.empty())
+            return m_root.get();
+        if (m_last && path == m_lastPath)
+            return m_last.get();
+        const std::string wanted(path);
+        m_last = openBeneath(m_root.get(), wanted.c_str(), O_PATH | O_DIRECTORY);
+        if (!m_last && errno == ENOENT)
+            m_last = make(wanted);
+        m_lastPath = wanted;
+        return m_last.get();
+    }
+
+private:
+    [[nodiscard]] FileDescriptor make(const std::string& path) const {
+        FileDescriptor folder;
+        for (std::size_t start = 0; start < path.size();) {
+            const std::size_t end = std::min(path.find('/', start), path.size());
+            const std::string component = path.substr(start, end - start);
+            const int above = folder ? folder.get() : m_root.get();
+            if (::mkdirat(above, component.c_str(), 0700) != 0 && errno != EEXIST)
+                return {};
+            FileDescriptor next = openBeneath(above, component.c_str(), O_PATH | O_DIRECTORY);
+            if (!next)
+                return {};
+            folder = std::move(next);
+            start = end + 1;
+        }
+        return folder;
+    }
+
+    FileDescriptor m_root;
+    FileDescriptor m_last;
+    std::string m_lastPath;
+};
+
+class Expansion {
+public:
+    Expansion(LibzipArchive& archive, FileDescriptor root, const std::string& destination,
+              const CopierReports& reports)
+        : m_archive(archive),
+          m_folders(std::move(root)),
+          m_destination(destination),
+          m_reports(reports) {}
+
+    /// 0 or the errno value, told already.
+    int run() {
+        const std::uint64_t count = m_archive.entryCount();
+        for (std::uint64_t index = 0; index < count; ++index) {
+            if (const int error = m_reports.cancellation())
+                return error;
+            if (const int error = expandEntry(index))
+                return error;
+        }
+        return 0;
+    }
+
+private:
+    int expandEntry(std::uint64_t index) {
+        const char* stored = m_archive.name(index);
+        const std::string_view name = stored ? stored : "";
+        const std::string path = pathAppending(m_destination, name);
+        ZipEntry entry;
+        if (!m_archive.describe(index, entry))
+            return m_reports.failed(path, EBADMSG);
+        const std::string_view item = name.ends_with('/') ? name.substr(0, name.size() - 1) : name;
+        int error = checkName(item);
+        if (error == 0)
+            error = checkKind(entry);
+        if (error == 0 && isFolder(name, entry))
+            return m_folders.open(item) < 0 ? m_reports.failed(path, errno) : 0;
+        if (error == 0)
+            error = checkContent(entry);
+        return error == 0 ? expandFile(index, entry, name, path) : m_reports.failed(path, error);
+    }
+
+    int expandFile(std::uint64_t index, const ZipEntry& entry, std::string_view name,
+                   const std::string& path) {
+        const std::size_t slash = name.rfind('/');
+        const bool isAtTop = slash == std::string_view::npos;
+        const int folder = m_folders.open(isAtTop ? "" : name.substr(0, slash));
+        const std::string last(isAtTop ? name : name.substr(slash + 1));
+        FileDescriptor file;
+        if (folder >= 0)
+            file = FileDescriptor(::openat(
+                folder, last.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600));
+        if (!file)
+            return m_reports.failed(path, errno);
+
+        int error = deliver(index, entry, file.get());
+        if (error == 0)
+            error = file.close();
+        if (error == 0) {
+            m_reports.finished(path, ArchiveObjectType::File, entry.size);
+            return 0;
+        }
+        error = m_reports.failed(path, error);
+        if (error == 0)
+            ::unlinkat(folder, last.c_str(), 0);  // left out, so not left in part
+        return error;
+    }
+
+    int deliver(std::uint64_t index, const ZipEntry& entry, int file) {
+        WriteBehind disk(file);
+        std::uint64_t size = 0;
+        return m_archive.deliver(index, entry, [&](Data::Bytes piece) {
+            while (!piece.empty()) {
+                if (const int error = m_reports.cancellation())
+                    return error;
+                const ssize_t written = retried([&] {
+                    return ::write(file, piece.data(), std::min(piece.size(), kWrittenAtOnce));
+                });
+                if (written < 0)
+                    return errno;
+                piece = piece.subspan(static_cast<std::size_t>(written));
+                size += static_cast<std::uint64_t>(written);
+                if (const int error = disk.reached(size))
+                    return error;
+            }
+            return m_reports.cancellation();
+        });
+    }
+
+    LibzipArchive& m_archive;
+    FoldersBelow m_folders;
+    const std::string& m_destination;
+    const CopierReports& m_reports;
+};
+
+/// Entries that share their bytes make a small archive expand without end: together they must fit
+/// into the file. What they give must fit on the disk.
+int checkClaims(const OpenArchive& source, const std::string& destination) {
+    std::uint64_t stored = 0;
+    std::uint64_t content = 0;
+    const std::uint64_t count = source.archive->entryCount();
+    for (std::uint64_t index = 0; index < count; ++index) {
+        ZipEntry entry;
+        if (!source.archive->describe(index, entry))
+            continue;
+        stored = saturatingSum(stored, entry.compressedSize);
+        stored = saturatingSum(stored, zip::localHeaderLength + zip::directoryHeaderLength);
+        if (checkContent(entry) == 0)
+            content = saturatingSum(content, entry.size);
+    }
+    if (stored > source.size)
+        return EBADMSG;
+    struct statvfs room {};
+    const bool isKnown = ::statvfs(parentFolderOf(destination).c_str(), &room) == 0;
+    return isKnown && content / room.f_frsize > room.f_bavail ? ENOSPC : 0;
+}
+
+}  // namespace
+
+ArchiveCopier::Count countArchiveEntries(const std::string& archive, const CopierReports& reports) {
+    ArchiveCopier::Count result;
+    OpenArchive source;
+    if (source.open(archive) != 0)
+        return result;
+    const std::uint64_t count = source.archive->entryCount();
+    for (std::uint64_t index = 0; index < count && reports.cancellation() == 0; ++index) {
+        const char* name = source.archive->name(index);
+        ZipEntry entry;
+        if (!name || !source.archive->describe(index, entry) || isFolder(name, entry))
+            continue;
+        ++result.files;
+        result.bytes = saturatingSum(result.bytes, entry.size);
+    }
+    return result;
+}
+
+int expandArchive(const std::string& archive, const std::string& destination,
+                  const CopierReports& reports) {
+    OpenArchive source;
+    if (const int error = source.open(archive))
+        return reports.fatal(error);
+    if (const int error = checkClaims(source, destination))
+        return reports.fatal(error);
+    if (::mkdir(destination.c_str(), 0700) != 0)
+        return reports.fatal(errno);
+    FileDescriptor root(::open(destination.c_str(), O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+    if (!root)
+        return reports.fatal(errno);
+    return Expansion(*source.archive, std::move(root), destination, reports).run();
+}
+
+}  // namespace parvel::host

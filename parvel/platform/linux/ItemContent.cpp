@@ -1,0 +1,189 @@
+#include "parvel/platform/linux/ItemContent.h"
+
+#include <fcntl.h>
+#include <sys/sendfile.h>
+#include <sys/vfs.h>
+#include <sys/xattr.h>
+#include <unistd.h>
+
+#include <array>
+#include <cerrno>
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "parvel/platform/linux/SystemCall.h"
+
+namespace parvel::host {
+
+namespace {
+
+constexpr std::size_t kCopyPiece = std::size_t{1} << 20;
+/// What a file that is being written may hold that is not on the disk.
+constexpr std::uint64_t kMostBehind = std::uint64_t{8} << 20;
+constexpr long kFuseMagic = 0x65735546;
+constexpr std::string_view kUserAttributes = "user.";
+
+/// The ways to copy a piece, best first: the kernel may share the blocks, or copy without us.
+enum class PieceWay { Range, Sendfile, Buffer };
+
+class PieceCopy {
+public:
+    PieceCopy(int from, int to) : m_from(from), m_to(to) {}
+
+    /// The length copied; 0 at the end of the file, and negative with errno set.
+    ssize_t next() {
+        for (;;) {
+            const ssize_t length = retried([&] { return copyPiece(); });
+            if (length > 0 || m_way == PieceWay::Buffer || (length < 0 && !canFallBack(errno)))
+                return length;
+            // Some file systems answer 0 early, so reading alone shows the end.
+            m_way = length < 0 && m_way == PieceWay::Range ? PieceWay::Sendfile : PieceWay::Buffer;
+        }
+    }
+
+private:
+    static bool canFallBack(int error) {
+        return error == EXDEV || error == EINVAL || error == ENOSYS || error == EOPNOTSUPP ||
+               error == EBADF;
+    }
+
+    ssize_t copyPiece() {
+        switch (m_way) {
+            case PieceWay::Range:
+                return ::copy_file_range(m_from, nullptr, m_to, nullptr, kCopyPiece, 0);
+            case PieceWay::Sendfile:
+                return ::sendfile(m_to, m_from, nullptr, kCopyPiece);
+            case PieceWay::Buffer:
+                break;
+        }
+        if (!m_buffer)
+            m_buffer = std::make_unique_for_overwrite<char[]>(kCopyPiece);
+        const ssize_t length = ::read(m_from, m_buffer.get(), kCopyPiece);
+        for (ssize_t at = 0; at < length;) {
+            const ssize_t written = retried([&] {
+                return ::write(m_to, m_buffer.get() + at, static_cast<std::size_t>(length - at));
+            });
+            if (written < 0)
+                return written;
+            at += written;
+        }
+        return length;
+    }
+
+    int m_from;
+    int m_to;
+    PieceWay m_way = PieceWay::Range;
+    std::unique_ptr<char[]> m_buffer;
+};
+
+std::optional<std::vector<std::string>> userAttributeNames(int file) {
+    const ssize_t size = ::flistxattr(file, nullptr, 0);
+    if (size < 0)
+        return std::nullopt;
+    std::string list(static_cast<std::size_t>(size), '\0');
+    const ssize_t length = ::flistxattr(file, list.data(), list.size());
+    if (length < 0)
+        return std::nullopt;
+    std::vector<std::string> names;
+    for (std::size_t at = 0; at < static_cast<std::size_t>(length);) {
+        const std::string name = list.c_str() + at;
+        at += name.size() + 1;
+        if (name.starts_with(kUserAttributes))
+            names.push_back(name);
+    }
+    return names;
+}
+
+/// File systems without attributes lose them silently; some FUSE mounts say EIO for that.
+bool isLossTolerated(int error, int file) {
+    if (error == ENOTSUP || error == EPERM || error == EACCES)
+        return true;
+    struct statfs system {};
+    return error == EIO && ::fstatfs(file, &system) == 0 && system.f_type == kFuseMagic;
+}
+
+int copyAttribute(int from, int to, const std::string& name, int flags) {
+    const ssize_t size = ::fgetxattr(from, name.c_str(), nullptr, 0);
+    if (size < 0)
+        return errno == ENODATA ? 0 : errno;
+    std::string value(static_cast<std::size_t>(size), '\0');
+    const ssize_t length = ::fgetxattr(from, name.c_str(), value.data(), value.size());
+    if (length < 0)
+        return errno == ENODATA ? 0 : errno;
+    if (::fsetxattr(to, name.c_str(), value.data(), static_cast<std::size_t>(length), flags) == 0)
+        return 0;
+    const int error = errno;
+    return isLossTolerated(error, to) ? 0 : error;
+}
+
+}  // namespace
+
+int copyContent(int from, int to, std::uint64_t size, const PieceReport& report) {
+    PieceCopy pieces(from, to);
+    std::uint64_t copied = 0;
+    for (;;) {
+        const ssize_t length = pieces.next();
+        if (length < 0)
+            return errno;
+        copied += static_cast<std::uint64_t>(length);
+        // Cut short, or grown, while it was copied.
+        if (copied > size || (length == 0 && copied < size))
+            return EIO;
+        if (length == 0)
+            return 0;
+        if (const int error = report ? report(copied) : 0)
+            return error;
+    }
+}
+
+int copyAttributes(int from, int to, bool onlyMissing) {
+    const auto names = userAttributeNames(from);
+    if (!names)
+        return errno == ENOTSUP || isLossTolerated(errno, from) ? 0 : errno;
+    for (const std::string& name : *names) {
+        const int error = copyAttribute(from, to, name, onlyMissing ? XATTR_CREATE : 0);
+        if (error != 0 && !(onlyMissing && error == EEXIST))
+            return error;
+    }
+    return 0;
+}
+
+/// Owner and group first, since a change of owner drops mode bits; times last.
+int copyStatus(const struct stat& status, int to) {
+    if (::fchown(to, status.st_uid, status.st_gid) != 0 &&
+        ::fchown(to, static_cast<uid_t>(-1), status.st_gid) != 0 && errno == EIO)
+        return EIO;
+    if (::fchmod(to, status.st_mode & 01777) != 0 && errno != EPERM && errno != ENOTSUP)
+        return errno;
+    const std::array<timespec, 2> times{status.st_atim, status.st_mtim};
+    if (::futimens(to, times.data()) != 0 && errno != EPERM && errno != ENOTSUP)
+        return errno;
+    return 0;
+}
+
+int WriteBehind::reached(std::uint64_t size) {
+    const auto sync = [&](std::uint64_t from, std::uint64_t to, unsigned flags) {
+        const int result = ::sync_file_range(m_file, static_cast<off_t>(from),
+                                             static_cast<off_t>(to - from), flags);
+        // A failed write is told once, here or by the last sync; a missing service is no failure.
+        return result != 0 && (errno == EIO || errno == ENOSPC || errno == EDQUOT) ? errno : 0;
+    };
+    if (size - m_started < kCopyPiece || size <= kMostBehind)
+        return 0;
+    if (const int error = sync(m_started, size, SYNC_FILE_RANGE_WRITE))
+        return error;
+    m_started = size;
+    const std::uint64_t due = size - kMostBehind;
+    if (due <= m_awaited)
+        return 0;
+    const int error =
+        sync(m_awaited, due,
+             SYNC_FILE_RANGE_WAIT_BEFORE | SYNC_FILE_RANGE_WRITE | SYNC_FILE_RANGE_WAIT_AFTER);
+    m_awaited = due;
+    return error;
+}
+
+}  // namespace parvel::host

@@ -1,0 +1,44 @@
+#pragma once
+
+#include <sys/stat.h>
+
+#include <cstdint>
+#include <functional>
+
+namespace parvel::host {
+
+/// What makes up a single file or folder, copied from one open descriptor to another. Every
+/// function gives 0 or the errno value.
+
+/// Told how many bytes are copied after each piece of at most 1 MiB; ends the copy with anything
+/// but 0.
+using PieceReport = std::function<int(std::uint64_t copied)>;
+
+/// Copies a regular file to its end, into an empty one, sharing the bytes on disk where the file
+/// system can. EIO where it does not have the size that is expected of it.
+[[nodiscard]] int copyContent(int from, int to, std::uint64_t size,
+                              const PieceReport& report = nullptr);
+
+/// Copies the `user.` attributes, or those that are missing there. File systems without attributes
+/// lose them.
+[[nodiscard]] int copyAttributes(int from, int to, bool onlyMissing = false);
+
+/// Gives it owner and group as far as allowed, the mode without set-id bits, and the times.
+[[nodiscard]] int copyStatus(const struct stat& status, int to);
+
+/// Has a file that is being written go to the disk while it grows, no more than a few pieces
+/// behind, so that neither its last sync nor a cancel has long to wait.
+class WriteBehind {
+public:
+    explicit WriteBehind(int file) : m_file(file) {}
+
+    /// Tells the size that the file has reached. 0, or the errno value of a failed write.
+    [[nodiscard]] int reached(std::uint64_t size);
+
+private:
+    int m_file;
+    std::uint64_t m_started = 0;
+    std::uint64_t m_awaited = 0;
+};
+
+}  // namespace parvel::host

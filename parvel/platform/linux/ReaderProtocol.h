@@ -12,8 +12,11 @@
 /// The library trusts nothing in a reply all the same.
 namespace parvel::reader {
 
-/// The helper's socket is inherited under this descriptor.
+/// The helper is started as `parvel-reader BYTES [fonts]`: the address space that it may have for
+/// input beyond its own, and whether it makes the host's fonts ready, which takes a while. Its
+/// socket is inherited under this descriptor.
 inline constexpr int socketDescriptor = 3;
+inline constexpr const char* fontsArgument = "fonts";
 
 /// Raised with every change to what follows; Hello carries it.
 inline constexpr std::uint32_t version = 1;
@@ -22,7 +25,8 @@ enum class Ask : std::uint32_t {
     /// With the document's descriptor. Takes the place of a document that is open. Answered with
     /// the information and, behind the header, the author's and then the subject's UTF-8 text.
     OpenDocument = 1,
-    /// Draws the first page of the open document, `width` by `height`. Answered with pixels.
+    /// Draws the first page of the open document, `width` by `height`. Answered with pixels, or
+    /// with FontsWanted.
     DrawPage = 2,
     /// Unmaps and closes the open document, if any.
     CloseDocument = 3,
@@ -31,6 +35,8 @@ enum class Ask : std::uint32_t {
     /// With the descriptor of pixels: `width`, `height` and `stride`, `size` bytes in all. Answered
     /// with the descriptor of a PNG file of `size` bytes.
     EncodePNG = 5,
+    /// Answered with what is known of the first page of the open document.
+    DescribePage = 6,
 };
 
 struct Request {
@@ -46,6 +52,9 @@ enum class Outcome : std::uint32_t {
     /// The input is damaged, of no known kind or over a limit. Nothing else in the reply counts.
     Refused = 2,
     Hello = 3,
+    /// The page needs a font, or another file of the host, that this helper was not started with.
+    /// It ends behind this reply.
+    FontsWanted = 4,
 };
 
 /// What Hello says of the walls.
@@ -93,8 +102,10 @@ inline constexpr std::uint32_t longestDrawnSide = 16384;
 inline constexpr int informationMilliseconds = 1500;
 inline constexpr int drawingMilliseconds = 5000;
 inline constexpr int longestWaitMilliseconds = 10000;
-/// Address space beyond the document's own bytes.
+/// Address space beyond the input's own bytes, and what a helper gets for the input unless that is
+/// longer.
 inline constexpr std::uint64_t addressSpace = 256ULL << 20;
+inline constexpr std::uint64_t ordinaryInput = 64ULL << 20;
 /// The longest document: the PDF library counts its bytes in an int.
 inline constexpr std::uint64_t longestDocument = 0x7fffffff;
 

@@ -1,0 +1,244 @@
+#include "reader/Document.h"
+
+#include <poppler-document.h>
+#include <poppler-global.h>
+#include <poppler-page-renderer.h>
+#include <poppler-page.h>
+#include <sys/mman.h>
+#include <sys/stat.h>
+
+#include <algorithm>
+#include <cmath>
+#include <cstring>
+#include <optional>
+#include <utility>
+
+#include "reader/MemoryFile.h"
+#include "reader/PdfDate.h"
+#include "reader/PdfText.h"
+
+namespace parvel::reader {
+
+/// A file's bytes. A file that is cut short ends the process, which is meant: it hurts nobody here.
+class Document::Mapping {
+public:
+    explicit Mapping(int descriptor) {
+        struct stat status;
+        if (::fstat(descriptor, &status) != 0 || status.st_size <= 0 ||
+            static_cast<std::uint64_t>(status.st_size) > longestDocument)
+            return;
+        const auto size = static_cast<std::size_t>(status.st_size);
+        void* bytes = ::mmap(nullptr, size, PROT_READ, MAP_PRIVATE, descriptor, 0);
+        if (bytes != MAP_FAILED) {
+            m_bytes = static_cast<const char*>(bytes);
+            m_size = size;
+        }
+    }
+    ~Mapping() {
+        if (m_bytes)
+            ::munmap(const_cast<char*>(m_bytes), m_size);
+    }
+    Mapping(const Mapping&) = delete;
+    Mapping& operator=(const Mapping&) = delete;
+
+    [[nodiscard]] const char* bytes() const { return m_bytes; }
+    [[nodiscard]] std::size_t size() const { return m_size; }
+
+private:
+    const char* m_bytes = nullptr;
+    std::size_t m_size = 0;
+};
+
+namespace {
+
+constexpr std::string_view smallestDocument =
+    "%PDF-1.4\n1 0 obj<</Type/Catalog/Pages 2 0 R>>endobj "
+    "2 0 obj<</Type/Pages/Kids[]/Count 0>>endobj trailer<</Root 1 0 R>>";
+
+/// The part of the bitmap that the page covers. Its shape is the page's but for a fraction of a
+/// pixel on one axis, which is stretched to whole pixels: no edge is left half covered.
+struct Placement {
+    int x = 0;
+    int y = 0;
+    int width = 0;
+    int height = 0;
+};
+
+/// As large as fits, centred.
+Placement placePage(double pageWidth, double pageHeight, int width, int height) {
+    constexpr double roundingError = 1e-6;
+    const double scale = std::min(width / pageWidth, height / pageHeight);
+    const auto pixels = [&](double length, int most) {
+        const double exact = std::ceil(length * scale - roundingError);
+        return std::clamp(exact, 1.0, static_cast<double>(most));
+    };
+    Placement placement;
+    placement.width = static_cast<int>(pixels(pageWidth, width));
+    placement.height = static_cast<int>(pixels(pageHeight, height));
+    placement.x = (width - placement.width) / 2;
+    placement.y = (height - placement.height) / 2;
+    return placement;
+}
+
+int degreesOf(const poppler::page& page) {
+    switch (page.orientation()) {
+        case poppler::page::landscape:
+            return 90;
+        case poppler::page::upside_down:
+            return 180;
+        case poppler::page::seascape:
+            return 270;
+        case poppler::page::portrait:
+            break;
+    }
+    return 0;
+}
+
+/// The entry as UTF-8; none when it is missing or too long.
+std::optional<std::string> textOf(const poppler::document& document,
+                                  const std::vector<std::string>& keys, const char* key) {
+    if (std::find(keys.begin(), keys.end(), key) == keys.end())
+        return std::nullopt;
+    const poppler::ustring units = document.info_key(key);
+    std::string text = utf8OfPdfText(std::u16string(units.begin(), units.end()));
+    return text.size() <= longestText ? std::optional(std::move(text)) : std::nullopt;
+}
+
+void addText(Answer& answer, std::uint32_t& size, const std::optional<std::string>& text) {
+    if (!text)
+        return;
+    size = static_cast<std::uint32_t>(text->size());
+    answer.text += *text;
+}
+
+void addDate(std::uint32_t& isThere, double& seconds, const std::optional<std::string>& text) {
+    const std::optional<double> date = text ? secondsOfPdfDate(*text) : std::nullopt;
+    isThere = date ? 1 : 0;
+    seconds = date.value_or(0);
+}
+
+Answer informationOf(const poppler::document& document) {
+    Answer answer;
+    Reply& reply = answer.reply;
+    reply.outcome = Outcome::Done;
+    reply.isLocked = document.is_locked() ? 1 : 0;
+    if (document.is_locked())
+        return answer;
+    const std::vector<std::string> keys = document.info_keys();
+    addText(answer, reply.authorSize, textOf(document, keys, "Author"));
+    addText(answer, reply.subjectSize, textOf(document, keys, "Subject"));
+    addDate(reply.hasCreationDate, reply.creationDate, textOf(document, keys, "CreationDate"));
+    addDate(reply.hasModificationDate, reply.modificationDate, textOf(document, keys, "ModDate"));
+    reply.pageCount = static_cast<std::uint32_t>(std::max(document.pages(), 0));
+    return answer;
+}
+
+/// The page in the given place of an opaque white bitmap, as 32-bit pixels. False when it can't be
+/// drawn.
+bool drawInto(std::uint8_t* pixels, std::size_t stride, const poppler::page& page, double pageWidth,
+              double pageHeight, const Placement& placement) {
+    constexpr double pointsAnInch = 72;
+    constexpr std::size_t pixelSize = 4;
+    poppler::page_renderer renderer;
+    renderer.set_render_hints(poppler::page_renderer::antialiasing |
+                              poppler::page_renderer::text_antialiasing);
+    const poppler::image image = renderer.render_page(
+        &page, pointsAnInch * placement.width / pageWidth,
+        pointsAnInch * placement.height / pageHeight, 0, 0, placement.width, placement.height);
+    if (image.width() != placement.width || image.height() != placement.height ||
+        image.format() != poppler::image::format_argb32)
+        return false;
+    for (int row = 0; row < placement.height; ++row) {
+        const char* from = image.const_data() + std::ptrdiff_t{row} * image.bytes_per_row();
+        std::uint8_t* to = pixels + (static_cast<std::size_t>(placement.y) + row) * stride +
+                           static_cast<std::size_t>(placement.x) * pixelSize;
+        std::memcpy(to, from, static_cast<std::size_t>(placement.width) * pixelSize);
+    }
+    return true;
+}
+
+Answer refusal() {
+    Answer answer;
+    answer.reply.outcome = Outcome::Refused;
+    return answer;
+}
+
+}  // namespace
+
+Document::Document() {
+    poppler::set_debug_error_function([](const std::string&, void*) {}, nullptr);
+    m_held.reset(poppler::document::load_from_raw_data(smallestDocument.data(),
+                                                       static_cast<int>(smallestDocument.size())));
+}
+
+Document::~Document() = default;
+
+Answer Document::open(const Received& received) {
+    close();
+    m_bytes = std::make_unique<Mapping>(received.input.get());
+    if (m_bytes->size() > 0)
+        m_document.reset(poppler::document::load_from_raw_data(m_bytes->bytes(),
+                                                               static_cast<int>(m_bytes->size())));
+    if (m_document)
+        return informationOf(*m_document);
+    close();
+    return refusal();
+}
+
+void Document::close() {
+    m_document.reset();
+    m_bytes.reset();
+}
+
+Answer Document::describePage() const {
+    Answer answer;
+    answer.reply.outcome = Outcome::Done;
+    if (const std::unique_ptr<poppler::page> page = firstPage()) {
+        const poppler::rectf box = page->page_rect(poppler::crop_box);
+        answer.reply.hasFirstPage = 1;
+        answer.reply.cropBoxWidth = box.width();
+        answer.reply.cropBoxHeight = box.height();
+        answer.reply.rotation = degreesOf(*page);
+    }
+    return answer;
+}
+
+Answer Document::drawPage(const Request& request) const {
+    const std::unique_ptr<poppler::page> page = firstPage();
+    if (!page || request.width == 0 || request.height == 0 ||
+        std::max(request.width, request.height) > longestDrawnSide)
+        return refusal();
+    const poppler::rectf box = page->page_rect(poppler::crop_box);
+    double pageWidth = box.width();
+    double pageHeight = box.height();
+    if (degreesOf(*page) % 180 != 0)
+        std::swap(pageWidth, pageHeight);
+    if (!(pageWidth > 0 && pageHeight > 0))
+        return refusal();
+
+    Answer answer;
+    Reply& reply = answer.reply;
+    reply.width = request.width;
+    reply.height = request.height;
+    reply.stride = request.width * 4;
+    reply.size = std::uint64_t{reply.stride} * reply.height;
+    MemoryFile pixels(reply.size);
+    if (!pixels.isOpen())
+        return refusal();
+    std::memset(pixels.bytes().data(), 0xFF, pixels.bytes().size());
+    const Placement placement = placePage(pageWidth, pageHeight, static_cast<int>(request.width),
+                                          static_cast<int>(request.height));
+    if (!drawInto(pixels.bytes().data(), reply.stride, *page, pageWidth, pageHeight, placement))
+        return refusal();
+    answer.file = pixels.seal();
+    reply.outcome = answer.file ? Outcome::Done : Outcome::Refused;
+    return answer;
+}
+
+std::unique_ptr<poppler::page> Document::firstPage() const {
+    if (!m_document || m_document->is_locked() || m_document->pages() < 1)
+        return nullptr;
+    return std::unique_ptr<poppler::page>(m_document->create_page(0));
+}
+
+}  // namespace parvel::reader

@@ -1,0 +1,95 @@
+// parvel-reader BYTES [fonts]: parses PDF documents and images for libParvelFoundation behind walls
+// of the system. Started by the library alone; what the two say is in ReaderProtocol.h.
+//
+//   1. what needs files of the host is made ready;
+//   2. the walls go up, and Hello says which stand;
+//   3. requests are answered one after the other, until the library closes its end.
+
+#include <cstdlib>
+#include <new>
+#include <string_view>
+
+#include "reader/Channel.h"
+#include "reader/Document.h"
+#include "reader/Fonts.h"
+#include "reader/HostFiles.h"
+#include "reader/Walls.h"
+
+namespace parvel::reader {
+namespace {
+
+/// Tables for the scripts of East Asia, where they are installed.
+constexpr const char* tablesFolder = "/usr/share/poppler";
+
+void readyHostFiles() {
+    readyFonts();
+    keepHostFolder(tablesFolder);
+}
+
+class Reader {
+public:
+    explicit Reader(bool hasFonts) : m_hasFonts(hasFonts) {}
+
+    /// False for a request that makes no sense.
+    bool answer(const Received& received, Answer& answer) {
+        allowAddressSpace(received.request.size);
+        switch (received.request.ask) {
+            case Ask::OpenDocument:
+                limitProcessorTime(informationMilliseconds);
+                answer = m_document.open(received);
+                return true;
+            case Ask::DescribePage:
+                limitProcessorTime(informationMilliseconds);
+                answer = m_document.describePage();
+                return true;
+            case Ask::DrawPage: {
+                limitProcessorTime(drawingMilliseconds);
+                const EndWhenFileIsWanted inForce(!m_hasFonts);
+                answer = m_document.drawPage(received.request);
+                return true;
+            }
+            case Ask::CloseDocument:
+                m_document.close();
+                answer.reply.outcome = Outcome::Done;
+                return true;
+            default:
+                return false;
+        }
+    }
+
+private:
+    bool m_hasFonts;
+    Document m_document;
+};
+
+int run(std::uint64_t inputBytes, bool hasFonts) {
+    // What the C library would look up in the host's files otherwise.
+    ::setenv("TZ", "UTC0", 1);
+    if (hasFonts)
+        readyHostFiles();
+    Reader reader(hasFonts);
+    answerTrappedCalls();
+
+    Answer hello;
+    hello.reply.outcome = Outcome::Hello;
+    hello.reply.version = version;
+    hello.reply.walls = raiseWalls(inputBytes);
+    bool isGoingOn = send(hello);
+    while (isGoingOn) {
+        Received received;
+        Answer answer;
+        isGoingOn = receive(received) && reader.answer(received, answer) && send(answer);
+    }
+    return EXIT_SUCCESS;
+}
+
+}  // namespace
+}  // namespace parvel::reader
+
+int main(int argc, char** argv) {
+    if (argc < 2)
+        return EXIT_FAILURE;
+    const std::uint64_t inputBytes = std::strtoull(argv[1], nullptr, 10);
+    const bool hasFonts = argc > 2 && std::string_view(argv[2]) == parvel::reader::fontsArgument;
+    return parvel::reader::run(inputBytes, hasFonts);
+}

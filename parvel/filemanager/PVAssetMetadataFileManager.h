@@ -78,6 +78,16 @@ public:
     /// Renames a PDF after its own display name; any other asset comes back as it is. A display
     /// name that ends in ".pdf" gets a second one. Deliberate.
     AssetPtr normalizeNamingForAsset_error(const AssetPtr& asset, ErrorOut error = nullptr);
+    /// Applies a user's edits: renames a PDF after its new display name, combines the updates into
+    /// the record, writes the attributes; then, with `inflateIfNeeded`, expands a zipped book,
+    /// replaces its cover and writes its store metadata file. Updates that the record holds already
+    /// give back the asset itself, whose attributes are written all the same, and which still names
+    /// the old place of a PDF that was renamed. Deliberate. None where the rename, the expansion or
+    /// the cover fails; what was done before stays.
+    AssetPtr updateAsset_withUpdates_temporaryDirectory_inflateIfNeeded_error(
+        const AssetPtr& asset, const Dictionary* updates,
+        const std::optional<URL>& temporaryDirectory, bool inflateIfNeeded,
+        ErrorOut error = nullptr);
     /// Brings a freshly placed asset into the directory under its ID's name, over what stands
     /// there; or, where the existing one lies in synchronised storage, into that one's place. The
     /// existing record, where there is one, comes back with the new one's entries, also after a
@@ -86,6 +96,13 @@ public:
                                                                const AssetPtr& existing,
                                                                const URL& directory,
                                                                ErrorOut error = nullptr);
+    /// Puts a zipped book's package folder, expanded in the temporary directory, in the place of
+    /// the zip file; any other asset comes back as it is. None where the item can't be looked at,
+    /// without an error. Without a temporary directory the zip file itself is in the way and is
+    /// deleted before it is read: always give one. Deliberate.
+    AssetPtr inflateAsset_temporaryDirectory_error(const AssetPtr& asset,
+                                                   const std::optional<URL>& temporaryDirectory,
+                                                   ErrorOut error = nullptr);
     /// Writes the store metadata file of an expanded book, whose first version is backed up, and
     /// the extended attributes of any asset. The log alone tells of failures; nothing is written
     /// into a zip file.

@@ -9,6 +9,7 @@
 #include "cli/Interrupt.h"
 #include "cli/Messages.h"
 #include "cli/Output.h"
+#include "parvel/platform/ReaderProgram.h"
 
 namespace parvel::cli {
 namespace {
@@ -48,9 +49,21 @@ int printText(std::string_view text) {
     return output.finish("") ? kSuccess : kFailure;
 }
 
+/// How the helper program is confined here, as JSON; null where it can't be had.
+std::string readerAsJson() {
+    const std::optional<ReaderConfinement> reader = readerConfinement();
+    if (!reader)
+        return "null";
+    const auto word = [](bool flag) { return std::string(flag ? "true" : "false"); };
+    return "{\"landlock\":" + word(reader->hasNoFiles) +
+           ",\"seccomp\":" + word(reader->hasSystemCallFilter) + "}";
+}
+
 int printVersion(bool asJson) {
     const std::string version(kVersion);
-    return printText(asJson ? "{\"version\":\"" + version + "\"}\n" : "parvel " + version + "\n");
+    return printText(asJson
+                         ? "{\"version\":\"" + version + "\",\"reader\":" + readerAsJson() + "}\n"
+                         : "parvel " + version + "\n");
 }
 
 /// Where the command stands: the first argument that is no option, nor the value of one.

@@ -39,6 +39,8 @@ LD_LIBRARY_PATH=$prefix/$libdir "$scratch/example" "$here/../../samples/salt-and
 
 echo "== program"
 "$prefix/bin/parvel" --version
+# Only with its helper program can it tell how that is confined.
+"$prefix/bin/parvel" --version --json | grep '"seccomp":true'
 
 echo "== SONAME"
 readelf -d "$prefix/$libdir/libParvelFoundation.so" | grep -E 'SONAME.*libParvelFoundation\.so\.[0-9]+'

@@ -19,6 +19,12 @@ union DescriptorSpace {
 
 }  // namespace
 
+Answer refusal() {
+    Answer answer;
+    answer.reply.outcome = Outcome::Refused;
+    return answer;
+}
+
 bool receive(Received& received) {
     iovec part{&received.request, sizeof received.request};
     DescriptorSpace space;

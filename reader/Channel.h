@@ -20,6 +20,9 @@ struct Answer {
     host::FileDescriptor file;
 };
 
+/// The answer to an input that can't be read.
+[[nodiscard]] Answer refusal();
+
 /// Waits for a request. False at the end of the conversation, and for what is no request.
 [[nodiscard]] bool receive(Received& received);
 /// Callable from a signal handler where the answer holds no text.

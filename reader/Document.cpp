@@ -4,8 +4,6 @@
 #include <poppler-global.h>
 #include <poppler-page-renderer.h>
 #include <poppler-page.h>
-#include <sys/mman.h>
-#include <sys/stat.h>
 
 #include <algorithm>
 #include <cmath>
@@ -13,41 +11,12 @@
 #include <optional>
 #include <utility>
 
+#include "reader/InputMapping.h"
 #include "reader/MemoryFile.h"
 #include "reader/PdfDate.h"
 #include "reader/PdfText.h"
 
 namespace parvel::reader {
-
-/// A file's bytes. A file that is cut short ends the process, which is meant: it hurts nobody here.
-class Document::Mapping {
-public:
-    explicit Mapping(int descriptor) {
-        struct stat status;
-        if (::fstat(descriptor, &status) != 0 || status.st_size <= 0 ||
-            static_cast<std::uint64_t>(status.st_size) > longestDocument)
-            return;
-        const auto size = static_cast<std::size_t>(status.st_size);
-        void* bytes = ::mmap(nullptr, size, PROT_READ, MAP_PRIVATE, descriptor, 0);
-        if (bytes != MAP_FAILED) {
-            m_bytes = static_cast<const char*>(bytes);
-            m_size = size;
-        }
-    }
-    ~Mapping() {
-        if (m_bytes)
-            ::munmap(const_cast<char*>(m_bytes), m_size);
-    }
-    Mapping(const Mapping&) = delete;
-    Mapping& operator=(const Mapping&) = delete;
-
-    [[nodiscard]] const char* bytes() const { return m_bytes; }
-    [[nodiscard]] std::size_t size() const { return m_size; }
-
-private:
-    const char* m_bytes = nullptr;
-    std::size_t m_size = 0;
-};
 
 namespace {
 
@@ -157,12 +126,6 @@ bool drawInto(std::uint8_t* pixels, std::size_t stride, const poppler::page& pag
     return true;
 }
 
-Answer refusal() {
-    Answer answer;
-    answer.reply.outcome = Outcome::Refused;
-    return answer;
-}
-
 }  // namespace
 
 Document::Document() {
@@ -175,10 +138,11 @@ Document::~Document() = default;
 
 Answer Document::open(const Received& received) {
     close();
-    m_bytes = std::make_unique<Mapping>(received.input.get());
-    if (m_bytes->size() > 0)
-        m_document.reset(poppler::document::load_from_raw_data(m_bytes->bytes(),
-                                                               static_cast<int>(m_bytes->size())));
+    m_bytes = std::make_unique<InputMapping>(received.input.get());
+    const std::span<const std::uint8_t> bytes = m_bytes->bytes();
+    if (!bytes.empty())
+        m_document.reset(poppler::document::load_from_raw_data(
+            reinterpret_cast<const char*>(bytes.data()), static_cast<int>(bytes.size())));
     if (m_document)
         return informationOf(*m_document);
     close();

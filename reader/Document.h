@@ -11,6 +11,8 @@ class page;
 
 namespace parvel::reader {
 
+class InputMapping;
+
 /// The PDF document that is open, if any, and what is asked of it. A locked one is asked for
 /// nothing but that: it would bring the PDF library down.
 class Document {
@@ -30,12 +32,10 @@ public:
     [[nodiscard]] Answer drawPage(const Request& request) const;
 
 private:
-    class Mapping;
-
     [[nodiscard]] std::unique_ptr<poppler::page> firstPage() const;
 
     std::unique_ptr<poppler::document> m_held;  ///< keeps the PDF library's state
-    std::unique_ptr<Mapping> m_bytes;
+    std::unique_ptr<InputMapping> m_bytes;
     std::unique_ptr<poppler::document> m_document;
 };
 

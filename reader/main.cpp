@@ -10,6 +10,7 @@
 #include <string_view>
 
 #include "reader/Channel.h"
+#include "reader/DecodedImage.h"
 #include "reader/Document.h"
 #include "reader/Fonts.h"
 #include "reader/HostFiles.h"
@@ -48,6 +49,10 @@ public:
                 answer = m_document.drawPage(received.request);
                 return true;
             }
+            case Ask::DecodeImage:
+                limitProcessorTime(drawingMilliseconds);
+                answer = decodedImage(received);
+                return true;
             case Ask::CloseDocument:
                 m_document.close();
                 answer.reply.outcome = Outcome::Done;

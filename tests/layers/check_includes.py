@@ -22,8 +22,8 @@ LOWER = {
     "parvel/filemanager": {"parvel/iotasks", "parvel/inspection", "parvel/xattr",
                            "parvel/metadata", "parvel/foundation", "parvel/platform"},
     "cli": set(),  # and the library's public headers
-    "reader": {"parvel/platform", "parvel/platform/linux"},
-    "reader/images": {"reader", "parvel/platform", "parvel/platform/linux"},
+    "reader": {"reader/images", "parvel/platform", "parvel/platform/linux"},
+    "reader/images": {"parvel/platform"},
 }
 
 # Ties that run back up, from source files alone: a task calls the manager that made it, and the

@@ -183,7 +183,7 @@ bool launchHelper(const std::string& program, const HelperMeans& means, int sock
 }
 
 bool isInput(Ask ask) {
-    return ask == Ask::OpenDocument || ask == Ask::DecodeImage || ask == Ask::EncodePNG;
+    return ask == Ask::OpenDocument || ask == Ask::DecodeImage;
 }
 
 }  // namespace

@@ -19,7 +19,7 @@ inline constexpr int socketDescriptor = 3;
 inline constexpr const char* fontsArgument = "fonts";
 
 /// Raised with every change to what follows; Hello carries it.
-inline constexpr std::uint32_t version = 1;
+inline constexpr std::uint32_t version = 2;
 
 enum class Ask : std::uint32_t {
     /// With the document's descriptor. Takes the place of a document that is open. Answered with
@@ -32,11 +32,8 @@ enum class Ask : std::uint32_t {
     CloseDocument = 3,
     /// With the descriptor of an encoded image of `size` bytes. Answered with pixels.
     DecodeImage = 4,
-    /// With the descriptor of pixels: `width`, `height` and `stride`, `size` bytes in all. Answered
-    /// with the descriptor of a PNG file of `size` bytes.
-    EncodePNG = 5,
     /// Answered with what is known of the first page of the open document.
-    DescribePage = 6,
+    DescribePage = 5,
 };
 
 struct Request {
@@ -68,8 +65,8 @@ inline constexpr std::uint32_t noText = 0xffffffff;
 /// The longest text; a longer one counts as missing.
 inline constexpr std::size_t longestText = 64 * 1024;
 
-/// Pixels and PNG files come with one descriptor, of a memory file sealed against any change: of
-/// `size` bytes, which for pixels are `height` rows of `stride` bytes, as Image.h has them.
+/// Pixels come with one descriptor, of a memory file sealed against any change: `size` bytes, which
+/// are `height` rows of `stride` bytes, as Image.h has them.
 struct Reply {
     Outcome outcome{};
     std::uint32_t version = 0;  ///< Hello

@@ -1,0 +1,23 @@
+#pragma once
+
+#include <cstdint>
+#include <span>
+
+namespace parvel::reader {
+
+/// The bytes of an input's descriptor: none where it can't be mapped or is longer than any document
+/// may be. A file that is cut short ends the process, which is meant: it hurts nobody here.
+class InputMapping {
+public:
+    explicit InputMapping(int descriptor);
+    ~InputMapping();
+    InputMapping(const InputMapping&) = delete;
+    InputMapping& operator=(const InputMapping&) = delete;
+
+    [[nodiscard]] std::span<const std::uint8_t> bytes() const { return m_bytes; }
+
+private:
+    std::span<const std::uint8_t> m_bytes;
+};
+
+}  // namespace parvel::reader

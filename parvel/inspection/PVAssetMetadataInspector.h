@@ -4,6 +4,7 @@
 #include <optional>
 
 #include "parvel/foundation/ErrorOut.h"
+#include "parvel/foundation/Image.h"
 #include "parvel/foundation/PVExport.h"
 #include "parvel/foundation/URL.h"
 #include "parvel/metadata/PVAssetMetadata.h"
@@ -42,6 +43,10 @@ public:
     /// `metadataIncludingCoverForAssetAtURL_error`, whose errors it has.
     static std::optional<Data> coverImageDataForAssetAtURL_error(const std::optional<URL>& url,
                                                                  ErrorOut error = nullptr);
+    /// The same image decoded, in a confined process. None, without an error of its own, where the
+    /// bytes are no PNG, JPEG, GIF or WebP image that can be decoded.
+    static std::optional<Image> coverImageForAssetAtURL_error(const std::optional<URL>& url,
+                                                              ErrorOut error = nullptr);
     /// The store metadata file at the URL itself as a record; none for a package.
     static AssetPtr bazaarMetadataForBookAssetAtURL_error(const std::optional<URL>& url,
                                                           ErrorOut error = nullptr);

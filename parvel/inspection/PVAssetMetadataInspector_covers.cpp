@@ -1,3 +1,4 @@
+#include "parvel/foundation/ImageFiles.h"
 #include "parvel/foundation/PVCasts.h"
 #include "parvel/foundation/PVParvelLog.h"
 #include "parvel/inspection/PVAssetMetadataInspector.h"
@@ -47,6 +48,12 @@ std::optional<Data> PVAssetMetadataInspector::coverImageDataForAssetAtURL_error(
     const AssetPtr asset = metadataIncludingCoverForAssetAtURL_error(url, error);
     const Data* cover = asset ? PVDynamicCast(classOf<Data>, asset->coverImageData()) : nullptr;
     return cover ? std::optional(*cover) : std::nullopt;
+}
+
+std::optional<Image> PVAssetMetadataInspector::coverImageForAssetAtURL_error(
+    const std::optional<URL>& url, ErrorOut error) {
+    const std::optional<Data> bytes = coverImageDataForAssetAtURL_error(url, error);
+    return bytes ? imageFromData(*bytes) : std::nullopt;
 }
 
 }  // namespace parvel

@@ -2,14 +2,22 @@
 #include <gtest/gtest.h>
 
 #include "parvel/inspection/PVAssetMetadataInspector.h"
+#include "parvel/platform/ImageCodec.h"
+#include "parvel/platform/Service.h"
 #include "tests/support/EpubBuilder.h"
+#include "tests/support/Images.h"
+#include "tests/support/PNGBuilder.h"
 #include "tests/support/RecordedLog.h"
 #include "tests/support/TemporaryDirectory.h"
 
 namespace parvel::testing {
 namespace {
 
+using ::testing::AllOf;
+using ::testing::Each;
+using ::testing::ElementsAre;
 using ::testing::IsEmpty;
+using ::testing::SizeIs;
 
 class CoverImageData : public ::testing::Test {
 protected:
@@ -92,6 +100,97 @@ TEST_F(CoverImageData, WithoutAURLIsMissingTheURL) {
 
     EXPECT_EQ(m_error, makeMissingURLError());
     EXPECT_EQ(log.lines().front(), "default Failed to query directory: (null)");
+}
+
+/// Decodes what begins with "image".
+class FakeCodec : public ImageCodec {
+public:
+    std::optional<Image> decode(const Data& bytes) override {
+        m_decoded.push_back(bytes);
+        std::vector<std::uint8_t> storage;
+        return bytes.text(storage).starts_with("image")
+                   ? std::optional(plainImage(2, 3, 0xFF102030))
+                   : std::nullopt;
+    }
+    std::optional<Data> encodePNG(const Image&) override { return std::nullopt; }
+
+    [[nodiscard]] const std::vector<Data>& decodedBytes() const { return m_decoded; }
+
+private:
+    std::vector<Data> m_decoded;
+};
+
+class CoverImage : public CoverImageData {
+protected:
+    std::optional<Image> coverImage(const std::optional<URL>& url) {
+        const Service<ImageCodec>::Replacement inForce(m_codec);
+        return PVAssetMetadataInspector::coverImageForAssetAtURL_error(url, &m_error);
+    }
+
+    FakeCodec m_codec;
+};
+
+TEST_F(CoverImage, IsTheDecodedCoverOfTheBytes) {
+    const URL url = book().file("BazaarArtwork", "image of the store").zip(m_folder / "a.epub");
+    const RecordedLog log;
+
+    const auto image = coverImage(url);
+
+    ASSERT_TRUE(image);
+    EXPECT_EQ(image->width, 2U);
+    EXPECT_EQ(image->height, 3U);
+    EXPECT_THAT(m_codec.decodedBytes(), ElementsAre(Data::copyOf("image of the store")));
+    EXPECT_THAT(log.lines(), IsEmpty());
+    EXPECT_EQ(m_error, std::nullopt);
+}
+
+TEST_F(CoverImage, OfBytesThatCantBeDecodedIsNoneWithoutAnError) {
+    EXPECT_FALSE(coverImage(book().zip(m_folder / "a.epub")));
+
+    EXPECT_THAT(m_codec.decodedBytes(), ElementsAre(Data::copyOf("the OPF's")));
+    EXPECT_EQ(m_error, std::nullopt);
+}
+
+TEST_F(CoverImage, OfArtworkThatCantBeDecodedIsNotSoughtElsewhere) {
+    const URL url =
+        book().file("OPS/c.jpg", "image").file("BazaarArtwork", "none").zip(m_folder / "a.epub");
+
+    EXPECT_FALSE(coverImage(url));
+}
+
+TEST_F(CoverImage, OfABookWithoutACoverIsNone) {
+    EXPECT_FALSE(coverImage(EpubBuilder{}.zip(m_folder / "a.epub")));
+
+    EXPECT_THAT(m_codec.decodedBytes(), IsEmpty());
+    EXPECT_EQ(m_error, std::nullopt);
+}
+
+TEST_F(CoverImage, OfWhatIsNotThereIsTheWholeReadsFailure) {
+    const URL url = m_folder.url("absent.epub");
+
+    EXPECT_FALSE(coverImage(url));
+    EXPECT_EQ(m_error, makeServiceError(ENOENT, url));
+    EXPECT_FALSE(PVAssetMetadataInspector::coverImageForAssetAtURL_error(url));
+
+    EXPECT_FALSE(coverImage(std::nullopt));
+    EXPECT_EQ(m_error, makeMissingURLError());
+}
+
+TEST_F(CoverImage, LeavesTheErrorOfAnEarlierCallBesideTheStoresArtwork) {
+    m_error = makeMissingURLError();
+
+    EXPECT_TRUE(coverImage(book().file("BazaarArtwork", "image").zip(m_folder / "a.epub")));
+
+    EXPECT_EQ(m_error, makeMissingURLError());
+}
+
+TEST_F(CoverImage, IsDecodedByTheHelper) {
+    const URL url = book().file("BazaarArtwork", plainPNG(5, 4)).zip(m_folder / "a.epub");
+
+    const auto image = PVAssetMetadataInspector::coverImageForAssetAtURL_error(url, &m_error);
+
+    ASSERT_TRUE(image);
+    EXPECT_THAT(pixelsOf(*image), AllOf(SizeIs(20), Each(0xFF3366CC)));
 }
 
 }  // namespace

@@ -12,8 +12,9 @@ namespace parvel {
 ///
 /// Its file-system service answers as the host's would, with the same results and errors, and
 /// remembers what would have changed, so that the next operation finds it so. Its coordinator waits
-/// for nobody. While it lives, the attributes and modes that the library writes on any thread are
-/// remembered instead of written, too.
+/// for nobody. While it lives, the attributes, modes and files that the library writes on any
+/// thread are remembered instead of written, too, and a book is copied or expanded into a folder of
+/// the system's temporary directory that goes with the rehearsal.
 ///
 ///     Rehearsal rehearsal;
 ///     const auto manager =

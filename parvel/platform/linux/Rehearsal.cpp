@@ -12,6 +12,7 @@
 #include "parvel/platform/Service.h"
 #include "parvel/platform/XattrStore.h"
 #include "parvel/platform/linux/Paths.h"
+#include "parvel/platform/linux/RehearsedContent.h"
 #include "parvel/platform/linux/RehearsedDisk.h"
 
 namespace parvel {
@@ -177,6 +178,7 @@ struct Rehearsal::Services {
     std::shared_ptr<FileCoordinator> fileCoordinator = std::make_shared<RehearsedCoordinator>(disk);
     RehearsedAttributes attributes{disk};
     RehearsedEnumerator enumerator{disk};
+    host::RehearsedContent content{disk};
     Service<XattrStore>::Replacement attributesInForce{attributes};
     Service<DirectoryEnumerator>::Replacement enumeratorInForce{enumerator};
 };

@@ -238,6 +238,52 @@ int RehearsedDisk::trash(const std::string& item, std::string& resulting) {
     return error;
 }
 
+// What is made new
+
+std::optional<RehearsedDisk::Made> RehearsedDisk::madeAt(const std::string& path) const {
+    const std::lock_guard lock(m_mutex);
+    const Kind kind = entryAt(keyOf(path)).kind;
+    if (kind == Kind::MadeFile)
+        return Made::File;
+    return kind == Kind::MadeFolder ? std::optional(Made::Folder) : std::nullopt;
+}
+
+int RehearsedDisk::makeFile(const std::string& path) {
+    const std::lock_guard lock(m_mutex);
+    const std::string key = keyOf(path);
+    if (isFolder(key))
+        return EISDIR;
+    if (const int error = folderError(parentFolderOf(key)))
+        return error;
+    if (const int error = changeError(key))
+        return error;
+    set(key, {Kind::MadeFile, {}});
+    return 0;
+}
+
+int RehearsedDisk::makeFolder(const std::string& path) {
+    const std::lock_guard lock(m_mutex);
+    const std::string key = keyOf(path);
+    const int error = makingErrorByKey(key);
+    if (error == 0)
+        set(key, {Kind::MadeFolder, {}});
+    return error;
+}
+
+int RehearsedDisk::makeFrom(const std::string& real, const std::string& path) {
+    const std::lock_guard lock(m_mutex);
+    const std::string key = keyOf(path);
+    const int error = makingErrorByKey(key);
+    if (error == 0)
+        set(key, {Kind::Real, real});
+    return error;
+}
+
+int RehearsedDisk::makingError(const std::string& path) const {
+    const std::lock_guard lock(m_mutex);
+    return makingErrorByKey(keyOf(path));
+}
+
 // Attributes
 
 std::optional<std::string> RehearsedDisk::realPath(const std::string& path) const {

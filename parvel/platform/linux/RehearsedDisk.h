@@ -28,6 +28,18 @@ public:
     int remove(const std::string& path) override;
     int trash(const std::string& item, std::string& resulting) override;
 
+    /// What would be made new at the path; none for anything else, and for nothing.
+    enum class Made { File, Folder };
+    [[nodiscard]] std::optional<Made> madeAt(const std::string& path) const;
+    /// Puts a new file in the place of the file or link that stands there, if any.
+    [[nodiscard]] int makeFile(const std::string& path);
+    /// Makes a folder where nothing stands.
+    [[nodiscard]] int makeFolder(const std::string& path);
+    /// Makes an item where nothing stands that is read at a real path.
+    [[nodiscard]] int makeFrom(const std::string& real, const std::string& path);
+    /// Whether an item could be made where nothing stands.
+    [[nodiscard]] int makingError(const std::string& path) const;
+
     /// Where on the real disk that lies which would stand at the path; none where nothing would.
     [[nodiscard]] std::optional<std::string> realPath(const std::string& path) const;
     /// Of the item that the path leads to.
@@ -49,6 +61,7 @@ private:
     [[nodiscard]] bool isFolder(const std::string& key) const;
     [[nodiscard]] int folderError(const std::string& folder) const;
     [[nodiscard]] int changeError(const std::string& key) const;
+    [[nodiscard]] int makingErrorByKey(const std::string& key) const;
     [[nodiscard]] int removalError(const std::string& key) const;
     [[nodiscard]] bool isSameMount(const std::string& folder, const std::string& other) const;
     [[nodiscard]] int renameError(const std::string& source, const std::string& destination) const;

@@ -73,6 +73,14 @@ int RehearsedDisk::changeError(const std::string& key) const {
     return folder.kind == Kind::Real ? accessError(folder.real, W_OK | X_OK) : 0;
 }
 
+int RehearsedDisk::makingErrorByKey(const std::string& key) const {
+    if (const int error = folderError(parentFolderOf(key)))
+        return error;
+    if (const int error = lookUp(key); error != ENOENT)
+        return error == 0 ? EEXIST : error;
+    return changeError(key);
+}
+
 int RehearsedDisk::removalError(const std::string& key) const {
     if (isDots(lastComponentOfPath(key)))
         return EBUSY;

@@ -1,0 +1,216 @@
+#!/usr/bin/env python3
+"""Makes the files that the bench reads, out of a folder of books.
+
+usage: make_workload.py --books DIR --into DIR --parvel PROGRAM [--share F]
+
+Writes, always the same ones: zipped books of 20 KB to 8 MB (a third with a store file, two thirds
+with attributes, one in a hundred with 3,000 entries), expanded packages, PDFs and one of 200 MB,
+tagged audio files and six of over 100 MB with `moov` first or last. `--share 0.1` makes a tenth of
+the numbers. Each kind's files are listed in NAME.list.
+"""
+
+import argparse
+import json
+import plistlib
+import random
+import struct
+import subprocess
+import sys
+import zipfile
+from pathlib import Path
+from xml.etree import ElementTree
+
+BOOKS, PACKAGES, PDFS, AUDIOBOOKS = 2000, 300, 300, 300
+SMALLEST, LARGEST = 20 << 10, 8 << 20
+MANY_ENTRIES = 3000
+LARGE_PDF = 200 << 20
+LARGE_AUDIO = 110 << 20
+CONTAINER = "{urn:oasis:names:tc:opendocument:xmlns:container}"
+OPF = "{http://www.idpf.org/2007/opf}"
+DC = "{http://purl.org/dc/elements/1.1/}"
+STORE_FILE = "BazaarMetadata.plist"
+FILLER = random.Random(1).randbytes(LARGEST)
+
+
+def is_sound(entries):
+    """Whether every contender can read the book: documents in UTF-8, a manifest and a spine."""
+    contents = dict(entries)
+    container = ElementTree.fromstring(contents["META-INF/container.xml"].decode())
+    package = contents[container.find(f".//{CONTAINER}rootfile").get("full-path")]
+    root = ElementTree.fromstring(package.decode())
+    return (b"version='1.1'" not in package[:40] and root.find(f"{OPF}spine/{OPF}itemref") is not None
+            and root.find(f"{OPF}manifest/{OPF}item") is not None
+            and root.find(f"{OPF}metadata/{DC}title") is not None)
+
+
+def readable_books(folder):
+    """The sound zipped books of a folder, as lists of name and bytes."""
+    for path in sorted(folder.rglob("*.epub")):
+        try:
+            with zipfile.ZipFile(path) as archive:
+                entries = [(name, archive.read(name)) for name in archive.namelist()
+                           if not name.endswith("/")]
+            if is_sound(entries) and sum(len(content) for _, content in entries) < LARGEST:
+                yield entries
+        except Exception:  # whatever is wrong with it, it is no book to measure with
+            continue
+
+
+def readable_files(folder, pattern, parvel):
+    """The bytes of the files of which the program tells metadata."""
+    for path in sorted(folder.rglob(pattern)):
+        told = subprocess.run([parvel, "inspect", "--json", path], stdout=subprocess.PIPE,
+                              stderr=subprocess.DEVNULL, check=False)
+        result = json.loads(told.stdout)[0] if told.stdout else {}
+        if path.is_file() and result.get("record") and not result.get("error") and \
+                path.stat().st_size < LARGEST:
+            yield path.read_bytes()
+
+
+def store_file(number):
+    return plistlib.dumps({"itemName": f"Book {number}", "artistName": "An Author",
+                           "itemId": 900000 + number, "genre": "Fiction"})
+
+
+def write_book(path, entries, number, chance):
+    size = int(SMALLEST * (LARGEST / SMALLEST) ** chance.random())
+    with zipfile.ZipFile(path, "w", zipfile.ZIP_DEFLATED, compresslevel=1) as archive:
+        names = set()
+        for name, content in entries:
+            if name not in names:
+                names.add(name)
+                method = zipfile.ZIP_STORED if name == "mimetype" else zipfile.ZIP_DEFLATED
+                archive.writestr(name, content, method)
+        if number % 3 == 0 and STORE_FILE not in names:
+            archive.writestr(STORE_FILE, store_file(number))
+        if number % 100 == 50:
+            for index in range(MANY_ENTRIES - len(names)):
+                archive.writestr(f"OEBPS/pages/{index:05}.xhtml", b"<p/>", zipfile.ZIP_STORED)
+        missing = size - archive.fp.tell()
+        if missing > 0:
+            archive.writestr("OEBPS/filler.bin", FILLER[:missing], zipfile.ZIP_STORED)
+
+
+def write_package(folder, entries):
+    for name, content in entries:
+        path = folder / name
+        if ".." in Path(name).parts or Path(name).is_absolute():
+            continue
+        path.parent.mkdir(parents=True, exist_ok=True)
+        path.write_bytes(content)
+
+
+def write_large_pdf(path):
+    """One page, and an object of random bytes that no page uses."""
+    objects = [b"<</Type/Catalog/Pages 2 0 R>>", b"<</Type/Pages/Kids[3 0 R]/Count 1>>",
+               b"<</Type/Page/Parent 2 0 R/MediaBox[0 0 612 792]>>",
+               b"<</Author(An Author)/CreationDate(D:20200101120000Z)>>"]
+    offsets = []
+    with open(path, "wb") as file:
+        file.write(b"%PDF-1.4\n")
+        for number, content in enumerate(objects, 1):
+            offsets.append(file.tell())
+            file.write(b"%d 0 obj\n%s\nendobj\n" % (number, content))
+        offsets.append(file.tell())
+        file.write(b"5 0 obj\n<</Length %d>>\nstream\n" % LARGE_PDF)
+        for _ in range(LARGE_PDF // len(FILLER)):
+            file.write(FILLER)
+        file.write(b"\nendstream\nendobj\n")
+        table = file.tell()
+        file.write(b"xref\n0 6\n0000000000 65535 f \n")
+        for offset in offsets:
+            file.write(b"%010d 00000 n \n" % offset)
+        file.write(b"trailer\n<</Size 6/Root 1 0 R/Info 4 0 R>>\nstartxref\n%d\n%%%%EOF\n" % table)
+
+
+def atoms_of(content):
+    at = 0
+    while at + 8 <= len(content):
+        size = struct.unpack(">I", content[at:at + 4])[0]
+        if size < 8 or at + size > len(content):
+            return
+        yield content[at + 4:at + 8], content[at:at + size]
+        at += size
+
+
+def write_large_audio(path, content, moov_first):
+    """The file with a hole of 110 MB before or behind its `moov`."""
+    atoms = list(atoms_of(content))
+    hole = struct.pack(">I4s", LARGE_AUDIO, b"free")
+    with open(path, "wb") as file:
+        for name, atom in atoms:
+            if name == b"ftyp":
+                file.write(atom)
+        for is_moov in (True, False) if moov_first else (False, True):
+            if is_moov:
+                file.writelines(atom for name, atom in atoms if name == b"moov")
+            else:
+                start = file.tell()
+                file.write(hole)
+                file.truncate(start + LARGE_AUDIO)
+                file.seek(start + LARGE_AUDIO)
+
+
+def has_first_level(content, wanted):
+    return wanted in [name for name, _ in atoms_of(content)]
+
+
+def write_list(into, name, paths):
+    (into / f"{name}.list").write_text("".join(f"{path}\n" for path in paths))
+
+
+def main():
+    parser = argparse.ArgumentParser(description=__doc__.split("\n")[0])
+    parser.add_argument("--books", type=Path, required=True)
+    parser.add_argument("--into", type=Path, required=True)
+    parser.add_argument("--parvel", required=True)
+    parser.add_argument("--share", type=float, default=1.0)
+    options = parser.parse_args()
+    into = options.into.resolve()
+    chance = random.Random(20260101)
+    share = lambda number: max(1, round(number * options.share))
+
+    sources = list(readable_books(options.books))
+    pdfs = list(readable_files(options.books, "*.pdf", options.parvel))
+    audio = [content for content in readable_files(options.books, "*.m4a", options.parvel)
+             if has_first_level(content, b"moov") and has_first_level(content, b"ftyp")]
+    if not sources:
+        sys.exit(f"{options.books} holds no zipped book")
+
+    for name in ("books", "packages", "pdfs", "audiobooks", "large"):
+        (into / name).mkdir(parents=True, exist_ok=True)
+    books = []
+    for number in range(share(BOOKS)):
+        books.append(into / "books" / f"{number:05}.epub")
+        write_book(books[-1], sources[number % len(sources)], number, chance)
+    packages = []
+    for number in range(share(PACKAGES)):
+        packages.append(into / "packages" / f"{number:05}.epub")
+        write_package(packages[-1], sources[number % len(sources)])
+    write_list(into, "books", books)
+    write_list(into, "packages", packages)
+
+    for kind, contents, count, suffix in (("pdfs", pdfs, PDFS, "pdf"),
+                                          ("audiobooks", audio, AUDIOBOOKS, "m4a")):
+        paths = []
+        for number in range(share(count) if contents else 0):
+            paths.append(into / kind / f"{number:05}.{suffix}")
+            paths[-1].write_bytes(contents[number % len(contents)])
+        write_list(into, kind, paths)
+    write_large_pdf(into / "large" / "large.pdf")
+    write_list(into, "large-pdf", [into / "large" / "large.pdf"])
+    large = []
+    for number in range(6 if audio else 0):
+        large.append(into / "large" / f"{number}.m4a")
+        write_large_audio(large[-1], audio[number % len(audio)], number % 2 == 0)
+    write_list(into, "large-audiobooks", large)
+
+    attributed = [path for number, path in enumerate(books) if number % 3]
+    write_list(into, "attributed", attributed)
+    subprocess.run([options.parvel, "attributes", "--write", "--files-from",
+                    into / "attributed.list"], stdout=subprocess.DEVNULL,
+                   stderr=subprocess.DEVNULL, check=False)
+
+
+if __name__ == "__main__":
+    main()

@@ -14,12 +14,13 @@ std::optional<String> parvel_MD5String(const Data& data) {
     for (Data::Bytes range : data.ranges())
         running->update(range);
     const std::optional<Digest::MD5> digest = running->finish();
-    if (!digest)
-        return std::nullopt;
+    return digest ? std::optional(upperCaseHex(*digest)) : std::nullopt;
+}
 
+String upperCaseHex(Data::Bytes bytes) {
     String text;
-    text.reserve(2 * digest->size());
-    for (std::uint8_t byte : *digest) {
+    text.reserve(2 * bytes.size());
+    for (std::uint8_t byte : bytes) {
         text += "0123456789ABCDEF"[byte >> 4];
         text += "0123456789ABCDEF"[byte & 15];
     }

@@ -28,6 +28,9 @@ constexpr std::array kindReaders = {
     KindReader{PVAssetTypeKestrelPub,
                &PVAssetMetadataInspector::
                    _eBook_metadataForAssetAtURL_preloadedMetadata_includeCover_error},
+    KindReader{
+        PVAssetTypePDF,
+        &PVAssetMetadataInspector::_pdf_metadataForAssetAtURL_preloadedMetadata_includeCover_error},
     KindReader{PVAssetTypeAudiobook,
                &PVAssetMetadataInspector::
                    _audiobook_metadataForAssetAtURL_preloadedMetadata_includeCover_error},

@@ -11,6 +11,8 @@
 
 namespace parvel {
 
+class PdfPage;
+
 /// Turns an asset on disk into its record. It keeps nothing between calls, reads the disk afresh
 /// each time, and may be called from any thread. One malformed asset never brings the caller down.
 ///
@@ -61,6 +63,20 @@ public:
                                                                          ErrorOut error);
     static MutableAssetPtr _eBook_metadataForAssetAtURL_preloadedMetadata_includeCover_error(
         const URL& url, const AssetPtr& preloadedMetadata, bool includeCover, ErrorOut error);
+    /// The document information's author, subject and dates, page count, lock and an identity made
+    /// from the file's bytes; the title is the file's name. The read's error for a file that can't
+    /// be read; general error 259 for what is no document. Without `includeCover` no page is drawn;
+    /// with it a page that can't be drawn leaves the record without a cover.
+    static MutableAssetPtr _pdf_metadataForAssetAtURL_preloadedMetadata_includeCover_error(
+        const URL& url, const AssetPtr& preloadedMetadata, bool includeCover, ErrorOut error);
+    /// The first page of the document at the URL, which is opened for that alone.
+    static std::optional<Image> _new_pdf_coverImage_imageSize(const URL& url, double width,
+                                                              double height);
+    /// The page as it is displayed, on white, as large as fits: small ones grow. Without a page a
+    /// blank one, 0.7 times as wide as it is high, that never grows. Deliberate. None where there
+    /// is nothing to draw on.
+    static std::optional<Image> _new_pdf_imageFromPDFPage_imageSize(PdfPage* page, double width,
+                                                                    double height);
     static MutableAssetPtr _audiobook_metadataForAssetAtURL_preloadedMetadata_includeCover_error(
         const URL& url, const AssetPtr& preloadedMetadata, bool includeCover, ErrorOut error);
     /// The record that the asset's extended attributes hold: with little but its URL where it has

@@ -33,6 +33,23 @@ bool matchesDigest(const Value& actual, const json& expected) {
     return bytes.size() == expected.at("length") && digest == expected.at("$md5");
 }
 
+/// A PNG file of that size (ISO/IEC 15948, 5.2 and 11.2.2).
+bool matchesImage(const Value& actual, const json& expected) {
+    static constexpr std::string_view beginning("\x89PNG\r\n\x1a\n\0\0\0\rIHDR", 16);
+    std::vector<std::uint8_t> storage;
+    const auto* data = actual.as<Data>();
+    const std::string_view bytes = data ? data->text(storage) : std::string_view();
+    if (!bytes.starts_with(beginning) || bytes.size() < beginning.size() + 8)
+        return false;
+    const auto numberAt = [bytes](std::size_t offset) {
+        std::uint32_t number = 0;
+        for (const char byte : bytes.substr(offset, 4))
+            number = number << 8 | static_cast<unsigned char>(byte);
+        return number;
+    };
+    return numberAt(16) == expected.at(0) && numberAt(20) == expected.at(1);
+}
+
 bool matchesDate(const Value& actual, const json& expected) {
     const auto* date = actual.as<Date>();
     return date && isoText(*date) == expected.get<std::string>();
@@ -85,6 +102,8 @@ bool compareItems(const Value& actual, const json& expected, const std::string& 
 bool matchesLeaf(const Value& actual, const json& expected, const std::string& root) {
     if (expected.contains("$md5"))
         return matchesDigest(actual, expected);
+    if (expected.contains("$png"))
+        return matchesImage(actual, expected.at("$png"));
     if (expected.contains("$date"))
         return matchesDate(actual, expected.at("$date"));
     if (!expected.is_string())
@@ -95,7 +114,8 @@ bool matchesLeaf(const Value& actual, const json& expected, const std::string& r
 
 void compare(const Value& actual, const json& expected, const std::string& root,
              const std::string& place, std::vector<std::string>& lines) {
-    const bool isLeaf = expected.contains("$md5") || expected.contains("$date");
+    const bool isLeaf =
+        expected.contains("$md5") || expected.contains("$png") || expected.contains("$date");
     const auto* dictionary = actual.as<Dictionary>();
     if (expected.is_object() && !isLeaf && dictionary)
         return compareEntries(*dictionary, expected, root, place + ".", lines);
@@ -134,8 +154,12 @@ PVAssetType Expectation::type() const {
     return static_cast<PVAssetType>(m_row->at("type").get<int>());
 }
 
-bool Expectation::hasRecord() const {
-    return m_row->contains("record");
+bool Expectation::hasRecord(bool keepsIdentity) const {
+    return m_row->contains("record") && (keepsIdentity || !m_row->contains("error"));
+}
+
+bool Expectation::isDisputed() const {
+    return m_row->contains("either");
 }
 
 std::optional<Error> Expectation::error(const URL& url) const {

@@ -14,19 +14,22 @@
 
 namespace parvel::testing {
 
-/// What inspecting one book of the corpus must give; a row of expected.json, whose form
+/// What inspecting one asset of the corpus must give; a row of expected.json, whose form
 /// make_expectations.py describes.
 class Expectation {
 public:
     /// Every row, in the file's order.
     static std::vector<Expectation> all();
 
-    /// The book, relative to the corpus.
+    /// The asset, relative to the corpus.
     [[nodiscard]] std::string file() const;
     /// The file's name in letters, digits and underscores, for a test's name.
     [[nodiscard]] std::string testName() const;
     [[nodiscard]] PVAssetType type() const;
-    [[nodiscard]] bool hasRecord() const;
+    /// Whether there is to be a record, where the file itself keeps an identity or keeps none.
+    [[nodiscard]] bool hasRecord(bool keepsIdentity) const;
+    /// Whether there may be any record in place of the error: readers disagree on the file.
+    [[nodiscard]] bool isDisputed() const;
     /// The error beside no record; none where there is to be none.
     [[nodiscard]] std::optional<Error> error(const URL& url) const;
 

@@ -1,17 +1,21 @@
 #!/usr/bin/env python3
-"""Writes expected.json: what inspecting each packaged book of the corpus must give.
+"""Writes expected.json: what inspecting each asset of the corpus must give.
 
 usage: make_expectations.py CORPUS [OUTPUT]
 
-An independent reading of the books' own bytes: nothing here calls the library, and nothing is taken
-from its output. Standard library only. In expected.json "@" stands for the folder that holds the
-books, a long text or bytes are {"$md5": ..., "length": bytes}, a date is {"$date": ISO text, UTC}.
+An independent reading of the files' own bytes: nothing here calls the library, and nothing is taken
+from its output. PDFs are read with pikepdf (another engine than the library's), all else with the
+standard library alone. In expected.json "@" stands for the folder that holds the assets, a long
+text or bytes are {"$md5": ..., "length": bytes}, a date is {"$date": ISO text, UTC}, a drawn image
+is {"$png": [width, height]}.
 
-    file        the book, relative to the corpus
-    type        1 EPUB, 2 the application's own package variant
-    record      the record without cover, every key; or
-    error       {"domain", "code", "url"} with url true where the error names the book; null: none
+    file        the asset, relative to the corpus
+    type        0 no asset, 1 EPUB, 2 the application's own package variant, 3 PDF, 4 audiobook
+    record      the record without cover, every key
+    error       {"domain", "code", "url"} with url true where the error names the asset; null: none.
+                Beside a record: the error where the file itself keeps no identity
     withCover   the entries that a record read with its cover has besides, or has otherwise
+    either      true where PDF readers disagree on a damaged file: a record, or the general error
 """
 import datetime
 import hashlib
@@ -22,8 +26,16 @@ import sys
 import zipfile
 import xml.etree.ElementTree as ElementTree
 
-FOLDERS = ('epub', 'expanded', 'malformed', 'store', 'made-zip')
-TYPES = {'.epub': 1, '.folium': 2}
+sys.dont_write_bytecode = True
+import expected_m4a as m4a  # noqa: E402  (beside this file)
+import expected_pdf as pdf  # noqa: E402
+
+FOLDERS = ('epub', 'expanded', 'malformed', 'store', 'made-zip', 'pdf', 'made-pdf', 'm4a',
+           'm4a-tagged', 'made-m4a')
+TYPES = {'.epub': 1, '.folium': 2, '.pdf': 3, '.m4a': 4}
+CORRUPT = {'domain': 'PVFileErrorDomain', 'code': 259, 'url': True}
+NO_KIND = {'domain': 'PVParvelFoundationErrorDomain', 'code': -1001, 'url': True}
+NO_IDENTITY = {'domain': 'PVParvelFoundationErrorDomain', 'code': -1003, 'url': True}
 LONG_TEXT = 160
 
 CONTAINER = '{urn:oasis:names:tc:opendocument:xmlns:container}'
@@ -264,17 +276,21 @@ def inspect(root, name, kind, with_cover):
         if cover is not None:
             record['PVCoverImageData'] = cover
 
-    # The attribute record comes last. On a file without attributes it still holds these: a store
-    # file's own path, shown name, count and explicit mark never survive it.
+    record.update(attribute_record(name))
+    return record
+
+
+def attribute_record(name):
+    """What an asset without attributes has all the same, and goes over its content: a store file's
+    own path, shown name, count and explicit mark never survive it."""
     stem, extension = os.path.splitext('@/' + name)
-    record.update({
+    return {
         'path': stem + extension.lower(),
         'sourcePath': '@/' + name,
         'PVDisplayName': os.path.basename(name),
         'PVGenerationCount': 1,
         'explicit': False,
-    })
-    return record
+    }
 
 
 def to_json(value):
@@ -292,30 +308,34 @@ def to_json(value):
     return value
 
 
-def expectation(root, name):
-    kind = TYPES[os.path.splitext(name)[1].lower()]
-    row = {'file': name, 'type': kind}
+def book_row(root, name, kind):
     try:
         plain = inspect(root, name, kind, with_cover=False)
         covered = inspect(root, name, kind, with_cover=True)
     except Failure as failure:
-        row['error'] = failure.corrupt and {'domain': 'PVFileErrorDomain', 'code': 259,
-                                            'url': True} or None
-        return row
+        return {'error': CORRUPT if failure.corrupt else None}
     if not asset_id(plain):
-        row['error'] = {'domain': 'PVParvelFoundationErrorDomain', 'code': -1003, 'url': True}
-        return row
-    row['record'] = to_json(plain)
-    row['withCover'] = to_json(
-        {key: value for key, value in covered.items() if plain.get(key) != value})
-    return row
+        return {'error': NO_IDENTITY}
+    return {'record': plain, 'withCover': {key: value for key, value in covered.items()
+                                           if plain.get(key) != value}}
 
 
-def books(root):
+def expectation(root, name):
+    kind = TYPES.get(os.path.splitext(name)[1].lower(), 0)
+    if kind == 3:
+        row = pdf.row(root, name, attribute_record(name))
+    elif kind == 4:
+        row = m4a.row(root, name, attribute_record(name))
+    else:
+        row = book_row(root, name, kind) if kind else {'error': NO_KIND}
+    content = {key: to_json(row[key]) for key in ('record', 'withCover') if key in row}
+    return {'file': name, 'type': kind, **row, **content}
+
+
+def assets(root):
     for folder in FOLDERS:
         for name in sorted(os.listdir(os.path.join(root, folder))):
-            if os.path.splitext(name)[1].lower() in TYPES:
-                yield folder + '/' + name
+            yield folder + '/' + name
 
 
 def main():
@@ -324,11 +344,11 @@ def main():
     root = sys.argv[1]
     output = sys.argv[2] if len(sys.argv) == 3 else os.path.join(
         os.path.dirname(os.path.abspath(__file__)), 'expected.json')
-    rows = [expectation(root, name) for name in books(root)]
+    rows = [expectation(root, name) for name in assets(root)]
     with open(output, 'w', encoding='utf-8') as file:
         lines = (json.dumps(row, ensure_ascii=False, separators=(',', ':')) for row in rows)
         file.write('[\n' + ',\n'.join(lines) + '\n]\n')
-    print('%d books, %d with a record' % (len(rows), sum('record' in row for row in rows)))
+    print('%d assets, %d with a record' % (len(rows), sum('record' in row for row in rows)))
 
 
 if __name__ == '__main__':

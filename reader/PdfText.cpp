@@ -21,12 +21,18 @@ constexpr std::array<char16_t, 32> from80{
     0x2030, 0x201E, 0x201C, 0x201D, 0x2018, 0x2019, 0x201A, 0x2122, 0xFB01, 0xFB02,     0x0141,
     0x0152, 0x0160, 0x0178, 0x017D, 0x0131, 0x0142, 0x0153, 0x0161, 0x017E, replacement};
 
+constexpr char16_t euroByte = 0xA0;
+constexpr char16_t euroSign = 0x20AC;
+
+/// A character in PDFDocEncoding that no text in UTF-16 has.
+bool isOfPdfDocEncodingAlone(char16_t unit) {
+    return (unit >= 0x18 && unit < 0x20) || (unit >= 0x80 && unit < 0xA0);
+}
+
 char16_t ofPdfDocEncoding(char16_t byte) {
-    if (byte >= 0x18 && byte < 0x20)
-        return from18[byte - 0x18];
-    if (byte >= 0x80 && byte < 0xA0)
-        return from80[byte - 0x80];
-    return byte;
+    if (!isOfPdfDocEncodingAlone(byte))
+        return byte;
+    return byte < 0x80 ? from18[byte - 0x18] : from80[byte - 0x80];
 }
 
 bool isHighHalf(char16_t unit) {
@@ -62,6 +68,8 @@ std::string utf8OfPdfText(std::u16string_view units) {
     if (units.starts_with(utf8Mark))
         return withReplacedInvalidUTF8(std::string(units.begin() + utf8Mark.size(), units.end()));
     std::u16string decoded(units);
+    if (std::any_of(units.begin(), units.end(), isOfPdfDocEncodingAlone))
+        std::replace(decoded.begin(), decoded.end(), euroByte, euroSign);
     std::transform(decoded.begin(), decoded.end(), decoded.begin(), ofPdfDocEncoding);
     return utf8OfUTF16(decoded);
 }

@@ -10,8 +10,9 @@ namespace parvel::reader {
 /// mark (ISO 32000-2, 7.9.2.2), else in PDFDocEncoding. What is neither a character of its encoding
 /// nor whole becomes U+FFFD.
 ///
-/// A text in UTF-16 can't be told from bytes when it holds nothing above U+00FF. So 0xA0 is left a
-/// no-break space, which such texts have far oftener than PDFDocEncoding's euro sign.
+/// A text in UTF-16 can't be told from bytes when it holds nothing above U+00FF. So 0xA0 is taken
+/// for PDFDocEncoding's euro sign only beside a byte that would be a control character in UTF-16;
+/// else it is left a no-break space, which such texts have far oftener.
 [[nodiscard]] std::string utf8OfPdfText(std::u16string_view units);
 
 }  // namespace parvel::reader

@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Makes hostile books, and manifest.json that lists them.
+"""Makes hostile books, PDFs and audio files, and manifest.json that lists them.
 
 usage: make_hostile.py FOLDER --canary FOLDER2
 
@@ -14,6 +14,9 @@ import socket
 import struct
 import sys
 import zlib
+
+sys.dont_write_bytecode = True
+import hostile_media  # noqa: E402  (beside this file)
 
 SECRET = 'kept-to-itself-7731'
 CONTAINER = '''<?xml version="1.0"?>
@@ -575,6 +578,8 @@ def main():
         file.write(SECRET + '\n')
     for group in (zips, xmls, plists, folders, attributes):
         group()
+    hostile_media.pdfs(put, CANARY)
+    hostile_media.m4as(put)
     with open(FOLDER + '/manifest.json', 'w') as file:
         json.dump({'secret': SECRET, 'canary': CANARY, 'assets': ROWS}, file, indent=1)
     print('%d assets' % len(ROWS))

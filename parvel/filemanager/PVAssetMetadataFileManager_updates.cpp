@@ -47,7 +47,7 @@ PVAssetMetadataFileManager::updateAsset_withUpdates_temporaryDirectory_inflateIf
     if (isKnown) {
         // Deliberate: the asset as it was given, also where its PDF was renamed, and although its
         // attributes are written by now.
-        PVParvelLog().error("updateMetadata: updates == metadata -- Done");
+        PVParvelLog().error("updateMetadata: updates == metadta -- Done");
         return asset;
     }
     if (!inflateIfNeeded) {

@@ -206,7 +206,7 @@ TEST_F(UpdatingAssets, UpdatesThatChangeNothingGiveBackTheAssetItself) {
 
     EXPECT_EQ(updated, book);
     EXPECT_EQ(names("library/a.epub"), before);
-    EXPECT_EQ(ofUpdate(log), Lines{"error updateMetadata: updates == metadata -- Done"});
+    EXPECT_EQ(ofUpdate(log), Lines{"error updateMetadata: updates == metadta -- Done"});
     EXPECT_FALSE(m_error);
 }
 

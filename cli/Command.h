@@ -42,7 +42,13 @@ struct CommandEntry {
 std::span<const CommandEntry> commands();
 
 std::unique_ptr<Command> makeAttributesCommand();
+std::unique_ptr<Command> makeCloudCommand();
 std::unique_ptr<Command> makeInspectCommand();
 std::unique_ptr<Command> makeMatchCommand();
+std::unique_ptr<Command> makeMoveCommand();
+std::unique_ptr<Command> makeRedactCommand();
+std::unique_ptr<Command> makeRemoveCommand();
+std::unique_ptr<Command> makeRenameCommand();
+std::unique_ptr<Command> makeTrashCommand();
 
 }  // namespace parvel::cli

@@ -12,6 +12,16 @@ std::span<const CommandEntry> commands() {
                      "Print or write what is kept on the files themselves.", makeAttributesCommand},
         CommandEntry{"match", "A B", "Tell whether two assets, or records, are the same asset.",
                      makeMatchCommand},
+        CommandEntry{"move", "PATH...", "Move assets to another place or into a folder.",
+                     makeMoveCommand},
+        CommandEntry{"rename", "PATH...", "Name PDF documents after their display names.",
+                     makeRenameCommand},
+        CommandEntry{"trash", "PATH...", "Move assets to the desktop's trash, or bring them back.",
+                     makeTrashCommand},
+        CommandEntry{"remove", "PATH...", "Delete assets for good.", makeRemoveCommand},
+        CommandEntry{"redact", "PATH...", "Move assets aside as redacted ones.", makeRedactCommand},
+        CommandEntry{"cloud", "add|take|replace|status PATH...",
+                     "Move assets into and out of synchronised folders.", makeCloudCommand},
     };
     return entries;
 }

@@ -63,7 +63,8 @@ std::string failureLine(std::string_view command, const Result& result) {
     std::string line = "parvel: " + std::string(command) + ": " + safeText(result.path) + ": ";
     if (!result.error) {
         line += result.nothing;
-        return line + (result.reason.empty() ? "" : ": ") + safeText(result.reason) + "\n";
+        line += (result.reason.empty() ? "" : ": ") + safeText(result.reason);
+        return line + (result.advice.empty() ? "" : "; ") + safeText(result.advice) + "\n";
     }
     const Error& error = *result.error;
     std::string words = reasonTellsMore(result) ? result.reason : error.message();
@@ -71,8 +72,9 @@ std::string failureLine(std::string_view command, const Result& result) {
         words.pop_back();
     line += safeText(words);
     line += " (" + safeText(error.domain()) + " " + std::to_string(error.code()) + ")";
-    const std::string_view advice = adviceFor(result);
-    return line + (advice.empty() ? "" : "; ") + std::string(advice) + "\n";
+    const std::string advice =
+        result.advice.empty() ? std::string(adviceFor(result)) : safeText(result.advice);
+    return line + (advice.empty() ? "" : "; ") + advice + "\n";
 }
 
 std::string problemLine(std::string_view command, std::string_view problem) {

@@ -8,6 +8,7 @@
 #include <unistd.h>
 
 #include "cli/Interrupt.h"
+#include "cli/Result.h"
 
 namespace parvel::cli {
 namespace {
@@ -89,7 +90,9 @@ std::optional<FoundPath> PathFile::next() {
 PathSource::PathSource(std::vector<std::string> operands, const PathOptions& options)
     : m_operands(std::make_move_iterator(operands.begin()),
                  std::make_move_iterator(operands.end())),
-      m_recursive(options.recursive) {
+      m_recursive(options.recursive),
+      m_walksFirst(options.walksFirst),
+      m_target(options.target) {
     if (options.nulEnded && !options.filesFrom)
         throw UsageError("-0 says how the PATHs of --files-from end, and that is not given");
     if (options.filesFrom)
@@ -112,17 +115,38 @@ std::optional<FoundPath> PathSource::nextGiven() {
     return path;
 }
 
+std::optional<FoundPath> PathSource::nextFound() {
+    if (!m_found.empty()) {
+        FoundPath found = std::move(m_found.front());
+        m_found.pop_front();
+        return found;
+    }
+    return m_walk ? m_walk->next() : std::nullopt;
+}
+
+void PathSource::begin(std::string folder) {
+    m_walk = std::make_unique<AssetWalk>(std::move(folder));
+    if (!m_walksFirst)
+        return;
+    const std::optional<URL> target =
+        m_target ? std::optional(m_target->standardized()) : std::nullopt;
+    while (std::optional<FoundPath> found = m_walk->next()) {
+        if (interrupted())
+            break;
+        const URL parent = urlOfPath(found->path).deletingLastPathComponent();
+        if (!target || parent.standardized() != *target)
+            m_found.push_back(std::move(*found));
+    }
+}
+
 std::optional<FoundPath> PathSource::next() {
     while (true) {
-        if (m_walk) {
-            if (std::optional<FoundPath> found = m_walk->next())
-                return found;
-            m_walk = nullptr;
-        }
+        if (std::optional<FoundPath> found = nextFound())
+            return found;
         std::optional<FoundPath> given = nextGiven();
         if (!given || given->readErrno != 0 || !m_recursive || !isPlainFolder(given->path))
             return given;
-        m_walk = std::make_unique<AssetWalk>(std::move(given->path));
+        begin(std::move(given->path));
     }
 }
 

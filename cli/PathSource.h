@@ -8,6 +8,7 @@
 
 #include "cli/AssetWalk.h"
 #include "cli/CommandLine.h"
+#include "parvel/foundation/URL.h"
 
 namespace parvel::cli {
 
@@ -16,6 +17,9 @@ struct PathOptions {
     std::optional<std::string> filesFrom;
     bool nulEnded = false;
     bool recursive = false;
+    bool walksFirst = false;  ///< a walk ends before its first PATH is worked on: that work changes
+                              ///< what the walk would find
+    std::optional<URL> target;  ///< a walk leaves out what lies in this folder already
 
     void declare(CommandLine& line);
 };
@@ -57,11 +61,16 @@ public:
 
 private:
     std::optional<FoundPath> nextGiven();
+    std::optional<FoundPath> nextFound();
+    void begin(std::string folder);
 
     std::deque<std::string> m_operands;
     std::unique_ptr<PathFile> m_file;
     std::unique_ptr<AssetWalk> m_walk;
-    bool m_recursive;
+    std::deque<FoundPath> m_found;
+    const bool m_recursive;
+    const bool m_walksFirst;
+    const std::optional<URL> m_target;
 };
 
 }  // namespace parvel::cli

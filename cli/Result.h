@@ -21,12 +21,13 @@ struct Result {
     std::string_view recordKey = "record";     ///< what stands in its place has a key of its own
     std::optional<Error> error;
     std::vector<Dictionary::Entry> fields;  ///< what the command adds to the keys of every result
+    bool needsRecord = true;                ///< whether it is a failure that there is no record
     std::string_view nothing = "no metadata";  ///< what there is where there is no record
-    std::string reason;       ///< what the log said about a failure, in words for a person
-    std::string_view advice;  ///< what to do about a failure, where the command knows
+    std::string reason;   ///< what the log said about a failure, in words for a person
+    std::string advice;   ///< what to do about a failure, where the command knows
     std::string outcome;  ///< what was done, in words for a person, where that is the result's text
 
-    [[nodiscard]] bool succeeded() const { return record && !error; }
+    [[nodiscard]] bool succeeded() const { return (record || !needsRecord) && !error; }
 };
 
 /// "epub", "folium", "pdf", "m4a" or "unknown".

@@ -1,8 +1,10 @@
 #pragma once
 
 #include <optional>
+#include <string>
 
 #include "parvel/foundation/ErrorOut.h"
+#include "parvel/foundation/PVExport.h"
 #include "parvel/foundation/URL.h"
 
 namespace parvel {
@@ -10,10 +12,17 @@ namespace parvel {
 /// What an item in cloud-synchronised storage has on this device.
 enum class DownloadingStatus { Current, Downloaded, NotDownloaded };
 
+/// A folder that a sync client keeps in step with other places.
+struct CloudRoot {
+    std::string client;  ///< the client's name
+    URL folder;
+    std::string mark;  ///< the name in the folder that tells
+};
+
 /// Cloud-synchronised storage, as far as the disk shows it: the marks of Nextcloud's client and of
 /// Syncthing in a folder above, and Nextcloud's placeholder files. No client is asked, so no item
 /// is known to be Current. All errors are those of makeServiceError.
-class CloudStore {
+class PV_EXPORT CloudStore {
 public:
     virtual ~CloudStore() = default;
 
@@ -35,5 +44,11 @@ public:
 
     static CloudStore& host();
 };
+
+/// The root of the synchronised storage that the item lies in; none where it lies in no such
+/// storage. None with an error of makeServiceError when the folder that it stands in can't be
+/// reached.
+[[nodiscard]] PV_EXPORT std::optional<CloudRoot> cloudRootHolding(const URL& url,
+                                                                  ErrorOut error = nullptr);
 
 }  // namespace parvel

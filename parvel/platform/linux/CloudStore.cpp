@@ -4,6 +4,7 @@
 #include <sys/stat.h>
 
 #include <algorithm>
+#include <climits>
 #include <string>
 #include <string_view>
 
@@ -47,35 +48,53 @@ host::FileDescriptor openFolder(int parent, const char* name, int flags) {
         host::retried([&] { return ::openat(parent, name, O_DIRECTORY | O_CLOEXEC | flags); }));
 }
 
-bool holdsNextcloudJournal(int folder) {
+/// What marks a folder as the root of synchronised storage, and whose mark it is.
+struct RootMark {
+    std::string_view client;
+    std::string name;
+};
+
+std::optional<std::string> nextcloudJournalIn(int folder) {
     host::DirectoryStream entries(openFolder(folder, ".", O_RDONLY));
     if (!entries.isOpen())
-        return false;
+        return std::nullopt;
     while (const dirent* entry = entries.next())
         if (isNextcloudJournal(entry->d_name))
-            return true;
-    return false;
+            return entry->d_name;
+    return std::nullopt;
 }
 
-bool isSyncedRoot(int folder) {
-    return ::faccessat(folder, syncthingMark, F_OK, 0) == 0 || holdsNextcloudJournal(folder);
+std::optional<RootMark> markIn(int folder) {
+    if (::faccessat(folder, syncthingMark, F_OK, 0) == 0)
+        return RootMark{"Syncthing", syncthingMark};
+    if (auto journal = nextcloudJournalIn(folder))
+        return RootMark{"Nextcloud", std::move(*journal)};
+    return std::nullopt;
 }
 
-/// Whether the folder or one above it is the root of synchronised storage. None, with errno set,
-/// when the way up can't be followed.
-std::optional<bool> liesBelowSyncedRoot(host::FileDescriptor folder) {
+/// The root of synchronised storage on the way up from a folder.
+struct FoundRoot {
+    host::FileDescriptor folder;
+    RootMark mark;
+};
+
+/// The folder or the first one above it that is such a root; `found` is none where there is none.
+/// False, with errno set, when the way up can't be followed.
+bool findSyncedRoot(host::FileDescriptor folder, std::optional<FoundRoot>& found) {
     struct stat status;
     if (::fstat(folder.get(), &status) != 0)
-        return std::nullopt;
+        return false;
     for (;;) {
-        if (isSyncedRoot(folder.get()))
+        if (auto mark = markIn(folder.get())) {
+            found = FoundRoot{std::move(folder), std::move(*mark)};
             return true;
+        }
         host::FileDescriptor parent = openFolder(folder.get(), "..", O_PATH);
         struct stat above;
         if (!parent || ::fstat(parent.get(), &above) != 0)
-            return std::nullopt;
-        if (above.st_dev == status.st_dev && above.st_ino == status.st_ino)
             return false;
+        if (above.st_dev == status.st_dev && above.st_ino == status.st_ino)
+            return true;
         folder = std::move(parent);
         status = above;
     }
@@ -121,13 +140,32 @@ std::string placeholderPath(const URL& url) {
     return url.path() + std::string(placeholderSuffix);
 }
 
+/// As findSyncedRoot, from the folder that the item stands in.
+bool findRootHolding(const URL& url, std::optional<FoundRoot>& found) {
+    if (!url.isFileURL()) {
+        errno = ENOENT;
+        return false;
+    }
+    host::FileDescriptor folder = openFolder(AT_FDCWD, parentFolderOf(url.path()).c_str(), O_PATH);
+    return folder && findSyncedRoot(std::move(folder), found);
+}
+
+/// The path of an open folder.
+std::string pathOf(const host::FileDescriptor& folder) {
+    std::string path(PATH_MAX, '\0');
+    const std::string link = "/proc/self/fd/" + std::to_string(folder.get());
+    const ssize_t length = ::readlink(link.c_str(), path.data(), path.size());
+    path.resize(length > 0 ? static_cast<std::size_t>(length) : 0);
+    return path;
+}
+
 class HostCloudStore final : public CloudStore {
 public:
     std::optional<bool> isUbiquitous(const URL& url, ErrorOut error) override {
-        const std::optional<bool> synced = liesInSyncedStorage(url);
-        if (!synced)
+        std::optional<FoundRoot> root;
+        if (!findRootHolding(url, root))
             return fail(error, makeServiceError(errno, url));
-        return synced;
+        return root.has_value();
     }
 
     bool isPromisedItemReachable(const URL& url, ErrorOut error) override {
@@ -158,19 +196,6 @@ public:
     }
 
 private:
-    /// None, with errno set, when the item's folder can't be reached.
-    static std::optional<bool> liesInSyncedStorage(const URL& url) {
-        if (!url.isFileURL()) {
-            errno = ENOENT;
-            return std::nullopt;
-        }
-        host::FileDescriptor folder =
-            openFolder(AT_FDCWD, parentFolderOf(url.path()).c_str(), O_PATH);
-        if (!folder)
-            return std::nullopt;
-        return liesBelowSyncedRoot(std::move(folder));
-    }
-
     static bool hasAllContent(const URL& url) {
         if (!isThere(url.path()))
             return false;
@@ -185,6 +210,16 @@ private:
 CloudStore& CloudStore::host() {
     static HostCloudStore store;
     return store;
+}
+
+std::optional<CloudRoot> cloudRootHolding(const URL& url, ErrorOut error) {
+    std::optional<FoundRoot> root;
+    if (!findRootHolding(url, root))
+        return fail(error, makeServiceError(errno, url));
+    if (!root)
+        return std::nullopt;
+    return CloudRoot{std::string(root->mark.client), URL::fileURLWithPath(pathOf(root->folder)),
+                     std::move(root->mark.name)};
 }
 
 }  // namespace parvel

@@ -1,0 +1,57 @@
+#include "cli/AssetChanges.h"
+
+#include "cli/Batch.h"
+#include "cli/FolderGuard.h"
+
+namespace parvel::cli {
+
+void AssetChanges::declare(CommandLine& line) {
+    m_record.declare(line);
+    m_dryRun.declare(line);
+    m_paths.declare(line);
+    m_paths.walksFirst = true;
+    m_output.declare(line);
+}
+
+void AssetChanges::declareForce(CommandLine& line, std::string_view help) {
+    m_isGuarded = true;
+    line.flag("--force", help, m_isForced);
+}
+
+bool AssetChanges::hasOnePath(const std::vector<std::string>& operands) const {
+    return operands.size() == 1 && !m_paths.filesFrom && !m_paths.recursive;
+}
+
+void AssetChanges::begin() {
+    m_output.applyLog();
+    m_record.read();
+    m_dryRun.begin();
+}
+
+int AssetChanges::run(std::string_view command, std::vector<std::string> operands,
+                      const ChangeWork& work) {
+    return runOnPaths(command, std::move(operands),
+                      [&](PVAssetMetadataFileManager& manager, Result& result) {
+                          if (const AssetPtr asset = m_record.forResult(result)) {
+                              result.assetID = asset->assetID();
+                              work(manager, asset, result);
+                          }
+                      });
+}
+
+int AssetChanges::runOnPaths(std::string_view command, std::vector<std::string> operands,
+                             const PathChange& work) {
+    const BatchOptions options{
+        .command = command, .form = m_output.form(), .makeText = makeOutcomeFormat};
+    PathSource source(std::move(operands), m_paths);
+    const auto manager = m_dryRun.makeManager();
+    if (m_isGuarded && !m_isForced)
+        manager->setFileManager(std::make_shared<FolderGuard>(manager->fileManager()));
+    return runOverPaths(options, source, [&](const std::string& path) {
+        Result result = resultForPath(path);
+        work(*manager, result);
+        return result;
+    });
+}
+
+}  // namespace parvel::cli

@@ -1,0 +1,157 @@
+#include "cli/AssetChanges.h"
+#include "cli/Command.h"
+#include "cli/TransferAdvice.h"
+#include "parvel/platform/CloudStore.h"
+
+namespace parvel::cli {
+namespace {
+
+/// `cloud add`, `take`, `replace` and `status`.
+class CloudCommand : public Command {
+public:
+    void declare(CommandLine& line) override;
+    int run(std::vector<std::string> operands) override;
+
+private:
+    void checkOptions(std::string_view action) const;
+    void transfer(bool isInto, PVAssetMetadataFileManager& manager, const AssetPtr& asset,
+                  Result& result) const;
+
+    std::optional<std::string> m_into;
+    bool m_replaces = false;
+    AssetChanges m_changes;
+};
+
+void CloudCommand::declare(CommandLine& line) {
+    line.group("Where to");
+    line.option("--into", "DIR", "with add and take: move each asset into that folder", m_into);
+    line.flag("--replace", "with add: put it in the place of what stands there", m_replaces);
+    m_changes.declareForce(line, "lose a folder that stands there, too");
+    m_changes.declare(line);
+    line.note(
+        "add moves assets into a folder that a sync client keeps in step, take moves them out\n"
+        "of it; replace puts NEW in the place of OLD and names it after its title; status\n"
+        "tells whether a PATH lies in such a folder, and why.");
+}
+
+void CloudCommand::checkOptions(std::string_view action) const {
+    const bool isTransfer = action == "add" || action == "take";
+    if (isTransfer && !m_into)
+        throw UsageError(std::string(action) + ": say where to: --into DIR");
+    if (!isTransfer && m_into)
+        throw UsageError(std::string(action) + " takes no --into");
+    if (m_replaces && action != "add")
+        throw UsageError(std::string(action) + " takes no --replace");
+}
+
+/// The words of a downloading status, in results and for people.
+std::string_view wordsOf(DownloadingStatus status) {
+    switch (status) {
+        case DownloadingStatus::Current:
+            return "current";
+        case DownloadingStatus::Downloaded:
+            return "downloaded";
+        case DownloadingStatus::NotDownloaded:
+            return "notDownloaded";
+    }
+    return {};
+}
+
+void tellStatus(Result& result) {
+    const URL url = urlOfPath(result.path);
+    result.needsRecord = false;
+    const std::optional<CloudRoot> root = cloudRootHolding(url, &result.error);
+    std::optional<DownloadingStatus> status;
+    const bool isKnown =
+        !result.error && CloudStore::host().downloadingStatus(url, status, &result.error);
+    const auto orNull = [&root](const std::string& text) { return root ? Value(text) : Value(); };
+    result.fields = {
+        {"isUbiquitous", isKnown || root ? Value(Number::boolean(root.has_value())) : Value()},
+        {"downloadingStatus", status ? Value(wordsOf(*status)) : Value()},
+        {"client", orNull(root ? root->client : "")},
+        {"root", orNull(root ? root->folder.path() : "")},
+        {"mark", orNull(root ? root->mark : "")}};
+    if (!isKnown)
+        return;
+    if (!root) {
+        result.outcome = "in no synchronised storage: no folder above it has a sync client's mark";
+        return;
+    }
+    const bool isHere = status != DownloadingStatus::NotDownloaded;
+    result.outcome = std::string(isHere ? "in synchronised storage, downloaded"
+                                        : "in synchronised storage, not downloaded") +
+                     ": " + root->client + " keeps " + root->folder.path() +
+                     " in step, by its mark \"" + root->mark + "\"";
+}
+
+void CloudCommand::transfer(bool isInto, PVAssetMetadataFileManager& manager, const AssetPtr& asset,
+                            Result& result) const {
+    const AssetPtr moved = manager.setUbiquitous_asset_intoDirectory_replace_error(
+        isInto, asset, urlOfPath(*m_into), m_replaces, &result.error);
+    setRecord(result, moved, PVAssetMetadataFlavorFull);
+    if (m_replaces) {
+        // The library reports no outcome; the disk tells.
+        result.needsRecord = false;
+        const bool isGone = !manager.fileManager()->itemExistsAtPath(urlOfPath(result.path).path());
+        result.outcome = isGone ? "moved into " + urlOfPath(*m_into).path()
+                                : "still where it was; nothing tells why";
+    } else if (moved && moved->url()) {
+        result.outcome = "moved to " + moved->url()->path();
+    } else {
+        result.advice = adviceForTransfer(result, urlOfPath(result.path), "move that away first");
+    }
+}
+
+/// --record, where it is given, is the record of the new version.
+void replace(PVAssetMetadataFileManager& manager, const AssetPtr& newVersion, Result& result) {
+    const AssetPtr asset = AssetRecord(Uninspectable::HasItsURLAlone).forResult(result);
+    result.assetID = asset->assetID();
+    const AssetPtr replaced =
+        manager.replaceUbiquitousAsset_withAsset_error(asset, newVersion, &result.error);
+    setRecord(result, replaced, PVAssetMetadataFlavorFull);
+    if (replaced && replaced->url())
+        result.outcome = "replaced by " + replaced->url()->path();
+    else
+        result.advice = adviceForTransfer(
+            result, newVersion->url().value_or(urlOfPath(result.path)), "move that away first");
+}
+
+int CloudCommand::run(std::vector<std::string> operands) {
+    m_changes.begin();
+    const std::string action = operands.empty() ? std::string() : operands.front();
+    if (action != "add" && action != "take" && action != "replace" && action != "status")
+        throw UsageError("say what to do: add, take, replace or status");
+    checkOptions(action);
+    operands.erase(operands.begin());
+    if (action == "status")
+        return m_changes.runOnPaths(
+            "cloud", std::move(operands),
+            [](PVAssetMetadataFileManager&, Result& result) { tellStatus(result); });
+    if (action != "replace") {
+        m_changes.setTarget(urlOfPath(*m_into));
+        return m_changes.run(
+            "cloud", std::move(operands),
+            [&](PVAssetMetadataFileManager& manager, const AssetPtr& asset, Result& result) {
+                transfer(action == "add", manager, asset, result);
+            });
+    }
+    if (operands.size() != 2)
+        throw UsageError("replace takes two PATHs, OLD and NEW");
+    Result newer = resultForPath(operands.back());
+    const AssetPtr newVersion = m_changes.recordOf(newer);
+    operands.pop_back();
+    if (!m_changes.hasOnePath(operands))
+        throw UsageError("replace takes two PATHs, OLD and NEW, and no others");
+    return m_changes.runOnPaths("cloud", std::move(operands),
+                                [&](PVAssetMetadataFileManager& manager, Result& result) {
+                                    replace(manager, newVersion, result);
+                                });
+}
+
+}  // namespace
+
+std::unique_ptr<Command> makeCloudCommand() {
+    return std::make_unique<CloudCommand>();
+}
+
+}  // namespace parvel::cli

@@ -1,0 +1,33 @@
+#include "cli/FolderGuard.h"
+
+#include <cerrno>
+#include <filesystem>
+
+#include "parvel/metadata/PVAssetMetadata.h"
+
+namespace parvel::cli {
+namespace {
+
+bool isFolderAlone(const URL& url) {
+    std::error_code unknown;
+    const auto status = std::filesystem::symlink_status(url.path(), unknown);
+    return std::filesystem::is_directory(status) && !PVAssetMetadata::isBookURL(url);
+}
+
+}  // namespace
+
+bool FolderGuard::replaceItem(const URL& existing, const URL& replacement, ReplaceOptions options,
+                              std::optional<URL>* resulting, ErrorOut error) {
+    if (isFolderAlone(existing))
+        return fail(error, makePOSIXError(EISDIR, existing));
+    return ForwardingFileSystemService::replaceItem(existing, replacement, options, resulting,
+                                                    error);
+}
+
+bool FolderGuard::removeItem(const URL& item, ErrorOut error) {
+    if (isFolderAlone(item))
+        return fail(error, makePOSIXError(EISDIR, item));
+    return ForwardingFileSystemService::removeItem(item, error);
+}
+
+}  // namespace parvel::cli

@@ -1,0 +1,52 @@
+#include "cli/TransferAdvice.h"
+
+#include <cerrno>
+
+namespace parvel::cli {
+namespace {
+
+std::string adviceForFileError(const Result& result, const URL& place, const URL& source,
+                               std::string_view ifTaken) {
+    switch (static_cast<PVFileErrorCode>(result.error->code())) {
+        case PVFileErrorCode::FileExists:
+            return "something stands at " + place.path() + ": " + std::string(ifTaken);
+        case PVFileErrorCode::NoSuchFile:
+            if (place == source)
+                return place == urlOfPath(result.path) ? "" : place.path() + " is not there";
+            return "there is no folder " + place.deletingLastPathComponent().path() +
+                   ": make it first";
+        case PVFileErrorCode::Corrupt:
+            break;
+    }
+    return {};
+}
+
+std::string adviceForPOSIXError(std::int64_t code, const URL& place) {
+    switch (code) {
+        case EISDIR:
+            return place.path() +
+                   " is a folder and no book: with --force it goes with all that is in it";
+        case EINVAL:
+            return "a folder can't go into itself, nor take the place of one that it lies in";
+        case ENOTSUP:
+            return "no sync client keeps the folder of " + place.path() +
+                   " in step: \"parvel cloud status\" tells which";
+        default:
+            return {};
+    }
+}
+
+}  // namespace
+
+std::string adviceForTransfer(const Result& result, const URL& source, std::string_view ifTaken) {
+    const URL* place = result.error ? result.error->url() : nullptr;
+    if (!place)
+        return {};
+    if (result.error->domain() == PVFileErrorDomain)
+        return adviceForFileError(result, *place, source, ifTaken);
+    if (result.error->domain() == PVPOSIXErrorDomain)
+        return adviceForPOSIXError(result.error->code(), *place);
+    return {};
+}
+
+}  // namespace parvel::cli

@@ -16,6 +16,7 @@ enum ExitStatus : int {
     kFailure = 1,   ///< at least one did not
     kUsage = 2,     ///< the command line is wrong, and nothing was touched
     kNoRecord = 3,  ///< `match` alone: a record could not be had
+    kFound = 4,     ///< something was found, where the status was asked to tell
 };
 
 /// One command of the program. It lives for one run of it.
@@ -42,6 +43,7 @@ struct CommandEntry {
 std::span<const CommandEntry> commands();
 
 std::unique_ptr<Command> makeAttributesCommand();
+std::unique_ptr<Command> makeCheckCommand();
 std::unique_ptr<Command> makeCloudCommand();
 std::unique_ptr<Command> makeInspectCommand();
 std::unique_ptr<Command> makeMatchCommand();

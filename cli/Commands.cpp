@@ -22,6 +22,8 @@ std::span<const CommandEntry> commands() {
         CommandEntry{"redact", "PATH...", "Move assets aside as redacted ones.", makeRedactCommand},
         CommandEntry{"cloud", "add|take|replace|status PATH...",
                      "Move assets into and out of synchronised folders.", makeCloudCommand},
+        CommandEntry{"check", "[DIR|PATH...]", "Compare records with what is on the disk.",
+                     makeCheckCommand},
     };
     return entries;
 }

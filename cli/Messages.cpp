@@ -38,8 +38,6 @@ std::string_view adviceForPOSIXError(std::int64_t code) {
 
 std::string_view adviceFor(const Result& result) {
     const Error& error = *result.error;
-    if (!result.advice.empty())
-        return result.advice;
     if (error.domain() == PVParvelFoundationErrorDomain)
         return adviceForLibraryError(error.code());
     if (error.domain() == PVPOSIXErrorDomain)

@@ -29,11 +29,15 @@ int openedForReading(const std::string& name) {
 }  // namespace
 
 void PathOptions::declare(CommandLine& line) {
+    declareSources(line);
+    line.flag("-r,--recursive", "take every asset below a PATH that is a folder", recursive);
+}
+
+void PathOptions::declareSources(CommandLine& line) {
     line.group("Which assets");
     line.option("--files-from", "FILE",
                 "read PATHs from FILE (\"-\" is standard input), a line each", filesFrom);
     line.flag("-0,--null", "the PATHs of --files-from end with a NUL", nulEnded);
-    line.flag("-r,--recursive", "take every asset below a PATH that is a folder", recursive);
 }
 
 PathFile::PathFile(const std::string& name, bool nulEnded)

@@ -22,6 +22,8 @@ struct PathOptions {
     std::optional<URL> target;  ///< a walk leaves out what lies in this folder already
 
     void declare(CommandLine& line);
+    /// The same without -r.
+    void declareSources(CommandLine& line);
 };
 
 /// PATHs out of a file, a line each (or NUL-ended), read as they are asked for. Empty ones are left

@@ -2,6 +2,7 @@
 #include <vector>
 
 #include "cli/JsonMarks.h"
+#include "cli/PropertyListText.h"
 #include "cli/ResultFormat.h"
 #include "cli/Utf8.h"
 #include "parvel/foundation/PropertyList.h"
@@ -130,6 +131,12 @@ public:
 };
 
 }  // namespace
+
+std::string propertyListText(const Dictionary& dictionary) {
+    const std::optional<Data> list = xmlPropertyList(writableDictionary(dictionary, /*depth=*/1));
+    std::vector<std::uint8_t> storage;
+    return list ? std::string(list->text(storage)) : std::string();
+}
 
 std::unique_ptr<ResultFormat> makePropertyListFormat() {
     return std::make_unique<PropertyListFormat>();

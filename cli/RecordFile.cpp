@@ -1,5 +1,6 @@
 #include "cli/RecordFile.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <optional>
@@ -10,6 +11,7 @@
 #include "cli/Interrupt.h"
 #include "cli/JsonReader.h"
 #include "parvel/foundation/PropertyList.h"
+#include "parvel/foundation/ValueReadings.h"
 
 namespace parvel::cli {
 namespace {
@@ -100,7 +102,65 @@ const Dictionary* recordIn(const Value& value, std::string& problem) {
     return recorded;
 }
 
+/// The values of a text that has one in each line; none where a line has another text. A text of
+/// one line is none of these.
+std::optional<std::vector<Value>> valuesOfLines(std::string_view text) {
+    std::vector<Value> values;
+    try {
+        while (!text.empty()) {
+            const std::string_view line = text.substr(0, text.find('\n'));
+            text.remove_prefix(std::min(line.size() + 1, text.size()));
+            if (line.find_first_not_of(" \t\r") != std::string_view::npos)
+                values.push_back(valueFromJson(line));
+        }
+    } catch (const JsonError&) {
+        return std::nullopt;
+    }
+    return values;
+}
+
+/// What the file holds, one value each; none with the reason.
+std::optional<std::vector<Value>> valuesOf(const std::string& contents, std::string& problem) {
+    const std::optional<Value> value = valueOf(contents, problem);
+    if (!value)
+        return looksLikePropertyList(contents) ? std::nullopt : valuesOfLines(contents);
+    if (const Array* array = value->as<Array>())
+        return std::vector<Value>(array->begin(), array->end());
+    return std::vector<Value>{*value};
+}
+
 }  // namespace
+
+std::optional<std::vector<StoredRecord>> recordsFromFile(const std::string& path,
+                                                         std::string& problem) {
+    std::optional<std::string> contents = contentsOf(path);
+    if (!contents) {
+        problem = strerrordesc_np(errno);
+        return std::nullopt;
+    }
+    const auto values = valuesOf(*contents, problem);
+    contents.reset();
+    if (!values)
+        return std::nullopt;
+    std::vector<StoredRecord> records;
+    records.reserve(values->size());
+    for (const Value& value : *values) {
+        const Dictionary* dictionary = value.as<Dictionary>();
+        if (!dictionary) {
+            problem = "holds something else than records and results";
+            return std::nullopt;
+        }
+        if (!isResult(*dictionary)) {
+            records.push_back({*dictionary, std::nullopt});
+            continue;
+        }
+        const Value* record = dictionary->find("record");
+        const Value* resultPath = dictionary->find("path");
+        if (const Dictionary* recorded = record ? record->as<Dictionary>() : nullptr)
+            records.push_back({*recorded, stringForm(resultPath)});
+    }
+    return records;
+}
 
 std::shared_ptr<const Dictionary> dictionaryFromFile(const std::string& path,
                                                      std::string& problem) {

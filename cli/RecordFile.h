@@ -1,7 +1,9 @@
 #pragma once
 
 #include <memory>
+#include <optional>
 #include <string>
+#include <vector>
 
 #include "parvel/foundation/Value.h"
 
@@ -11,5 +13,17 @@ namespace parvel::cli {
 /// itself or one result as `inspect` prints it (an array of one result too). Null where there is
 /// none, with the reason in `problem`.
 std::shared_ptr<const Dictionary> dictionaryFromFile(const std::string& path, std::string& problem);
+
+/// A record out of a file of many.
+struct StoredRecord {
+    Dictionary record;
+    std::optional<std::string> path;  ///< the PATH of the result that it stood in
+};
+
+/// The records in a file: a property list (XML or binary) or JSON, holding an array of record
+/// dictionaries or of results as `inspect` prints them, or one result a line. Results without a
+/// record are left out. None where the file holds anything else, with the reason in `problem`.
+std::optional<std::vector<StoredRecord>> recordsFromFile(const std::string& path,
+                                                         std::string& problem);
 
 }  // namespace parvel::cli

@@ -28,6 +28,9 @@ std::string adviceForPOSIXError(std::int64_t code, const URL& place) {
                    " is a folder and no book: with --force it goes with all that is in it";
         case EINVAL:
             return "a folder can't go into itself, nor take the place of one that it lies in";
+        case ETIMEDOUT:
+            return "its content is not on this device: let the sync client download it and try "
+                   "again";
         case ENOTSUP:
             return "no sync client keeps the folder of " + place.path() +
                    " in step: \"parvel cloud status\" tells which";

@@ -7,11 +7,39 @@ _parvel_options() {
             echo '--write --update --dry-run --record --files-from --null -0 --recursive -r --jobs -j
                 --json --jsonl --plist --log --help -h'
             ;;
+        check)
+            echo '--records --exit-code --dry-run --files-from --null -0
+                --json --jsonl --plist --log --help -h'
+            ;;
+        cloud)
+            echo '--into --replace --force --record --dry-run --files-from --null -0 --recursive -r
+                --json --jsonl --plist --log --help -h'
+            ;;
         inspect)
             echo '--cover --extra --flavor --immediate --store --files-from --null -0 --recursive -r --jobs -j
                 --json --jsonl --plist --log --help -h'
             ;;
         match) echo '--key --json --jsonl --plist --log --help -h' ;;
+        move)
+            echo '--to --into --replace --rename --asset-id-name --force --record --dry-run --files-from --null -0 --recursive -r
+                --json --jsonl --plist --log --help -h'
+            ;;
+        redact)
+            echo '--into --record --dry-run --files-from --null -0 --recursive -r
+                --json --jsonl --plist --log --help -h'
+            ;;
+        remove)
+            echo '--force --record --dry-run --files-from --null -0 --recursive -r
+                --json --jsonl --plist --log --help -h'
+            ;;
+        rename)
+            echo '--display-name --record --dry-run --files-from --null -0 --recursive -r
+                --json --jsonl --plist --log --help -h'
+            ;;
+        trash)
+            echo '--list --restore --record --dry-run --files-from --null -0 --recursive -r
+                --json --jsonl --plist --log --help -h'
+            ;;
     esac
 }
 
@@ -40,12 +68,17 @@ _parvel() {
                 compgen -W 'full content-library store progress identity' -- "$current")
             return
             ;;
-        -j | --jobs | --key | --update) return ;;
+        -j | --jobs | --key | --update | --display-name) return ;;
+        cloud)
+            mapfile -t COMPREPLY < <(compgen -W 'add take replace status' -- "$current")
+            return
+            ;;
     esac
     if [[ $current == -* ]]; then
         mapfile -t COMPREPLY < <(compgen -W "$(_parvel_options "$command")" -- "$current")
     elif [[ -z $command ]]; then
-        mapfile -t COMPREPLY < <(compgen -W 'attributes inspect match' -- "$current")
+        mapfile -t COMPREPLY < <(compgen -W \
+            'attributes check cloud inspect match move redact remove rename trash' -- "$current")
     else
         compopt -o filenames
         mapfile -t COMPREPLY < <(compgen -f -- "$current")

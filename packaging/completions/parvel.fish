@@ -1,7 +1,8 @@
 # Completion of parvel(1) for fish.
 
 function __parvel_needs_command
-    not __fish_seen_subcommand_from attributes inspect match
+    not __fish_seen_subcommand_from \
+        attributes check cloud inspect match move redact remove rename trash
 end
 
 set -l levels 'off fault error default debug'
@@ -10,21 +11,36 @@ set -l flavors 'full content-library store progress identity'
 complete -c parvel -n __parvel_needs_command -f -a inspect -d 'Print what is known of assets'
 complete -c parvel -n __parvel_needs_command -f -a attributes -d 'What is kept on the files themselves'
 complete -c parvel -n __parvel_needs_command -f -a match -d 'Tell whether two are the same'
+complete -c parvel -n __parvel_needs_command -f -a move -d 'Move assets to another place'
+complete -c parvel -n __parvel_needs_command -f -a rename -d 'Name PDF documents after their display names'
+complete -c parvel -n __parvel_needs_command -f -a trash -d 'Move assets to the trash, or back'
+complete -c parvel -n __parvel_needs_command -f -a remove -d 'Delete assets for good'
+complete -c parvel -n __parvel_needs_command -f -a redact -d 'Move assets aside'
+complete -c parvel -n __parvel_needs_command -f -a cloud -d 'Move assets into and out of synchronised folders'
+complete -c parvel -n __parvel_needs_command -f -a check -d 'Compare records with the disk'
 complete -c parvel -n __parvel_needs_command -l version -d 'Print the version'
 complete -c parvel -n __parvel_needs_command -l json -d 'Print the version as JSON'
 complete -c parvel -l log -x -a $levels -d 'Print log lines'
 complete -c parvel -s h -l help -d 'Print the options'
 
-for command in attributes inspect match
+for command in attributes check cloud inspect match move redact remove rename trash
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l json -d 'Print one JSON array'
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l jsonl -d 'Print lines of JSON'
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l plist -d 'Print a property list'
 end
 
-for command in attributes inspect
+for command in attributes check cloud inspect move redact remove rename trash
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l files-from -r -d 'Read PATHs from a file'
     complete -c parvel -n "__fish_seen_subcommand_from $command" -s 0 -l null -d 'PATHs end with a NUL'
+end
+
+for command in attributes cloud inspect move redact remove rename trash
     complete -c parvel -n "__fish_seen_subcommand_from $command" -s r -l recursive -d 'Take all assets below a folder'
+end
+
+for command in cloud move redact remove rename trash
+    complete -c parvel -n "__fish_seen_subcommand_from $command" -l record -r -d 'Take the record from a file'
+    complete -c parvel -n "__fish_seen_subcommand_from $command" -l dry-run -d 'Touch nothing'
 end
 
 complete -c parvel -n '__fish_seen_subcommand_from attributes' -l write -d 'Write what the record says'
@@ -41,3 +57,28 @@ complete -c parvel -n '__fish_seen_subcommand_from inspect' -l store -d 'Read a 
 complete -c parvel -n '__fish_seen_subcommand_from inspect' -s j -l jobs -x -d 'How many at once'
 
 complete -c parvel -n '__fish_seen_subcommand_from match' -l key -x -d 'Compare one value'
+
+complete -c parvel -n '__fish_seen_subcommand_from move' -l to -r -d 'The new path'
+complete -c parvel -n '__fish_seen_subcommand_from move' -l into -r -d 'The folder'
+complete -c parvel -n '__fish_seen_subcommand_from move' -l replace -d 'Replace what stands there'
+complete -c parvel -n '__fish_seen_subcommand_from move' -l rename -d 'Count up to a free name'
+complete -c parvel -n '__fish_seen_subcommand_from move' -l asset-id-name -d 'Name a book after its identity'
+complete -c parvel -n '__fish_seen_subcommand_from move' -l force -d 'Replace a folder, too'
+
+complete -c parvel -n '__fish_seen_subcommand_from rename' -l display-name -x -d 'Give it that name first'
+
+complete -c parvel -n '__fish_seen_subcommand_from trash' -l list -d 'List what was put there'
+complete -c parvel -n '__fish_seen_subcommand_from trash' -l restore -d 'Put back what had that PATH'
+
+complete -c parvel -n '__fish_seen_subcommand_from remove' -l force -d 'Remove a folder, too'
+
+complete -c parvel -n '__fish_seen_subcommand_from redact' -l into -r -d 'The folder'
+
+complete -c parvel -n '__fish_seen_subcommand_from cloud' -f -a 'add take replace status'
+complete -c parvel -n '__fish_seen_subcommand_from cloud' -l into -r -d 'The folder'
+complete -c parvel -n '__fish_seen_subcommand_from cloud' -l replace -d 'Replace what stands there'
+complete -c parvel -n '__fish_seen_subcommand_from cloud' -l force -d 'Replace a folder, too'
+
+complete -c parvel -n '__fish_seen_subcommand_from check' -l records -r -d 'The records'
+complete -c parvel -n '__fish_seen_subcommand_from check' -l exit-code -d 'End with status 4 where anything is found'
+complete -c parvel -n '__fish_seen_subcommand_from check' -l dry-run -d 'Touch nothing'

@@ -13,6 +13,7 @@
 
 #include "reader/Channel.h"
 #include "reader/TrappedCall.h"
+#include "reader/Walls.h"
 
 namespace parvel::reader {
 
@@ -30,18 +31,24 @@ std::map<std::string, int, std::less<>>& hostFiles() {
 
 volatile sig_atomic_t endsWhenFileIsWanted = 0;
 
+/// What code is told that asks for a path that was not kept.
+long missingFile() {
+    if (endsWhenFileIsWanted != 0) {
+        Answer wanted;
+        wanted.reply.outcome = Outcome::FontsWanted;
+        wanted.reply.spentMilliseconds =
+            static_cast<std::uint32_t>(drawingMilliseconds - endProcessorTimeLimit());
+        static_cast<void>(send(wanted));
+        ::_exit(0);
+    }
+    return -ENOENT;
+}
+
 /// A descriptor of its own for each open; they share the place in the file, so each begins anew.
 long openKept(const char* path) {
     const auto found = hostFiles().find(std::string_view(path));
-    if (found == hostFiles().end()) {
-        if (endsWhenFileIsWanted != 0) {
-            Answer wanted;
-            wanted.reply.outcome = Outcome::FontsWanted;
-            static_cast<void>(send(wanted));
-            ::_exit(0);
-        }
-        return -ENOENT;
-    }
+    if (found == hostFiles().end())
+        return missingFile();
     const int descriptor = ::fcntl(found->second, F_DUPFD_CLOEXEC, 0);
     if (descriptor < 0)
         return -errno;
@@ -52,7 +59,7 @@ long openKept(const char* path) {
 /// The C library asks for a descriptor's status as that of an empty path.
 long statusOf(int descriptor, const char* path, struct stat* status, int flags) {
     if ((flags & AT_EMPTY_PATH) == 0 || path[0] != '\0')
-        return -ENOENT;
+        return missingFile();
     return ::syscall(SYS_fstat, descriptor, status) == 0 ? 0 : -errno;
 }
 
@@ -64,7 +71,7 @@ long resultOf(const TrappedCall& call) {
             return statusOf(static_cast<int>(call.argument(0)), call.pointer<const char>(1),
                             call.pointer<struct stat>(2), static_cast<int>(call.argument(3)));
         default:
-            return -ENOSYS;
+            return missingFile();
     }
 }
 

@@ -71,7 +71,9 @@ constexpr std::array allowedCalls{
     SCMP_SYS(rt_sigreturn),  SCMP_SYS(exit),    SCMP_SYS(exit_group),    SCMP_SYS(setitimer),
     SCMP_SYS(rt_sigprocmask)};
 
-constexpr std::array trappedCalls{SCMP_SYS(openat), SCMP_SYS(newfstatat)};
+/// What asks for a path.
+constexpr std::array trappedCalls{SCMP_SYS(openat), SCMP_SYS(newfstatat), SCMP_SYS(access),
+                                  SCMP_SYS(faccessat)};
 
 bool addRules(scmp_filter_ctx filter) {
     int failed = 0;
@@ -127,6 +129,13 @@ void allowAddressSpace(std::uint64_t inputBytes) {
 void limitProcessorTime(int milliseconds) {
     const itimerval timer{{}, {milliseconds / 1000, milliseconds % 1000 * 1000}};
     ::setitimer(ITIMER_PROF, &timer, nullptr);
+}
+
+int endProcessorTimeLimit() {
+    const itimerval none{};
+    itimerval left{};
+    ::setitimer(ITIMER_PROF, &none, &left);
+    return static_cast<int>(left.it_value.tv_sec * 1000 + left.it_value.tv_usec / 1000);
 }
 
 }  // namespace parvel::reader

@@ -13,5 +13,7 @@ namespace parvel::reader {
 void allowAddressSpace(std::uint64_t inputBytes);
 /// Ends the process when it has used this much CPU time from now on.
 void limitProcessorTime(int milliseconds);
+/// How much of the last limit is left; the limit is gone then. Callable from a signal handler.
+[[nodiscard]] int endProcessorTimeLimit();
 
 }  // namespace parvel::reader

@@ -5,8 +5,9 @@
 //   2. the walls go up, and Hello says which stand;
 //   3. requests are answered one after the other, until the library closes its end.
 
+#include <algorithm>
 #include <cstdlib>
-#include <new>
+#include <ctime>
 #include <string_view>
 
 #include "reader/Channel.h"
@@ -21,6 +22,12 @@ namespace {
 
 /// Tables for the scripts of East Asia, where they are installed.
 constexpr const char* tablesFolder = "/usr/share/poppler";
+
+/// What is left of the time for drawing, though never nothing, which would be no limit.
+int drawingTime(const Request& request) {
+    const auto limit = static_cast<std::uint32_t>(drawingMilliseconds);
+    return static_cast<int>(limit - std::min(request.spentMilliseconds, limit - 1));
+}
 
 void readyHostFiles() {
     readyFonts();
@@ -40,11 +47,10 @@ public:
                 answer = m_document.open(received);
                 return true;
             case Ask::DescribePage:
-                limitProcessorTime(informationMilliseconds);
                 answer = m_document.describePage();
                 return true;
             case Ask::DrawPage: {
-                limitProcessorTime(drawingMilliseconds);
+                limitProcessorTime(drawingTime(received.request));
                 const EndWhenFileIsWanted inForce(!m_hasFonts);
                 answer = m_document.drawPage(received.request);
                 return true;
@@ -68,8 +74,9 @@ private:
 };
 
 int run(std::uint64_t inputBytes, bool hasFonts) {
-    // What the C library would look up in the host's files otherwise.
+    // The C library looks a time zone up in the host's files, once.
     ::setenv("TZ", "UTC0", 1);
+    ::tzset();
     if (hasFonts)
         readyHostFiles();
     Reader reader(hasFonts);

@@ -55,6 +55,10 @@ void letIdleHelperClose() {
         keepIdle(std::move(helper));
 }
 
+void endIdleHelper() {
+    takeIdle().reset();
+}
+
 HelperLease::HelperLease(const HelperMeans& wanted) : m_helper(takeIdle()) {
     HelperMeans means = wanted;
     if (m_helper && m_helper->isOurs() && m_helper->inputCount() < servedInputs) {

@@ -35,6 +35,8 @@ private:
 
 /// Has the helper that waits, if any, close a document that nobody needs any longer.
 void letIdleHelperClose();
+/// Ends the helper that waits, if any.
+void endIdleHelper();
 
 /// The bytes of a memory file that came with an answer, for as long as they are used. Null when it
 /// is not one of that size that is sealed against any change.

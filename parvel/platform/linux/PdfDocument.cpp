@@ -169,7 +169,7 @@ std::shared_ptr<const OpenedPdf> openInHelper(HelperLease& lease,
 
 /// Asks something about the first page, and opens the document before where the helper does not
 /// have it open. A helper that lacks the fonts is replaced by one that has them.
-bool askOfPage(const std::shared_ptr<const OpenedPdf>& document, const Request& request,
+bool askOfPage(const std::shared_ptr<const OpenedPdf>& document, Request request,
                HelperAnswer& answer) {
     HelperMeans means = document->input->means();
     HelperLease lease(means);
@@ -186,6 +186,7 @@ bool askOfPage(const std::shared_ptr<const OpenedPdf>& document, const Request& 
                 if (answer.reply.outcome != Outcome::FontsWanted)
                     return answer.reply.outcome == Outcome::Done;
                 means.hasFonts = true;
+                request.spentMilliseconds = answer.reply.spentMilliseconds;
                 break;
             case HelperProcess::Exchange::NotAsked:
                 break;

@@ -50,6 +50,7 @@ std::string ownProgram() {
 }  // namespace
 
 void setReaderProgramPath(std::string_view path) {
+    host::endIdleHelper();
     const std::lock_guard lock(pathGuard());
     // The helper starts in another folder.
     std::error_code error;

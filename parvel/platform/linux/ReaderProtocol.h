@@ -41,6 +41,8 @@ struct Request {
     std::uint32_t width = 0;
     std::uint32_t height = 0;
     std::uint32_t stride = 0;
+    /// DrawPage: what a helper without fonts has spent on the page already.
+    std::uint32_t spentMilliseconds = 0;
     std::uint64_t size = 0;
 };
 
@@ -50,7 +52,7 @@ enum class Outcome : std::uint32_t {
     Refused = 2,
     Hello = 3,
     /// The page needs a font, or another file of the host, that this helper was not started with.
-    /// It ends behind this reply.
+    /// It ends behind this reply, which tells the CPU time spent.
     FontsWanted = 4,
 };
 
@@ -84,6 +86,7 @@ struct Reply {
     std::uint32_t width = 0;
     std::uint32_t height = 0;
     std::uint32_t stride = 0;
+    std::uint32_t spentMilliseconds = 0;  ///< FontsWanted
     std::uint64_t size = 0;
 
     double cropBoxWidth = 0;
@@ -95,9 +98,10 @@ struct Reply {
 /// The longest side of a page that is drawn.
 inline constexpr std::uint32_t longestDrawnSide = 16384;
 
-/// The CPU time that one request may take, in milliseconds, and the longest wait for a reply.
+/// The CPU time that may go into all information of a document, and into the drawing of a page; a
+/// person waits for no cover longer than that. And the longest wait for a reply.
 inline constexpr int informationMilliseconds = 1500;
-inline constexpr int drawingMilliseconds = 5000;
+inline constexpr int drawingMilliseconds = 1600;
 inline constexpr int longestWaitMilliseconds = 10000;
 /// Address space beyond the input's own bytes, and what a helper gets for the input unless that is
 /// longer.

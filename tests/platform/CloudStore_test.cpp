@@ -178,5 +178,43 @@ TEST_F(CloudStoreTest, AnExistingOrMissingItemHasNoPlaceholder) {
     EXPECT_EQ(m_store.placeholderFile(m_folder.url("b.epub")), std::nullopt);
 }
 
+TEST_F(CloudStoreTest, TheRootIsTheFirstMarkedFolderAbove) {
+    m_folder.write("root/.stfolder/x", "");
+    m_folder.write(std::string("root/inner/") + nextcloudJournal, "");
+
+    const auto inner = cloudRootHolding(m_folder.url("root/inner/books.epub"), &m_error);
+    const auto outer = cloudRootHolding(m_folder.url("root/inner"), &m_error);
+
+    ASSERT_TRUE(inner && outer);
+    EXPECT_EQ(inner->client, "Nextcloud");
+    EXPECT_EQ(inner->folder, m_folder.url("root/inner"));
+    EXPECT_EQ(inner->mark, nextcloudJournal);
+    EXPECT_EQ(outer->client, "Syncthing");
+    EXPECT_EQ(outer->folder, m_folder.url("root"));
+    EXPECT_EQ(outer->mark, ".stfolder");
+}
+
+TEST_F(CloudStoreTest, TheRootIsNamedByItsOwnPathWhereALinkLeadsIntoIt) {
+    m_folder.write("root/.stfolder/x", "");
+    m_folder.write("root/books/x", "");
+    std::filesystem::create_symlink("root/books", m_folder / "books");
+
+    const auto root = cloudRootHolding(m_folder.url("books/a.epub"), &m_error);
+
+    ASSERT_TRUE(root);
+    EXPECT_EQ(root->folder, m_folder.url("root"));
+}
+
+TEST_F(CloudStoreTest, APlainFolderHasNoRoot) {
+    EXPECT_FALSE(cloudRootHolding(m_folder.url("a.epub"), &m_error));
+    EXPECT_FALSE(m_error);
+}
+
+TEST_F(CloudStoreTest, TheRootOfAnUnreachableFolderIsNotKnown) {
+    EXPECT_FALSE(cloudRootHolding(m_folder.url("absent/a.epub"), &m_error));
+
+    expectNoSuchFile(m_folder.url("absent/a.epub"));
+}
+
 }  // namespace
 }  // namespace parvel::testing

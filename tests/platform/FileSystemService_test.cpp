@@ -234,6 +234,19 @@ TEST_F(FileSystem, AnItemReplacedByItselfStays) {
     EXPECT_EQ(m_folder.read("old"), "1");
 }
 
+TEST_F(FileSystem, AFolderAndWhatLiesInItDontReplaceEachOther) {
+    m_folder.write("a.epub/b.epub", "1");
+
+    EXPECT_FALSE(m_service->replaceItem(m_folder.url("a.epub"), m_folder.url("a.epub/b.epub"),
+                                        ReplaceOptions::Default, nullptr, &m_error));
+    EXPECT_EQ(m_error, makePOSIXError(EINVAL, m_folder.url("a.epub")));
+    EXPECT_FALSE(m_service->replaceItem(m_folder.url("a.epub/b.epub"), m_folder.url("a.epub"),
+                                        ReplaceOptions::Default, nullptr, &m_error));
+
+    EXPECT_EQ(m_error, makePOSIXError(EINVAL, m_folder.url("a.epub/b.epub")));
+    EXPECT_EQ(m_folder.read("a.epub/b.epub"), "1");
+}
+
 TEST_F(FileSystem, AnotherNameOfTheSameFileGoesWhenItReplaces) {
     m_folder.write("old", "1");
     fs::create_hard_link(m_folder / "old", m_folder / "new");

@@ -248,13 +248,6 @@ TEST_F(RehearsedFolder, WhatLeavesTheTrashLeavesNoInfoFile) {
                    exists("data/Trash/info/a.pdf.trashinfo"), exists("a.pdf")});
 }
 
-TEST_F(RehearsedFolder, ATrashThatCantBeMadeFails) {
-    m_folder.write("a.pdf", "1");
-    m_folder.write("data", "a file");
-
-    expectTheSame({trash("a.pdf"), exists("a.pdf")});
-}
-
 TEST_F(RehearsedFolder, APlaceOutsideSynchronisedStorageIsRefused) {
     m_folder.write("a.epub", "1");
     m_folder.write("cloud/.stfolder/x", "");

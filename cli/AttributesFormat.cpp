@@ -7,7 +7,7 @@ namespace {
 
 /// What all of the library's attribute names begin with.
 constexpr std::string_view kCommonPart = "com.kestrel.Folium.";
-constexpr std::size_t kLabelWidth = 17;
+constexpr std::size_t kNameWidth = 17;
 
 /// The PATH, and a line an attribute below it, with the last part of its name.
 class AttributesFormat : public ResultFormat {
@@ -30,7 +30,7 @@ void AttributesFormat::append(const Result& result, std::string& out) const {
     for (const auto& [name, value] : *result.record) {
         const std::string text = stringForm(&value).value_or(std::string());
         appendField(name.substr(name.starts_with(kCommonPart) ? kCommonPart.size() : 0),
-                    text.empty() ? "(empty)" : text, kLabelWidth, m_terminal.width, out);
+                    text.empty() ? "(empty)" : text, kNameWidth, m_terminal.width, out);
     }
 }
 

@@ -49,10 +49,12 @@ std::string_view adviceFor(const Result& result) {
     return {};
 }
 
-/// The log's reason says more than the general error of damaged content.
+/// The log's reason says more than the general error of damaged content without a reason of its
+/// own.
 bool reasonTellsMore(const Result& result) {
     return !result.reason.empty() && result.error->domain() == PVFileErrorDomain &&
-           result.error->code() == static_cast<std::int64_t>(PVFileErrorCode::Corrupt);
+           result.error->code() == static_cast<std::int64_t>(PVFileErrorCode::Corrupt) &&
+           !result.error->userInfo().contains(PVLocalizedFailureReasonErrorKey);
 }
 
 }  // namespace

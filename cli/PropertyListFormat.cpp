@@ -11,7 +11,7 @@ namespace parvel::cli {
 namespace {
 
 /// How deep the library writes and reads property lists.
-constexpr int kDeepest = 512;
+constexpr int kDeepestList = 512;
 /// The array that holds the results is the first level.
 constexpr int kResultDepth = 2;
 
@@ -66,7 +66,7 @@ Value writableDate(const Date& date) {
 /// a date outside the years 1 to 9999 as JSON has it.
 std::optional<Value> writable(const Value& value, int depth) {
     const bool isContainer = value.as<Array>() || value.as<Dictionary>() || value.as<Date>();
-    if (isContainer && depth > kDeepest)
+    if (isContainer && depth > kDeepestList)
         return std::nullopt;
     switch (value.typeID()) {
         case TypeID::Null:

@@ -26,7 +26,7 @@ void expectRoundTrip(const Value& value) {
     EXPECT_EQ(valueFromJson(text), value) << text;
 }
 
-std::string problemOf(std::string_view text) {
+std::string jsonProblemOf(std::string_view text) {
     try {
         static_cast<void>(valueFromJson(text));
     } catch (const JsonError& error) {
@@ -156,9 +156,9 @@ TEST(Json, ReadsPairsOfEscapesAsOneCharacter) {
 }
 
 TEST(Json, RefusesHalfAPair) {
-    EXPECT_EQ(problemOf(R"("\ud83c")"), "line 1, column 8: an escape is half of a pair");
-    EXPECT_NE(problemOf(R"("\udc00")"), "read");
-    EXPECT_NE(problemOf(R"("\ud83c\u0041")"), "read");
+    EXPECT_EQ(jsonProblemOf(R"("\ud83c")"), "line 1, column 8: an escape is half of a pair");
+    EXPECT_NE(jsonProblemOf(R"("\udc00")"), "read");
+    EXPECT_NE(jsonProblemOf(R"("\ud83c\u0041")"), "read");
 }
 
 TEST(Json, RefusesWhatIsNoJson) {
@@ -166,7 +166,7 @@ TEST(Json, RefusesWhatIsNoJson) {
          {"",       " ",        "{",     "[1,]", "{\"a\":1,}", "{a:1}", "01",      "1.",
           ".5",     "+1",       "1e",    "-",    "tru",        "\"a",   "\"\\x\"", "\"\\u12\"",
           "\"\n\"", "\"\xff\"", "[1] 2", "nan",  "1e400",      "'a'",   "[1 2]",   "{\"a\" 1}"})
-        EXPECT_NE(problemOf(text), "read") << text;
+        EXPECT_NE(jsonProblemOf(text), "read") << text;
 }
 
 TEST(Json, RefusesAMarkOfAnotherForm) {
@@ -174,18 +174,18 @@ TEST(Json, RefusesAMarkOfAnotherForm) {
          {R"({"$date":"yesterday"})", R"({"$date":"2001-02-30T00:00:00Z"})",
           R"({"$date":"2001-01-01T00:00:00.Z"})", R"({"$date":true})", R"({"$data":"YQ"})",
           R"({"$data":"Y!=="})", R"({"$data":7})", R"({"$real":"1"})"})
-        EXPECT_NE(problemOf(text), "read") << text;
+        EXPECT_NE(jsonProblemOf(text), "read") << text;
 }
 
 TEST(Json, SaysWhereTheTextIsWrong) {
-    EXPECT_EQ(problemOf("{\n  \"a\": x\n}"), "line 2, column 8: a value is missing");
+    EXPECT_EQ(jsonProblemOf("{\n  \"a\": x\n}"), "line 2, column 8: a value is missing");
 }
 
 TEST(Json, BoundsTheNesting) {
     const std::string deepest = std::string(512, '[') + std::string(512, ']');
-    EXPECT_EQ(problemOf(deepest), "read");
-    EXPECT_EQ(problemOf("[" + deepest + "]"), "line 1, column 514: nested too deep");
-    EXPECT_NE(problemOf(std::string(1000000, '[')), "read");
+    EXPECT_EQ(jsonProblemOf(deepest), "read");
+    EXPECT_EQ(jsonProblemOf("[" + deepest + "]"), "line 1, column 514: nested too deep");
+    EXPECT_NE(jsonProblemOf(std::string(1000000, '[')), "read");
 }
 
 TEST(Json, TakesTheLastOfSeveralEntriesWithOneKey) {

@@ -4,6 +4,8 @@
                                    producer; expanded=yes for a folder; damage=container|opf|
                                    metadata|no-container|no-opf|zip for one that is broken there;
                                    store='{JSON}' for its store metadata file
+    pdf NAME [FIELD=VALUE]...      a small PDF document. Fields: author, subject, pages (1), turned;
+                                   damage=cut for half of one, locked=yes for one with a password
     file NAME TEXT                 a file with that text and a line end
     json NAME JSON                 the same, checked to be JSON
     plist NAME [binary] JSON       a property list
@@ -90,6 +92,29 @@ def book(path, fields):
                 archive.writestr(zipfile.ZipInfo(name), text)
 
 
+def pdf_bytes(fields):
+    pages = int(fields.get("pages", "1"))
+    kids = " ".join(f"{number} 0 R" for number in range(4, 4 + pages))
+    info = "".join(f"/{key.title()}({fields[key]})" for key in ("author", "subject") if key in fields)
+    turned = f"/Rotate {fields['turned']}" if "turned" in fields else ""
+    objects = ["<</Type/Catalog/Pages 2 0 R>>", f"<</Type/Pages/Kids[{kids}]/Count {pages}>>",
+               f"<<{info}>>"]
+    objects += [f"<</Type/Page/Parent 2 0 R/MediaBox[0 0 612 792]{turned}>>"] * pages
+    text, places = "%PDF-1.6\n", []
+    for number, content in enumerate(objects, 1):
+        places.append(len(text))
+        text += f"{number} 0 obj\n{content}\nendobj\n"
+    table = "0000000000 65535 f \n" + "".join(f"{at:010} 00000 n \n" for at in places)
+    lock = ""
+    if fields.get("locked") == "yes":
+        lock = "/Encrypt<</Filter/Standard/V 2/R 3/Length 128/P -4/O<%s>/U<%s>>>/ID[<01><01>]" % (
+            "5a" * 32, "5b" * 32)
+    end = len(text)
+    text += (f"xref\n0 {len(objects) + 1}\n{table}trailer\n<</Size {len(objects) + 1}/Root 1 0 R"
+             f"/Info 3 0 R{lock}>>\nstartxref\n{end}\n%%EOF\n")
+    return text[:len(text) // 2] if fields.get("damage") == "cut" else text
+
+
 def write(path, text):
     with open(path, "wb") as file:
         file.write(text if isinstance(text, bytes) else text.encode())
@@ -115,6 +140,8 @@ def make(directory, line):
     path = place(directory, name)
     if kind == "book":
         book(path, dict(field.split("=", 1) for field in rest))
+    elif kind == "pdf":
+        write(path, pdf_bytes(dict(field.split("=", 1) for field in rest)))
     elif kind == "file":
         write(path, "".join(rest) + "\n")
     elif kind == "json":

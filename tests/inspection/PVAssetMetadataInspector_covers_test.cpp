@@ -49,6 +49,22 @@ TEST_F(CoverImageData, OfAPackageIsTheStoresArtworkFile) {
     EXPECT_EQ(m_error, std::nullopt);
 }
 
+TEST_F(CoverImageData, OfAnArchiveOfNoKindIsTheStoresArtworkFileToo) {
+    const URL url = book().file("BazaarArtwork", "artwork").zip(m_folder / "a.zip");
+
+    EXPECT_EQ(cover(url), image("artwork"));
+
+    EXPECT_EQ(m_error, std::nullopt);
+}
+
+TEST_F(CoverImageData, OfAFolderThatIsNoPackageIsNone) {
+    const URL url = book().file("BazaarArtwork", "artwork").expand(m_folder / "a");
+
+    EXPECT_EQ(cover(url), std::nullopt);
+
+    EXPECT_EQ(m_error, makeNoAssetTypeError(url));
+}
+
 TEST_F(CoverImageData, WithoutArtworkIsTheCoverOfTheWholeRead) {
     EXPECT_EQ(cover(book().expand(m_folder / "a.epub")), image("the OPF's"));
     EXPECT_EQ(cover(book().zip(m_folder / "b.epub")), image("the OPF's"));

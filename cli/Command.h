@@ -45,6 +45,7 @@ std::span<const CommandEntry> commands();
 std::unique_ptr<Command> makeAttributesCommand();
 std::unique_ptr<Command> makeCheckCommand();
 std::unique_ptr<Command> makeCloudCommand();
+std::unique_ptr<Command> makeCoverCommand();
 std::unique_ptr<Command> makeInspectCommand();
 std::unique_ptr<Command> makeMatchCommand();
 std::unique_ptr<Command> makeMoveCommand();

@@ -10,6 +10,7 @@ std::span<const CommandEntry> commands() {
                      makeInspectCommand},
         CommandEntry{"attributes", "PATH...",
                      "Print or write what is kept on the files themselves.", makeAttributesCommand},
+        CommandEntry{"cover", "PATH", "Write the cover image of an asset.", makeCoverCommand},
         CommandEntry{"match", "A B", "Tell whether two assets, or records, are the same asset.",
                      makeMatchCommand},
         CommandEntry{"move", "PATH...", "Move assets to another place or into a folder.",

@@ -11,18 +11,6 @@ namespace {
 
 constexpr std::size_t kFull = 64 * 1024;
 
-/// The errno of the write that failed, else 0.
-int writeAll(int descriptor, std::string_view text) {
-    while (!text.empty()) {
-        const ssize_t written = write(descriptor, text.data(), text.size());
-        if (written >= 0)
-            text.remove_prefix(static_cast<std::size_t>(written));
-        else if (errno != EINTR)
-            return errno;
-    }
-    return 0;
-}
-
 bool isRegularFile(int descriptor) {
     struct stat status {};
     return fstat(descriptor, &status) == 0 && S_ISREG(status.st_mode);
@@ -58,6 +46,17 @@ bool Output::finish(std::string_view command) {
         writeToStandardError("parvel: " + std::string(command) +
                              ": standard output: " + strerrordesc_np(m_errno) + "\n");
     return !failed();
+}
+
+int writeAll(int descriptor, std::string_view text) {
+    while (!text.empty()) {
+        const ssize_t written = write(descriptor, text.data(), text.size());
+        if (written >= 0)
+            text.remove_prefix(static_cast<std::size_t>(written));
+        else if (errno != EINTR)
+            return errno;
+    }
+    return 0;
 }
 
 void writeToStandardError(std::string_view text) {

@@ -29,6 +29,9 @@ private:
     std::string m_buffer;
 };
 
+/// Writes the whole text; the errno of the write that failed, else 0.
+[[nodiscard]] int writeAll(int descriptor, std::string_view text);
+
 /// Writes the whole text to standard error in one call, so that lines of several threads stay
 /// whole.
 void writeToStandardError(std::string_view text);

@@ -15,6 +15,7 @@ _parvel_options() {
             echo '--into --replace --force --record --dry-run --files-from --null -0 --recursive -r
                 --json --jsonl --plist --log --help -h'
             ;;
+        cover) echo '--output -o --size --best --json --jsonl --plist --log --help -h' ;;
         inspect)
             echo '--cover --extra --flavor --immediate --store --files-from --null -0 --recursive -r --jobs -j
                 --json --jsonl --plist --log --help -h'
@@ -68,7 +69,7 @@ _parvel() {
                 compgen -W 'full content-library store progress identity' -- "$current")
             return
             ;;
-        -j | --jobs | --key | --update | --display-name) return ;;
+        -j | --jobs | --key | --size | --update | --display-name) return ;;
         cloud)
             mapfile -t COMPREPLY < <(compgen -W 'add take replace status' -- "$current")
             return
@@ -78,7 +79,7 @@ _parvel() {
         mapfile -t COMPREPLY < <(compgen -W "$(_parvel_options "$command")" -- "$current")
     elif [[ -z $command ]]; then
         mapfile -t COMPREPLY < <(compgen -W \
-            'attributes check cloud inspect match move redact remove rename trash' -- "$current")
+            'attributes check cloud cover inspect match move redact remove rename trash' -- "$current")
     else
         compopt -o filenames
         mapfile -t COMPREPLY < <(compgen -f -- "$current")

@@ -2,7 +2,7 @@
 
 function __parvel_needs_command
     not __fish_seen_subcommand_from \
-        attributes check cloud inspect match move redact remove rename trash
+        attributes check cloud cover inspect match move redact remove rename trash
 end
 
 set -l levels 'off fault error default debug'
@@ -10,6 +10,7 @@ set -l flavors 'full content-library store progress identity'
 
 complete -c parvel -n __parvel_needs_command -f -a inspect -d 'Print what is known of assets'
 complete -c parvel -n __parvel_needs_command -f -a attributes -d 'What is kept on the files themselves'
+complete -c parvel -n __parvel_needs_command -f -a cover -d 'Write the cover image'
 complete -c parvel -n __parvel_needs_command -f -a match -d 'Tell whether two are the same'
 complete -c parvel -n __parvel_needs_command -f -a move -d 'Move assets to another place'
 complete -c parvel -n __parvel_needs_command -f -a rename -d 'Name PDF documents after their display names'
@@ -23,7 +24,7 @@ complete -c parvel -n __parvel_needs_command -l json -d 'Print the version as JS
 complete -c parvel -l log -x -a $levels -d 'Print log lines'
 complete -c parvel -s h -l help -d 'Print the options'
 
-for command in attributes check cloud inspect match move redact remove rename trash
+for command in attributes check cloud cover inspect match move redact remove rename trash
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l json -d 'Print one JSON array'
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l jsonl -d 'Print lines of JSON'
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l plist -d 'Print a property list'
@@ -48,6 +49,10 @@ complete -c parvel -n '__fish_seen_subcommand_from attributes' -l update -x -d '
 complete -c parvel -n '__fish_seen_subcommand_from attributes' -l dry-run -d 'Write nothing'
 complete -c parvel -n '__fish_seen_subcommand_from attributes' -l record -r -d 'Take the record from a file'
 complete -c parvel -n '__fish_seen_subcommand_from attributes' -s j -l jobs -x -d 'How many at once'
+
+complete -c parvel -n '__fish_seen_subcommand_from cover' -s o -l output -r -d 'Write to a file'
+complete -c parvel -n '__fish_seen_subcommand_from cover' -l size -x -d 'Scale to fit WxH'
+complete -c parvel -n '__fish_seen_subcommand_from cover' -l best -d 'Go on looking for an image'
 
 complete -c parvel -n '__fish_seen_subcommand_from inspect' -l cover -d 'Read the cover image too'
 complete -c parvel -n '__fish_seen_subcommand_from inspect' -l extra -r -d 'Lay entries over what is read'

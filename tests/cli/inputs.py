@@ -1,8 +1,11 @@
 """Makes the inputs of the cases (run_cases.py), each from one line:
 
     book NAME [FIELD=VALUE]...     a small book. Fields: title, author, subject, description, id,
-                                   producer; expanded=yes for a folder; damage=container|opf|
-                                   metadata|no-container|no-opf|zip for one that is broken there;
+                                   producer; cover=WxH for a real picture of that size in place of a few
+                                   words, as the cover by=item (if not said), property, guide, page,
+                                   spine or nothing; expanded=yes for a folder;
+                                   damage=container|opf|metadata|no-container|no-opf|zip for one
+                                   that is broken there;
                                    store='{JSON}' for its store metadata file
     pdf NAME [FIELD=VALUE]...      a small PDF document. Fields: author, subject, pages (1), turned;
                                    damage=cut for half of one, locked=yes for one with a password
@@ -24,8 +27,10 @@ import os
 import plistlib
 import shlex
 import shutil
+import struct
 import urllib.parse
 import zipfile
+import zlib
 from xml.sax.saxutils import escape
 
 CONTAINER = """<?xml version="1.0"?>
@@ -37,8 +42,16 @@ OPF = """<?xml version="1.0"?>
 <package xmlns="http://www.idpf.org/2007/opf" version="2.0" unique-identifier="uid">
 <metadata xmlns:dc="http://purl.org/dc/elements/1.1/">
 {fields}</metadata>
-<manifest><item id="cover" href="cover.png" media-type="image/png"/></manifest></package>
+<manifest>{manifest}</manifest>{behind}</package>
 """
+# What names the cover, in the manifest and behind it.
+NAMED = {"item": ('<item id="cover" href="cover.png" media-type="image/png"/>', ""),
+         "property": ('<item id="c" href="cover.png" properties="svg cover-image"/>', ""),
+         "guide": ("", '<guide><reference type="cover" href="cover.png"/></guide>'),
+         "page": ('<item id="cover" href="page.xhtml"/>', ""),
+         "spine": ('<item id="p" href="page.xhtml"/>', '<spine><itemref idref="p"/></spine>'),
+         "nothing": ("", "")}
+PAGE = '<html xmlns="http://www.w3.org/1999/xhtml"><body><img src="cover.png"/></body></html>'
 ELEMENTS = {"title": ("dc:title", ""), "author": ("dc:creator", ""), "subject": ("dc:subject", ""),
             "description": ("dc:description", ""), "id": ("dc:identifier", ' id="uid"'),
             "producer": ("dc:contributor", ' id="pvp"')}
@@ -57,12 +70,24 @@ def place(directory, name):
 def opf_of(fields):
     lines = "".join(f"<{tag}{attributes}>{escape(fields[name])}</{tag}>\n"
                     for name, (tag, attributes) in ELEMENTS.items() if name in fields)
-    text = OPF.format(fields=lines)
+    manifest, behind = NAMED[fields.get("by", "item")]
+    text = OPF.format(fields=lines, manifest=manifest, behind=behind)
     if fields.get("damage") == "opf":
         return text[:120]
     if fields.get("damage") == "metadata":
         return text.replace("metadata", "something")
     return text
+
+
+def picture(size):
+    """A PNG file in one colour."""
+    width, height = map(int, size.split("x"))
+    rows = (b"\0" + b"\x33\x66\xcc" * width) * height
+    chunks = [(b"IHDR", struct.pack(">IIBBBBB", width, height, 8, 2, 0, 0, 0)),
+              (b"IDAT", zlib.compress(rows)), (b"IEND", b"")]
+    return b"\x89PNG\r\n\x1a\n" + b"".join(
+        struct.pack(">I", len(content)) + kind + content +
+        struct.pack(">I", zlib.crc32(kind + content)) for kind, content in chunks)
 
 
 def members_of(fields):
@@ -72,7 +97,9 @@ def members_of(fields):
         members["META-INF/container.xml"] = "<broken" if damage == "container" else CONTAINER
     if damage != "no-opf":
         members["OPS/book.opf"] = opf_of(fields)
-    members["OPS/cover.png"] = "no real picture"
+    members["OPS/cover.png"] = picture(fields["cover"]) if "cover" in fields else "no real picture"
+    if fields.get("by") in ("page", "spine"):
+        members["OPS/page.xhtml"] = PAGE
     if "store" in fields:
         members["BazaarMetadata.plist"] = plistlib.dumps(json.loads(fields["store"])).decode()
     return members

@@ -15,12 +15,12 @@ InputMapping::InputMapping(int descriptor) {
     const auto size = static_cast<std::size_t>(status.st_size);
     void* bytes = ::mmap(nullptr, size, PROT_READ, MAP_PRIVATE, descriptor, 0);
     if (bytes != MAP_FAILED)
-        m_bytes = {static_cast<const std::uint8_t*>(bytes), size};
+        m_bytes = {static_cast<std::uint8_t*>(bytes), size};
 }
 
 InputMapping::~InputMapping() {
     if (!m_bytes.empty())
-        ::munmap(const_cast<std::uint8_t*>(m_bytes.data()), m_bytes.size());
+        ::munmap(m_bytes.data(), m_bytes.size());
 }
 
 }  // namespace parvel::reader

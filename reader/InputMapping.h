@@ -17,7 +17,7 @@ public:
     [[nodiscard]] std::span<const std::uint8_t> bytes() const { return m_bytes; }
 
 private:
-    std::span<const std::uint8_t> m_bytes;
+    std::span<std::uint8_t> m_bytes;
 };
 
 }  // namespace parvel::reader

@@ -1,7 +1,7 @@
 #include "cli/AssetChanges.h"
 #include "cli/Command.h"
 #include "cli/TransferAdvice.h"
-#include "parvel/platform/CloudStore.h"
+#include "parvel/platform/CloudReport.h"
 
 namespace parvel::cli {
 namespace {
@@ -44,8 +44,8 @@ void CloudCommand::checkOptions(std::string_view action) const {
         throw UsageError(std::string(action) + " takes no --replace");
 }
 
-/// The words of a downloading status, in results and for people.
-std::string_view wordsOf(DownloadingStatus status) {
+/// The name of a downloading status in results.
+std::string_view nameOf(DownloadingStatus status) {
     switch (status) {
         case DownloadingStatus::Current:
             return "current";
@@ -57,31 +57,38 @@ std::string_view wordsOf(DownloadingStatus status) {
     return {};
 }
 
+std::string_view wordsOf(std::optional<DownloadingStatus> status) {
+    if (!status)
+        return "status unknown";
+    return status == DownloadingStatus::NotDownloaded ? "not downloaded" : nameOf(*status);
+}
+
 void tellStatus(Result& result) {
-    const URL url = urlOfPath(result.path);
     result.needsRecord = false;
-    const std::optional<CloudRoot> root = cloudRootHolding(url, &result.error);
-    std::optional<DownloadingStatus> status;
-    const bool isKnown =
-        !result.error && CloudStore::host().downloadingStatus(url, status, &result.error);
-    const auto orNull = [&root](const std::string& text) { return root ? Value(text) : Value(); };
+    const std::optional<CloudReport> report =
+        cloudReportForURL(urlOfPath(result.path), &result.error);
+    const auto orNull = [&report](const std::string CloudReport::*text) {
+        return report && !((*report).*text).empty() ? Value((*report).*text) : Value();
+    };
+    const bool hasStatus = report && report->status;
     result.fields = {
-        {"isUbiquitous", isKnown || root ? Value(Number::boolean(root.has_value())) : Value()},
-        {"downloadingStatus", status ? Value(wordsOf(*status)) : Value()},
-        {"client", orNull(root ? root->client : "")},
-        {"root", orNull(root ? root->folder.path() : "")},
-        {"mark", orNull(root ? root->mark : "")}};
-    if (!isKnown)
+        {"isUbiquitous", report ? Value(Number::boolean(report->isUbiquitous)) : Value()},
+        {"downloadingStatus", hasStatus ? Value(nameOf(*report->status)) : Value()},
+        {"client", orNull(&CloudReport::client)},
+        {"root", orNull(&CloudReport::root)},
+        {"mark", orNull(&CloudReport::mark)},
+        {"reason", orNull(&CloudReport::reason)}};
+    if (result.error || !report)
         return;
-    if (!root) {
-        result.outcome = "in no synchronised storage: no folder above it has a sync client's mark";
+    if (!report->isUbiquitous) {
+        result.outcome = "in no synchronised storage: " + report->reason;
         return;
     }
-    const bool isHere = status != DownloadingStatus::NotDownloaded;
-    result.outcome = std::string(isHere ? "in synchronised storage, downloaded"
-                                        : "in synchronised storage, not downloaded") +
-                     ": " + root->client + " keeps " + root->folder.path() +
-                     " in step, by its mark \"" + root->mark + "\"";
+    result.outcome =
+        "in synchronised storage, " + std::string(wordsOf(report->status)) + ": " + report->client +
+        " keeps " + report->root + " in step, " +
+        (report->mark.empty() ? "as the desktop tells" : "by its mark \"" + report->mark + "\"") +
+        "; " + report->reason;
 }
 
 void CloudCommand::transfer(bool isInto, PVAssetMetadataFileManager& manager, const AssetPtr& asset,

@@ -1,28 +1,19 @@
 #pragma once
 
 #include <optional>
-#include <string>
 
 #include "parvel/foundation/ErrorOut.h"
-#include "parvel/foundation/PVExport.h"
 #include "parvel/foundation/URL.h"
+#include "parvel/platform/CloudReport.h"
 
 namespace parvel {
 
-/// What an item in cloud-synchronised storage has on this device.
-enum class DownloadingStatus { Current, Downloaded, NotDownloaded };
-
-/// A folder that a sync client keeps in step with other places.
-struct CloudRoot {
-    std::string client;  ///< the client's name
-    URL folder;
-    std::string mark;  ///< the name in the folder that tells
-};
-
-/// Cloud-synchronised storage, as far as the disk shows it: the marks of Nextcloud's client and of
-/// Syncthing in a folder above, and Nextcloud's placeholder files. No client is asked, so no item
-/// is known to be Current. All errors are those of makeServiceError.
-class PV_EXPORT CloudStore {
+/// Cloud-synchronised storage: the folders that Nextcloud's client or Syncthing have marked on the
+/// disk, and those that the desktop's other clients announce. A client is asked about an item only
+/// where its mark stands in a folder above, for at most a second; where it does not run, what the
+/// disk shows stands. The announced folders are asked for once in a minute, and tell of no single
+/// items. All errors are those of makeServiceError.
+class CloudStore {
 public:
     virtual ~CloudStore() = default;
 
@@ -30,25 +21,30 @@ public:
     /// it stands in can't be reached.
     [[nodiscard]] virtual std::optional<bool> isUbiquitous(const URL& url,
                                                            ErrorOut error = nullptr) = 0;
-    /// Whether the item, or what stands for it until it is downloaded, exists.
+    /// Whether the item exists, or what stands for it until it is downloaded, or its client lists
+    /// it for download.
     [[nodiscard]] virtual bool isPromisedItemReachable(const URL& url,
                                                        ErrorOut error = nullptr) = 0;
     /// False when the query fails, also for an item that is not reachable even as a promise. The
-    /// status is none for an item that is in no such storage.
+    /// status is none for an item that is in no such storage, and where its client gives no answer
+    /// or one that makes no sense.
     [[nodiscard]] virtual bool downloadingStatus(const URL& url,
                                                  std::optional<DownloadingStatus>& status,
                                                  ErrorOut error = nullptr) = 0;
     /// The file that stands for an item whose content is not on this device; none for any other
     /// item.
     [[nodiscard]] virtual std::optional<URL> placeholderFile(const URL& url) = 0;
+    /// Whether two items lie below the same root.
+    [[nodiscard]] virtual bool lieBelowOneRoot(const URL& left, const URL& right) = 0;
+    /// Has the client download an item that is not all on this device, and waits for it. True at
+    /// once for any other item. ETIMEDOUT, with nothing touched, where it is not here within a
+    /// minute, or no client is there to fetch it.
+    [[nodiscard]] virtual bool fetchContent(const URL& url, ErrorOut error = nullptr) = 0;
+    /// What cloudReportForURL gives.
+    [[nodiscard]] virtual std::optional<CloudReport> report(const URL& url,
+                                                            ErrorOut error = nullptr) = 0;
 
     static CloudStore& host();
 };
-
-/// The root of the synchronised storage that the item lies in; none where it lies in no such
-/// storage. None with an error of makeServiceError when the folder that it stands in can't be
-/// reached.
-[[nodiscard]] PV_EXPORT std::optional<CloudRoot> cloudRootHolding(const URL& url,
-                                                                  ErrorOut error = nullptr);
 
 }  // namespace parvel

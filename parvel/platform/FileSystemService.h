@@ -17,35 +17,40 @@ enum class ReplaceOptions {
 };
 
 /// The host's file operations on whole items, files and folders alike. A symbolic link is an item
-/// of its own. A caller of the file manager can give it another. All errors are those of
-/// makeServiceError. After a failure each item is whole at its old place or whole at its new one,
-/// and nothing half-made has a final name.
+/// of its own. A caller of the file manager can give it another. What is not all on this device is
+/// downloaded before it is copied, trashed or taken out of its synchronised folder; ETIMEDOUT, with
+/// the item's URL and nothing touched, where it is not here within a minute. All errors are those
+/// of makeServiceError. After a failure each item is whole at its old place or whole at its new
+/// one, and nothing half-made has a final name.
 class PV_EXPORT FileSystemService {
 public:
     virtual ~FileSystemService() = default;
 
-    /// Whether anything stands at the path, a dangling link included.
+    /// Whether anything stands at the path, a dangling link included, or a sync client's
+    /// placeholder for an item of that name.
     [[nodiscard]] virtual bool itemExistsAtPath(const std::string& path) = 0;
     /// Renames, or copies across file systems (synced before the source goes). Fails where anything
     /// stands at the destination, also against a competitor in the same instant. Within one trash
-    /// folder the item's info file follows; it goes when the item leaves the trash.
+    /// folder the item's info file follows; it goes when the item leaves the trash. Within one
+    /// synchronised folder what stands for an item is renamed with no download.
     virtual bool moveItem(const URL& source, const URL& destination, ErrorOut error = nullptr) = 0;
     /// Puts the replacement at the existing item's place in one atomic step and removes the old
     /// item; moves it there when nothing stands there. The resulting URL is the existing item's.
+    /// An existing item that is not on this device is downloaded before.
     virtual bool replaceItem(const URL& existing, const URL& replacement, ReplaceOptions options,
                              std::optional<URL>* resulting = nullptr, ErrorOut error = nullptr) = 0;
     /// Copies data, attributes, mode and times; the copy appears whole or not at all. Fails where
     /// anything stands at the destination.
     virtual bool copyItem(const URL& source, const URL& destination, ErrorOut error = nullptr) = 0;
-    /// Removes a file, a link or a whole folder; links are not followed.
+    /// Removes a file, a link or a whole folder; links are not followed. What stands for an item
+    /// that is not on this device goes without a download.
     virtual bool removeItem(const URL& item, ErrorOut error = nullptr) = 0;
     /// Moves the item to the user's trash (freedesktop.org Trash specification 1.0): the home
     /// trash, or its volume's own. `resulting` is its place there.
     virtual bool trashItem(const URL& item, std::optional<URL>* resulting,
                            ErrorOut error = nullptr) = 0;
     /// Moves a local item into synchronised storage (true), where the destination must lie, or a
-    /// synchronised one out of it (false). ENOTSUP where the destination lies in no such storage;
-    /// ETIMEDOUT, with nothing touched, where the item's content is not on this device.
+    /// synchronised one out of it (false). ENOTSUP where the destination lies in no such storage.
     virtual bool setUbiquitous(bool ubiquitous, const URL& item, const URL& destination,
                                ErrorOut error = nullptr) = 0;
 

@@ -6,12 +6,12 @@
 #include "parvel/inspection/PVAssetMetadataInspector.h"
 #include "parvel/metadata/PVAssetMetadataKeys.h"
 #include "parvel/metadata/PVMutableAssetMetadata.h"
-#include "parvel/platform/CloudStore.h"
 #include "parvel/platform/DateText.h"
 #include "parvel/platform/Service.h"
 #include "parvel/xattr/PNMetadataXattr.h"
 #include "tests/support/AttributeFolder.h"
 #include "tests/support/EpubBuilder.h"
+#include "tests/support/ForwardingCloudStore.h"
 #include "tests/support/RecordedLog.h"
 #include "tests/support/Records.h"
 
@@ -152,28 +152,16 @@ TEST_F(AttributeRecord, OfABookThatIsNotDownloadedIsThePlaceholders) {
 }
 
 /// Synchronised storage that answers as it is told.
-class ToldCloudStore : public CloudStore {
+class ToldCloudStore : public ForwardingCloudStore {
 public:
-    std::optional<bool> isUbiquitous(const URL& url, ErrorOut error) override {
-        return host().isUbiquitous(url, error);
-    }
-    bool isPromisedItemReachable(const URL& url, ErrorOut error) override {
-        return host().isPromisedItemReachable(url, error);
-    }
     bool downloadingStatus(const URL& url, std::optional<DownloadingStatus>& status,
                            ErrorOut error) override {
         status = m_status;
         return m_statusIsKnown || fail(error, makePOSIXError(EIO, url));
     }
-    std::optional<URL> placeholderFile(const URL& url) override {
-        return host().placeholderFile(url);
-    }
 
     std::optional<DownloadingStatus> m_status;
     bool m_statusIsKnown = true;
-
-private:
-    Service<CloudStore>::Replacement m_replacement{*this};
 };
 
 class ImmediatelyAvailable : public AttributeRecord {

@@ -13,6 +13,8 @@ LOWER = {
     "parvel/foundation": {"parvel/platform"},
     "parvel/platform": {"parvel/foundation"},
     "parvel/platform/linux": {"parvel/foundation", "parvel/platform"},
+    "parvel/platform/linux/cloud": {"parvel/foundation", "parvel/platform",
+                                    "parvel/platform/linux"},
     "parvel/metadata": {"parvel/foundation", "parvel/platform"},
     "parvel/xattr": {"parvel/metadata", "parvel/foundation", "parvel/platform"},
     "parvel/inspection": {"parvel/xattr", "parvel/metadata", "parvel/foundation",
@@ -34,7 +36,7 @@ BACK = {
 }
 
 # Only these layers may include headers of the system and of other libraries.
-HOSTED = {"parvel/platform/linux", "cli", "reader", "reader/images"}
+HOSTED = {"parvel/platform/linux", "parvel/platform/linux/cloud", "cli", "reader", "reader/images"}
 
 INCLUDE = re.compile(r'^\s*#\s*include\s*(["<])([^">]+)[">]', re.MULTILINE)
 # C++'s own headers have no extension; C's come under their C++ names.

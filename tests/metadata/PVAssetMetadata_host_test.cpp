@@ -3,9 +3,9 @@
 #include <gtest/gtest.h>
 
 #include "parvel/metadata/PVAssetMetadata.h"
-#include "parvel/platform/CloudStore.h"
 #include "parvel/platform/ResourceQueries.h"
 #include "parvel/platform/Service.h"
+#include "tests/support/ForwardingCloudStore.h"
 #include "tests/support/RecordedLog.h"
 #include "tests/support/Records.h"
 
@@ -22,7 +22,7 @@ MutableAssetPtr libraryAsset(std::string_view name) {
 
 // Cloud-synchronised storage.
 
-class AnsweringCloudStore : public CloudStore {
+class AnsweringCloudStore : public ForwardingCloudStore {
 public:
     std::optional<bool> ubiquitous;
     std::optional<Error> failure;
@@ -33,17 +33,11 @@ public:
         assign(error, failure);
         return ubiquitous;
     }
-    bool isPromisedItemReachable(const URL&, ErrorOut) override { return false; }
-    bool downloadingStatus(const URL&, std::optional<DownloadingStatus>&, ErrorOut) override {
-        return false;
-    }
-    std::optional<URL> placeholderFile(const URL&) override { return std::nullopt; }
 };
 
 class RecordInCloud : public ::testing::Test {
 protected:
     AnsweringCloudStore m_store;
-    Service<CloudStore>::Replacement m_replacement{m_store};
     RecordedLog m_log;
 };
 

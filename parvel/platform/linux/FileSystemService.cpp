@@ -35,11 +35,17 @@ public:
     }
 };
 
-/// Moving a file that only stands for a book does not move the book.
-bool isNotDownloaded(const URL& item) {
-    std::optional<DownloadingStatus> status;
-    return Service<CloudStore>::current().downloadingStatus(item, status) &&
-           status == DownloadingStatus::NotDownloaded;
+CloudStore& cloud() {
+    return Service<CloudStore>::current();
+}
+
+/// Moving what only stands for a book out of its root does not move the book, so that it has to be
+/// here before.
+bool fetchBeforeLeaving(const URL& item, const URL& destination, ErrorOut error) {
+    if (host::parentFolderOf(item.path()) == host::parentFolderOf(destination.path()) ||
+        cloud().lieBelowOneRoot(item, destination))
+        return true;
+    return cloud().fetchContent(item, error);
 }
 
 class LinuxFileSystemService : public FileSystemService {
@@ -47,15 +53,24 @@ public:
     explicit LinuxFileSystemService(std::shared_ptr<host::ItemOperations> items)
         : m_items(std::move(items)) {}
 
-    bool itemExistsAtPath(const std::string& path) override { return m_items->itemStandsAt(path); }
+    bool itemExistsAtPath(const std::string& path) override {
+        return m_items->itemStandsAt(path) ||
+               cloud().placeholderFile(URL::fileURLWithPath(path)).has_value();
+    }
 
     bool moveItem(const URL& source, const URL& destination, ErrorOut error) override {
-        const int failure = m_items->move(source.path(), destination.path());
+        if (!fetchBeforeLeaving(source, destination, error))
+            return false;
+        const int failure =
+            cloud().placeholderFile(destination) ? EEXIST : moveOrPlaceholder(source, destination);
         return failure == 0 || fail(error, makeTransferError(failure, source, destination));
     }
 
     bool replaceItem(const URL& existing, const URL& replacement, ReplaceOptions options,
                      std::optional<URL>* resulting, ErrorOut error) override {
+        if (!fetchBeforeLeaving(replacement, existing, error) ||
+            (cloud().placeholderFile(existing) && !cloud().fetchContent(existing, error)))
+            return false;
         const int failure = m_items->replace(existing.path(), replacement.path(), options);
         if (failure != 0)
             return fail(error, makeTransferError(failure, replacement, existing));
@@ -65,6 +80,8 @@ public:
     }
 
     bool copyItem(const URL& source, const URL& destination, ErrorOut error) override {
+        if (!cloud().fetchContent(source, error))
+            return false;
         const int failure = m_items->copy(source.path(), destination.path());
         return failure == 0 || fail(error, makeTransferError(failure, source, destination));
     }
@@ -73,15 +90,15 @@ public:
         int failure = m_items->remove(item.path());
         // What stands for an item that is not on this device goes without a download.
         if (failure == ENOENT) {
-            if (const auto placeholder = Service<CloudStore>::current().placeholderFile(item))
+            if (const auto placeholder = cloud().placeholderFile(item))
                 failure = m_items->remove(placeholder->path());
         }
         return failure == 0 || fail(error, makeServiceError(failure, item));
     }
 
     bool trashItem(const URL& item, std::optional<URL>* resulting, ErrorOut error) override {
-        if (isNotDownloaded(item))
-            return fail(error, makePOSIXError(ETIMEDOUT, item));
+        if (!cloud().fetchContent(item, error))
+            return false;
         std::string place;
         const int failure = m_items->trash(item.path(), place);
         if (failure != 0)
@@ -93,14 +110,27 @@ public:
 
     bool setUbiquitous(bool ubiquitous, const URL& item, const URL& destination,
                        ErrorOut error) override {
-        if (ubiquitous && !Service<CloudStore>::current().isUbiquitous(destination).value_or(false))
+        if (ubiquitous && !cloud().isUbiquitous(destination).value_or(false))
             return fail(error, makePOSIXError(ENOTSUP, destination));
-        if (!ubiquitous && isNotDownloaded(item))
-            return fail(error, makePOSIXError(ETIMEDOUT, item));
+        if (!ubiquitous && !cloud().fetchContent(item, error))
+            return false;
         return moveItem(item, destination, error);
     }
 
 private:
+    /// A placeholder that stays below its root is renamed in the item's place, which makes the
+    /// client rename the book.
+    [[nodiscard]] int moveOrPlaceholder(const URL& source, const URL& destination) {
+        const int failure = m_items->move(source.path(), destination.path());
+        const auto placeholder = failure == ENOENT ? cloud().placeholderFile(source) : std::nullopt;
+        if (!placeholder || !cloud().lieBelowOneRoot(source, destination))
+            return failure;
+        if (m_items->itemStandsAt(destination.path()))
+            return EEXIST;
+        return m_items->move(placeholder->path(),
+                             destination.path() + placeholder->path().substr(source.path().size()));
+    }
+
     /// Which of the two items a failed move or copy is about: the source where that is missing, the
     /// destination where the new item can't be made.
     [[nodiscard]] Error makeTransferError(int errnoValue, const URL& source,

@@ -8,6 +8,7 @@
 #include <cerrno>
 #include <string>
 
+#include "parvel/platform/CloudStore.h"
 #include "parvel/platform/DirectoryEnumerator.h"
 #include "parvel/platform/Service.h"
 #include "parvel/platform/XattrStore.h"
@@ -170,6 +171,39 @@ private:
     DirectoryEnumerator& m_enumerator;
 };
 
+/// Has nothing downloaded, and takes it that it would not come.
+class RehearsedCloudStore : public CloudStore {
+public:
+    std::optional<bool> isUbiquitous(const URL& url, ErrorOut error) override {
+        return m_store.isUbiquitous(url, error);
+    }
+    bool isPromisedItemReachable(const URL& url, ErrorOut error) override {
+        return m_store.isPromisedItemReachable(url, error);
+    }
+    bool downloadingStatus(const URL& url, std::optional<DownloadingStatus>& status,
+                           ErrorOut error) override {
+        return m_store.downloadingStatus(url, status, error);
+    }
+    std::optional<URL> placeholderFile(const URL& url) override {
+        return m_store.placeholderFile(url);
+    }
+    bool lieBelowOneRoot(const URL& left, const URL& right) override {
+        return m_store.lieBelowOneRoot(left, right);
+    }
+    bool fetchContent(const URL& url, ErrorOut error) override {
+        std::optional<DownloadingStatus> status;
+        const bool isNeeded =
+            m_store.downloadingStatus(url, status) && status == DownloadingStatus::NotDownloaded;
+        return !isNeeded || fail(error, makePOSIXError(ETIMEDOUT, url));
+    }
+    std::optional<CloudReport> report(const URL& url, ErrorOut error) override {
+        return m_store.report(url, error);
+    }
+
+private:
+    CloudStore& m_store = Service<CloudStore>::current();
+};
+
 }  // namespace
 
 struct Rehearsal::Services {
@@ -179,8 +213,10 @@ struct Rehearsal::Services {
     RehearsedAttributes attributes{disk};
     RehearsedEnumerator enumerator{disk};
     host::RehearsedContent content{disk};
+    RehearsedCloudStore cloud;
     Service<XattrStore>::Replacement attributesInForce{attributes};
     Service<DirectoryEnumerator>::Replacement enumeratorInForce{enumerator};
+    Service<CloudStore>::Replacement cloudInForce{cloud};
 };
 
 Rehearsal::Rehearsal() : m_services(std::make_unique<Services>()) {}

@@ -1,0 +1,24 @@
+#pragma once
+
+#include <sys/socket.h>
+
+#include <optional>
+#include <string>
+
+namespace parvel::host {
+
+/// What Syncthing's configuration says of one of its folders, and where its REST interface is.
+struct SyncthingFolder {
+    std::string id;
+    /// Of the loopback interface; length 0 where the interface is off, is only to be had with TLS
+    /// or at an address that other machines share.
+    sockaddr_storage address{};
+    socklen_t addressLength = 0;
+    std::string apiKey;
+};
+
+/// The folder with that root in the configuration of this user's Syncthing. None where there is no
+/// configuration, or none that holds such a folder.
+[[nodiscard]] std::optional<SyncthingFolder> syncthingFolderAt(const std::string& root);
+
+}  // namespace parvel::host

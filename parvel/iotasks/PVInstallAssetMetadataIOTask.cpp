@@ -18,7 +18,7 @@ namespace parvel {
 
 namespace {
 
-std::optional<URL> urlOf(const AssetPtr& asset) {
+std::optional<URL> recordURL(const AssetPtr& asset) {
     return asset ? asset->url() : std::nullopt;
 }
 
@@ -69,8 +69,8 @@ AssetPtr PVInstallAssetMetadataIOTask::executeWithTargetDirectory_error(
                                                     stagingDirectory, slot.out())
                                               : sourceMetadata();
     if (!staged) {
-        PVParvelLog().error("Failed copy. source: %@ target: %@ error: %@", urlOf(sourceMetadata()),
-                            directory, slot.value());
+        PVParvelLog().error("Failed copy. source: %@ target: %@ error: %@",
+                            recordURL(sourceMetadata()), directory, slot.value());
         return nullptr;
     }
 
@@ -98,7 +98,7 @@ std::optional<URL> PVInstallAssetMetadataIOTask::_subtaskTargetDirectoryWithInst
                        installDirectory.has_value(), m_temporaryDirectory.has_value());
     const std::optional<URL>& staging =
         m_temporaryDirectory ? m_temporaryDirectory : installDirectory;
-    const std::optional<URL> source = urlOf(sourceMetadata());
+    const std::optional<URL> source = recordURL(sourceMetadata());
     // Deliberate: such a source has no candidate; clearing it would delete the directory itself.
     if (source && !hasOwnName(*source))
         return std::nullopt;
@@ -148,7 +148,7 @@ AssetPtr PVInstallAssetMetadataIOTask::place(const AssetPtr& asset,
 // Deliberate: without a copy this deletes the source.
 void PVInstallAssetMetadataIOTask::cleanUp(const AssetPtr& asset,
                                            const std::optional<Error>& moveError) {
-    const std::optional<URL> url = urlOf(asset);
+    const std::optional<URL> url = recordURL(asset);
     PVParvelLog().error("Failed move -- Cleaning Up: %@ error: %@", url, moveError);
     std::optional<Error> removalError;
     if (url && manager()->fileManager()->removeItem(*url, &removalError))

@@ -28,10 +28,10 @@ inline constexpr bool conformsTo<Array, testing::Countable> = true;
 namespace parvel::testing {
 namespace {
 
-struct Shape {
-    virtual ~Shape() = default;
+struct Figure {
+    virtual ~Figure() = default;
 };
-struct Sheet : Shape, Readable {};
+struct Sheet : Figure, Readable {};
 struct Book : Sheet, Countable {};
 struct Untested {
     virtual ~Untested() = default;
@@ -77,22 +77,22 @@ TEST(PVDynamicCast, TakesTheFourKindsOfNumberForOne) {
 }
 
 TEST(PVDynamicCast, GivesTheSameObjectForASubclass) {
-    const std::shared_ptr<Shape> shape = std::make_shared<Book>();
+    const std::shared_ptr<Figure> shape = std::make_shared<Book>();
     const std::shared_ptr<Sheet> sheet = PVDynamicCast(classOf<Sheet>, shape);
 
     EXPECT_EQ(sheet, shape);
     EXPECT_EQ(PVDynamicCast(classOf<Book>, shape), shape);
-    EXPECT_EQ(PVDynamicCast(classOf<Shape>, shape), shape);
+    EXPECT_EQ(PVDynamicCast(classOf<Figure>, shape), shape);
 }
 
 TEST(PVDynamicCast, GivesNullForASuperclass) {
-    const std::shared_ptr<Shape> shape = std::make_shared<Sheet>();
+    const std::shared_ptr<Figure> shape = std::make_shared<Sheet>();
 
     EXPECT_EQ(PVDynamicCast(classOf<Book>, shape), nullptr);
 }
 
 TEST(PVDynamicCast, KeepsAConstObjectConst) {
-    const std::shared_ptr<const Shape> shape = std::make_shared<const Book>();
+    const std::shared_ptr<const Figure> shape = std::make_shared<const Book>();
     const std::shared_ptr<const Book> book = PVDynamicCast(classOf<Book>, shape);
 
     EXPECT_EQ(book, shape);
@@ -100,10 +100,10 @@ TEST(PVDynamicCast, KeepsAConstObjectConst) {
 
 TEST(PVDynamicCast, GivesNullForNull) {
     const Value* value = nullptr;
-    const std::shared_ptr<Shape> shape;
+    const std::shared_ptr<Figure> shape;
 
     EXPECT_EQ(PVDynamicCast(classOf<String>, value), nullptr);
-    EXPECT_EQ(PVDynamicCast(classOf<Shape>, shape), nullptr);
+    EXPECT_EQ(PVDynamicCast(classOf<Figure>, shape), nullptr);
 }
 
 TEST(PVProtocolCast, GivesTheValueWhereItsKindConforms) {
@@ -120,8 +120,8 @@ TEST(PVProtocolCast, GivesNullForEveryKindThatDoesNotConform) {
 }
 
 TEST(PVProtocolCast, GivesTheSameObjectWhereItConforms) {
-    const std::shared_ptr<Shape> book = std::make_shared<Book>();
-    const std::shared_ptr<const Shape> sheet = std::make_shared<const Sheet>();
+    const std::shared_ptr<Figure> book = std::make_shared<Book>();
+    const std::shared_ptr<const Figure> sheet = std::make_shared<const Sheet>();
 
     EXPECT_EQ(PVProtocolCast(protocolOf<Countable>, book), book);
     EXPECT_EQ(PVProtocolCast(protocolOf<Readable>, sheet), sheet);
@@ -130,14 +130,14 @@ TEST(PVProtocolCast, GivesTheSameObjectWhereItConforms) {
 
 TEST(PVProtocolCast, GivesNullForNull) {
     const Value* value = nullptr;
-    const std::shared_ptr<Shape> shape;
+    const std::shared_ptr<Figure> shape;
 
     EXPECT_EQ(PVProtocolCast(protocolOf<Readable>, value), nullptr);
     EXPECT_EQ(PVProtocolCast(protocolOf<Readable>, shape), nullptr);
 }
 
 TEST(PVClassAndProtocolCast, WithACountOf0IsTheClassTestAlone) {
-    const std::shared_ptr<Shape> sheet = std::make_shared<Sheet>();
+    const std::shared_ptr<Figure> sheet = std::make_shared<Sheet>();
 
     EXPECT_EQ(PVClassAndProtocolCast(&kText, classOf<String>, 0), kText.as<String>());
     EXPECT_EQ(PVClassAndProtocolCast(&kText, classOf<String>, 0, protocolOf<Untested>),
@@ -170,7 +170,7 @@ TEST(PVClassAndProtocolCast, WantsTheClassToo) {
 }
 
 TEST(PVClassAndProtocolCast, GivesTheSameObjectOfASubclass) {
-    const std::shared_ptr<const Shape> book = std::make_shared<const Book>();
+    const std::shared_ptr<const Figure> book = std::make_shared<const Book>();
     const std::shared_ptr<const Sheet> cast = PVClassAndProtocolCast(
         book, classOf<Sheet>, 2, protocolOf<Readable>, protocolOf<Countable>);
 
@@ -180,10 +180,10 @@ TEST(PVClassAndProtocolCast, GivesTheSameObjectOfASubclass) {
 
 TEST(PVClassAndProtocolCast, GivesNullForNull) {
     const Value* value = nullptr;
-    const std::shared_ptr<Shape> shape;
+    const std::shared_ptr<Figure> shape;
 
     EXPECT_EQ(PVClassAndProtocolCast(value, classOf<String>, 0), nullptr);
-    EXPECT_EQ(PVClassAndProtocolCast(shape, classOf<Shape>, 1, protocolOf<Readable>), nullptr);
+    EXPECT_EQ(PVClassAndProtocolCast(shape, classOf<Figure>, 1, protocolOf<Readable>), nullptr);
 }
 
 TEST(PVRefTypeCast, WantsTheValuesOwnKind) {
@@ -194,11 +194,11 @@ TEST(PVRefTypeCast, WantsTheValuesOwnKind) {
 }
 
 TEST(PVRefTypeCast, WantsTheObjectsExactClass) {
-    const std::shared_ptr<Shape> book = std::make_shared<Book>();
+    const std::shared_ptr<Figure> book = std::make_shared<Book>();
 
     EXPECT_EQ(PVRefTypeCast(typeid(Book), book), book);
     EXPECT_EQ(PVRefTypeCast(typeid(Sheet), book), nullptr);
-    EXPECT_EQ(PVRefTypeCast(typeid(Shape), std::shared_ptr<Shape>()), nullptr);
+    EXPECT_EQ(PVRefTypeCast(typeid(Figure), std::shared_ptr<Figure>()), nullptr);
 }
 
 }  // namespace

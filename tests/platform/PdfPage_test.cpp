@@ -3,16 +3,12 @@
 #include <algorithm>
 
 #include "parvel/platform/PdfDocument.h"
+#include "tests/support/Colours.h"
 #include "tests/support/PdfBuilder.h"
 #include "tests/support/TemporaryDirectory.h"
 
 namespace parvel::testing {
 namespace {
-
-constexpr std::uint32_t white = 0xFFFFFFFF;
-constexpr std::uint32_t red = 0xFFFF0000;
-constexpr std::uint32_t green = 0xFF00FF00;
-constexpr std::uint32_t blue = 0xFF0000FF;
 
 /// A red square in the lower left corner of a box, a green one in the lower right, a blue one in
 /// the upper left.

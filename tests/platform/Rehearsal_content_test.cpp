@@ -17,7 +17,7 @@ namespace {
 namespace fs = std::filesystem;
 
 /// What came of one operation: its record, its error and its log.
-struct Outcome {
+struct RehearsedOutcome {
     std::optional<Value> record;
     std::optional<Error> error;
     std::vector<std::string> log;
@@ -41,8 +41,9 @@ protected:
         return state;
     }
 
-    Outcome made(const std::shared_ptr<PVAssetMetadataFileManager>& manager, const Change& change) {
-        Outcome outcome;
+    RehearsedOutcome made(const std::shared_ptr<PVAssetMetadataFileManager>& manager,
+                          const Change& change) {
+        RehearsedOutcome outcome;
         RecordedLog log;
         const auto staging = StagingDirectory::makeIn(m_folder.url("library"), &outcome.error);
         if (!staging)
@@ -60,9 +61,9 @@ protected:
     }
 
     /// Holds the rehearsal to the change, and the disk to what it was after the rehearsal.
-    Outcome expectForeseen(const Change& change) {
+    RehearsedOutcome expectForeseen(const Change& change) {
         const auto before = disk();
-        Outcome rehearsed;
+        RehearsedOutcome rehearsed;
         {
             const Rehearsal rehearsal;
             const auto manager =
@@ -71,7 +72,7 @@ protected:
             rehearsed = made(manager, change);
         }
         EXPECT_EQ(disk(), before);
-        Outcome real = made(PVAssetMetadataFileManager::init(), change);
+        RehearsedOutcome real = made(PVAssetMetadataFileManager::init(), change);
         EXPECT_EQ(rehearsed.record, real.record);
         EXPECT_EQ(rehearsed.error.has_value(), real.error.has_value());
         if (rehearsed.error && real.error) {
@@ -112,7 +113,7 @@ protected:
 };
 
 TEST_F(RehearsedChanges, AnEditOfAZippedBookIsForeseen) {
-    const Outcome real = expectForeseen(
+    const RehearsedOutcome real = expectForeseen(
         edit(zippedBook(), {{"itemName", "New"}, {"PVCoverImageData", Data::copyOf("my cover")}}));
 
     ASSERT_TRUE(real.record);
@@ -126,7 +127,8 @@ TEST_F(RehearsedChanges, ARestoredCoverIsForeseen) {
                             .file("BazaarArtwork-original", "first cover")
                             .expand(m_folder / "library/a.epub");
 
-    const Outcome real = expectForeseen(edit(inspected(package), {{"PVCoverImageData", Value()}}));
+    const RehearsedOutcome real =
+        expectForeseen(edit(inspected(package), {{"PVCoverImageData", Value()}}));
 
     ASSERT_TRUE(real.record);
     EXPECT_EQ(valueOf(real.record->as<Dictionary>()->find("PVCoverImageData")),
@@ -171,7 +173,7 @@ TEST_F(RehearsedChanges, AnInstallOverATakenNameIsForeseen) {
     const AssetPtr book = inspected(EpubBuilder{}.expand(m_folder / "new.epub"));
     m_folder.write("library/new.epub", "taken");
 
-    const Outcome real = expectForeseen(install(book, /*copies=*/true));
+    const RehearsedOutcome real = expectForeseen(install(book, /*copies=*/true));
 
     EXPECT_FALSE(real.record);
     ASSERT_TRUE(real.error);

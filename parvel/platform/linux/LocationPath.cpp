@@ -13,7 +13,7 @@ namespace {
 constexpr std::size_t kMaximumSteps = 16;
 constexpr std::size_t kMaximumPredicates = 4;
 
-bool isLetter(char c) {
+bool isNameStart(char c) {
     return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || c == '_';
 }
 
@@ -23,7 +23,7 @@ bool isAscii(char c) {
 
 /// A name without a colon, of the characters that every edition of XML allows.
 bool isPlainName(std::string_view name) {
-    return !name.empty() && isLetter(name[0]) && name.find(':') == std::string_view::npos &&
+    return !name.empty() && isNameStart(name[0]) && name.find(':') == std::string_view::npos &&
            std::all_of(name.begin(), name.end(), isAscii);
 }
 

@@ -51,7 +51,7 @@ int digitValue(char digit) {
 }
 
 /// What is no escape stays as it is: not every program escapes as it should.
-std::string percentDecoded(std::string_view text) {
+std::string decodedPath(std::string_view text) {
     std::string path;
     for (std::size_t at = 0; at < text.size(); ++at) {
         const bool isEscape = text[at] == '%' && at + 2 < text.size();
@@ -145,7 +145,7 @@ std::optional<TrashInfo> readTrashInfo(const std::string& file, const TrashFolde
         const std::string_view line = cutLine(rest);
         // The first of several counts.
         if (line.starts_with(kPathKey) && path.empty())
-            path = percentDecoded(line.substr(kPathKey.size()));
+            path = decodedPath(line.substr(kPathKey.size()));
         else if (line.starts_with(kDateKey) && info.deletionDate.empty())
             info.deletionDate = line.substr(kDateKey.size());
         else if (line == kOwnLine)

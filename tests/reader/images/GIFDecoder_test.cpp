@@ -5,6 +5,7 @@
 
 #include "tests/reader/images/DecodedImage.h"
 #include "tests/reader/images/GIFSamples.h"
+#include "tests/support/Colours.h"
 
 namespace parvel::testing {
 namespace {
@@ -12,11 +13,6 @@ namespace {
 using namespace std::string_literals;
 using ::testing::Each;
 using ::testing::ElementsAre;
-
-constexpr std::uint32_t red = 0xFFFF0000;
-constexpr std::uint32_t green = 0xFF00FF00;
-constexpr std::uint32_t blue = 0xFF0000FF;
-constexpr std::uint32_t white = 0xFFFFFFFF;
 
 TEST(GIFDecoder, ReadsColours) {
     const auto image = decoded(GIFSample{}.bytes());

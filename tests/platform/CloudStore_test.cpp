@@ -178,40 +178,58 @@ TEST_F(CloudStoreTest, AnExistingOrMissingItemHasNoPlaceholder) {
     EXPECT_EQ(m_store.placeholderFile(m_folder.url("b.epub")), std::nullopt);
 }
 
-TEST_F(CloudStoreTest, TheRootIsTheFirstMarkedFolderAbove) {
+TEST_F(CloudStoreTest, TheReportNamesTheFirstMarkedFolderAbove) {
     m_folder.write("root/.stfolder/x", "");
     m_folder.write(std::string("root/inner/") + nextcloudJournal, "");
+    m_folder.write("root/inner/a.epub", "");
 
-    const auto inner = cloudRootHolding(m_folder.url("root/inner/books.epub"), &m_error);
-    const auto outer = cloudRootHolding(m_folder.url("root/inner"), &m_error);
+    const auto inner = cloudReportForURL(m_folder.url("root/inner/a.epub"), &m_error);
+    const auto outer = cloudReportForURL(m_folder.url("root/inner"), &m_error);
 
     ASSERT_TRUE(inner && outer);
+    EXPECT_FALSE(m_error);
     EXPECT_EQ(inner->client, "Nextcloud");
-    EXPECT_EQ(inner->folder, m_folder.url("root/inner"));
+    EXPECT_EQ(inner->root, m_folder / "root/inner");
     EXPECT_EQ(inner->mark, nextcloudJournal);
     EXPECT_EQ(outer->client, "Syncthing");
-    EXPECT_EQ(outer->folder, m_folder.url("root"));
+    EXPECT_EQ(outer->root, m_folder / "root");
     EXPECT_EQ(outer->mark, ".stfolder");
 }
 
-TEST_F(CloudStoreTest, TheRootIsNamedByItsOwnPathWhereALinkLeadsIntoIt) {
+TEST_F(CloudStoreTest, TheReportNamesTheRootByItsOwnPathWhereALinkLeadsIntoIt) {
     m_folder.write("root/.stfolder/x", "");
-    m_folder.write("root/books/x", "");
+    m_folder.write("root/books/a.epub", "");
     std::filesystem::create_symlink("root/books", m_folder / "books");
 
-    const auto root = cloudRootHolding(m_folder.url("books/a.epub"), &m_error);
+    const auto report = cloudReportForURL(m_folder.url("books/a.epub"), &m_error);
 
-    ASSERT_TRUE(root);
-    EXPECT_EQ(root->folder, m_folder.url("root"));
+    ASSERT_TRUE(report);
+    EXPECT_EQ(report->root, m_folder / "root");
 }
 
-TEST_F(CloudStoreTest, APlainFolderHasNoRoot) {
-    EXPECT_FALSE(cloudRootHolding(m_folder.url("a.epub"), &m_error));
+TEST_F(CloudStoreTest, TheReportOfAPlainFolderHasNoRoot) {
+    m_folder.write("a.epub", "");
+
+    const auto report = cloudReportForURL(m_folder.url("a.epub"), &m_error);
+
+    ASSERT_TRUE(report);
     EXPECT_FALSE(m_error);
+    EXPECT_FALSE(report->isUbiquitous);
+    EXPECT_EQ(report->root, "");
 }
 
-TEST_F(CloudStoreTest, TheRootOfAnUnreachableFolderIsNotKnown) {
-    EXPECT_FALSE(cloudRootHolding(m_folder.url("absent/a.epub"), &m_error));
+TEST_F(CloudStoreTest, AMissingItemsReportHasAnErrorBesideIt) {
+    m_folder.write("root/.stfolder/x", "");
+
+    const auto report = cloudReportForURL(m_folder.url("root/a.epub"), &m_error);
+
+    ASSERT_TRUE(report);
+    EXPECT_TRUE(report->isUbiquitous);
+    expectNoSuchFile(m_folder.url("root/a.epub"));
+}
+
+TEST_F(CloudStoreTest, ThereIsNoReportOfAnUnreachableFolder) {
+    EXPECT_FALSE(cloudReportForURL(m_folder.url("absent/a.epub"), &m_error));
 
     expectNoSuchFile(m_folder.url("absent/a.epub"));
 }

@@ -46,12 +46,16 @@ std::unique_ptr<Command> makeAttributesCommand();
 std::unique_ptr<Command> makeCheckCommand();
 std::unique_ptr<Command> makeCloudCommand();
 std::unique_ptr<Command> makeCoverCommand();
+std::unique_ptr<Command> makeEditCommand();
+std::unique_ptr<Command> makeInflateCommand();
 std::unique_ptr<Command> makeInspectCommand();
+std::unique_ptr<Command> makeInstallCommand();
 std::unique_ptr<Command> makeMatchCommand();
 std::unique_ptr<Command> makeMoveCommand();
 std::unique_ptr<Command> makeRedactCommand();
 std::unique_ptr<Command> makeRemoveCommand();
 std::unique_ptr<Command> makeRenameCommand();
 std::unique_ptr<Command> makeTrashCommand();
+std::unique_ptr<Command> makeUpdateCommand();
 
 }  // namespace parvel::cli

@@ -5,6 +5,7 @@
 #include <cerrno>
 #include <csignal>
 #include <cstdint>
+#include <mutex>
 #include <system_error>
 #include <thread>
 
@@ -19,6 +20,9 @@ std::atomic<bool> s_interrupted{false};
 /// Readable from the first interrupt on, so that a thread which waits for input wakes up.
 int s_wakeUp = -1;
 
+std::mutex s_callMutex;
+std::function<void()> s_call;
+
 bool isIgnored(int signal) {
     struct sigaction action {};
     return sigaction(signal, nullptr, &action) == 0 && action.sa_handler == SIG_IGN;
@@ -32,6 +36,9 @@ void waitForSignals(sigset_t signals) {
         const std::uint64_t one = 1;
         // A full counter would wake the thread all the same.
         static_cast<void>(!write(s_wakeUp, &one, sizeof one));
+        const std::lock_guard lock(s_callMutex);
+        if (s_call)
+            s_call();
     }
 }
 
@@ -58,6 +65,18 @@ void watchForInterrupts() {
 
 bool interrupted() {
     return s_interrupted.load(std::memory_order_relaxed);
+}
+
+OnInterrupt::OnInterrupt(std::function<void()> call) {
+    const std::lock_guard lock(s_callMutex);
+    s_call = std::move(call);
+    if (interrupted())
+        s_call();
+}
+
+OnInterrupt::~OnInterrupt() {
+    const std::lock_guard lock(s_callMutex);
+    s_call = nullptr;
 }
 
 bool waitForInput(int descriptor) {

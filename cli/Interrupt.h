@@ -1,5 +1,7 @@
 #pragma once
 
+#include <functional>
+
 namespace parvel::cli {
 
 /// The exit status of an interrupted program.
@@ -12,6 +14,16 @@ void watchForInterrupts();
 
 /// Whether an end was asked for. Any thread may ask.
 [[nodiscard]] bool interrupted();
+
+/// While it lives, the first interrupt calls the function too, on another thread; at once where it
+/// has come already. One at a time.
+class OnInterrupt {
+public:
+    explicit OnInterrupt(std::function<void()> call);
+    ~OnInterrupt();
+    OnInterrupt(const OnInterrupt&) = delete;
+    OnInterrupt& operator=(const OnInterrupt&) = delete;
+};
 
 /// Waits until the descriptor has something to read; false when an end was asked for meanwhile.
 [[nodiscard]] bool waitForInput(int descriptor);

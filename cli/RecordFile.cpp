@@ -1,14 +1,9 @@
 #include "cli/RecordFile.h"
 
 #include <algorithm>
-#include <cerrno>
-#include <cstring>
 #include <optional>
 
-#include <fcntl.h>
-#include <unistd.h>
-
-#include "cli/Interrupt.h"
+#include "cli/FileContents.h"
 #include "cli/JsonReader.h"
 #include "parvel/foundation/PropertyList.h"
 #include "parvel/foundation/ValueReadings.h"
@@ -18,43 +13,6 @@ namespace {
 
 /// No record's file is this long; a device that has no end would be.
 constexpr std::size_t longestRecordFile = std::size_t{256} << 20;
-
-/// As `read`, but waits for a pipe's writer, and no longer than until an interrupt.
-ssize_t readWaiting(int descriptor, char* bytes, std::size_t size) {
-    for (;;) {
-        const ssize_t count = read(descriptor, bytes, size);
-        if (count >= 0 || (errno != EAGAIN && errno != EINTR))
-            return count;
-        if (!waitForInput(descriptor)) {
-            errno = EINTR;
-            return -1;
-        }
-    }
-}
-
-/// The whole file; none with errno set. A pipe that nobody writes to is empty.
-std::optional<std::string> contentsOf(const std::string& path) {
-    static constexpr std::size_t piece = 256 * 1024;
-    const int descriptor = open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY);
-    if (descriptor < 0)
-        return std::nullopt;
-    std::string contents;
-    ssize_t count = 0;
-    do {
-        const std::size_t size = contents.size();
-        contents.resize(size + piece);
-        count = readWaiting(descriptor, contents.data() + size, piece);
-        contents.resize(size + (count > 0 ? static_cast<std::size_t>(count) : 0));
-        if (contents.size() > longestRecordFile) {
-            count = -1;
-            errno = EFBIG;
-        }
-    } while (count > 0);
-    const int readErrno = errno;
-    close(descriptor);
-    errno = readErrno;
-    return count < 0 ? std::nullopt : std::optional(std::move(contents));
-}
 
 /// A property list of either form begins with what JSON can't begin with.
 bool looksLikePropertyList(std::string_view text) {
@@ -102,8 +60,8 @@ const Dictionary* recordIn(const Value& value, std::string& problem) {
     return recorded;
 }
 
-/// The values of a text that has one in each line; none where a line has another text. A text of
-/// one line is none of these.
+/// The values of a text that has one in each line; none where a line has another text. A text
+/// of one line is none of these.
 std::optional<std::vector<Value>> valuesOfLines(std::string_view text) {
     std::vector<Value> values;
     try {
@@ -133,11 +91,9 @@ std::optional<std::vector<Value>> valuesOf(const std::string& contents, std::str
 
 std::optional<std::vector<StoredRecord>> recordsFromFile(const std::string& path,
                                                          std::string& problem) {
-    std::optional<std::string> contents = contentsOf(path);
-    if (!contents) {
-        problem = strerrordesc_np(errno);
+    std::optional<std::string> contents = contentsOfFile(path, longestRecordFile, problem);
+    if (!contents)
         return std::nullopt;
-    }
     const auto values = valuesOf(*contents, problem);
     contents.reset();
     if (!values)
@@ -164,11 +120,9 @@ std::optional<std::vector<StoredRecord>> recordsFromFile(const std::string& path
 
 std::shared_ptr<const Dictionary> dictionaryFromFile(const std::string& path,
                                                      std::string& problem) {
-    const std::optional<std::string> contents = contentsOf(path);
-    if (!contents) {
-        problem = strerrordesc_np(errno);
+    const auto contents = contentsOfFile(path, longestRecordFile, problem);
+    if (!contents)
         return nullptr;
-    }
     const std::optional<Value> value = valueOf(*contents, problem);
     const Dictionary* dictionary = value ? recordIn(*value, problem) : nullptr;
     return dictionary ? std::make_shared<const Dictionary>(*dictionary) : nullptr;

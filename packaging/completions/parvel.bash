@@ -16,8 +16,23 @@ _parvel_options() {
                 --json --jsonl --plist --log --help -h'
             ;;
         cover) echo '--output -o --size --best --json --jsonl --plist --log --help -h' ;;
+        edit)
+            echo '--set --updates --cover --restore-cover --inflate --temporary --direct --force --record --dry-run
+                --files-from --null -0 --recursive -r
+                --json --jsonl --plist --log --help -h'
+            ;;
+        inflate)
+            echo '--temporary --direct --force --record --dry-run
+                --files-from --null -0 --recursive -r
+                --json --jsonl --plist --log --help -h'
+            ;;
         inspect)
             echo '--cover --extra --flavor --immediate --store --files-from --null -0 --recursive -r --jobs -j
+                --json --jsonl --plist --log --help -h'
+            ;;
+        install)
+            echo '--into --move --replace --rename --asset-id-name --cloud --updating --temporary --direct --progress --force --record --dry-run
+                --files-from --null -0 --recursive -r
                 --json --jsonl --plist --log --help -h'
             ;;
         match) echo '--key --json --jsonl --plist --log --help -h' ;;
@@ -39,6 +54,11 @@ _parvel_options() {
             ;;
         trash)
             echo '--list --restore --record --dry-run --files-from --null -0 --recursive -r
+                --json --jsonl --plist --log --help -h'
+            ;;
+        update)
+            echo '--into --existing --force --record --dry-run
+                --files-from --null -0 --recursive -r
                 --json --jsonl --plist --log --help -h'
             ;;
     esac
@@ -69,7 +89,11 @@ _parvel() {
                 compgen -W 'full content-library store progress identity' -- "$current")
             return
             ;;
-        -j | --jobs | --key | --size | --update | --display-name) return ;;
+        --progress)
+            mapfile -t COMPREPLY < <(compgen -W 'auto always never json' -- "$current")
+            return
+            ;;
+        -j | --jobs | --set | --key | --size | --update | --display-name) return ;;
         cloud)
             mapfile -t COMPREPLY < <(compgen -W 'add take replace status' -- "$current")
             return
@@ -79,7 +103,8 @@ _parvel() {
         mapfile -t COMPREPLY < <(compgen -W "$(_parvel_options "$command")" -- "$current")
     elif [[ -z $command ]]; then
         mapfile -t COMPREPLY < <(compgen -W \
-            'attributes check cloud cover inspect match move redact remove rename trash' -- "$current")
+            'attributes check cloud cover edit inflate inspect install match
+                move redact remove rename trash update' -- "$current")
     else
         compopt -o filenames
         mapfile -t COMPREPLY < <(compgen -f -- "$current")

@@ -2,7 +2,7 @@
 
 function __parvel_needs_command
     not __fish_seen_subcommand_from \
-        attributes check cloud cover inspect match move redact remove rename trash
+        attributes check cloud cover edit inflate inspect install match move redact remove rename trash update
 end
 
 set -l levels 'off fault error default debug'
@@ -12,6 +12,10 @@ complete -c parvel -n __parvel_needs_command -f -a inspect -d 'Print what is kno
 complete -c parvel -n __parvel_needs_command -f -a attributes -d 'What is kept on the files themselves'
 complete -c parvel -n __parvel_needs_command -f -a cover -d 'Write the cover image'
 complete -c parvel -n __parvel_needs_command -f -a match -d 'Tell whether two are the same'
+complete -c parvel -n __parvel_needs_command -f -a install -d 'Bring assets into the library'
+complete -c parvel -n __parvel_needs_command -f -a edit -d 'Change titles, covers and more'
+complete -c parvel -n __parvel_needs_command -f -a inflate -d 'Expand zipped books'
+complete -c parvel -n __parvel_needs_command -f -a update -d 'Bring in new versions'
 complete -c parvel -n __parvel_needs_command -f -a move -d 'Move assets to another place'
 complete -c parvel -n __parvel_needs_command -f -a rename -d 'Name PDF documents after their display names'
 complete -c parvel -n __parvel_needs_command -f -a trash -d 'Move assets to the trash, or back'
@@ -24,22 +28,22 @@ complete -c parvel -n __parvel_needs_command -l json -d 'Print the version as JS
 complete -c parvel -l log -x -a $levels -d 'Print log lines'
 complete -c parvel -s h -l help -d 'Print the options'
 
-for command in attributes check cloud cover inspect match move redact remove rename trash
+for command in attributes check cloud cover edit inflate inspect install match move redact remove rename trash update
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l json -d 'Print one JSON array'
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l jsonl -d 'Print lines of JSON'
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l plist -d 'Print a property list'
 end
 
-for command in attributes check cloud inspect move redact remove rename trash
+for command in attributes check cloud edit inflate inspect install move redact remove rename trash update
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l files-from -r -d 'Read PATHs from a file'
     complete -c parvel -n "__fish_seen_subcommand_from $command" -s 0 -l null -d 'PATHs end with a NUL'
 end
 
-for command in attributes cloud inspect move redact remove rename trash
+for command in attributes cloud edit inflate inspect install move redact remove rename trash update
     complete -c parvel -n "__fish_seen_subcommand_from $command" -s r -l recursive -d 'Take all assets below a folder'
 end
 
-for command in cloud move redact remove rename trash
+for command in cloud edit inflate install move redact remove rename trash update
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l record -r -d 'Take the record from a file'
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l dry-run -d 'Touch nothing'
 end
@@ -87,3 +91,28 @@ complete -c parvel -n '__fish_seen_subcommand_from cloud' -l force -d 'Replace a
 complete -c parvel -n '__fish_seen_subcommand_from check' -l records -r -d 'The records'
 complete -c parvel -n '__fish_seen_subcommand_from check' -l exit-code -d 'End with status 4 where anything is found'
 complete -c parvel -n '__fish_seen_subcommand_from check' -l dry-run -d 'Touch nothing'
+
+complete -c parvel -n '__fish_seen_subcommand_from edit' -l set -x -d 'Change KEY=VALUE'
+complete -c parvel -n '__fish_seen_subcommand_from edit' -l updates -r -d 'Change what a file says'
+complete -c parvel -n '__fish_seen_subcommand_from edit' -l cover -r -d 'Make that file the cover'
+complete -c parvel -n '__fish_seen_subcommand_from edit' -l restore-cover -d 'Take the first cover back'
+complete -c parvel -n '__fish_seen_subcommand_from edit' -l inflate -d 'Write into the book, too'
+
+complete -c parvel -n '__fish_seen_subcommand_from install' -l into -r -d 'The folder'
+complete -c parvel -n '__fish_seen_subcommand_from install' -l move -d 'Move the asset itself'
+complete -c parvel -n '__fish_seen_subcommand_from install' -l replace -d 'Replace what stands there'
+complete -c parvel -n '__fish_seen_subcommand_from install' -l rename -d 'Count up to a free name'
+complete -c parvel -n '__fish_seen_subcommand_from install' -l asset-id-name -d 'Name a book after its identity'
+complete -c parvel -n '__fish_seen_subcommand_from install' -l cloud -d 'Into synchronised storage'
+complete -c parvel -n '__fish_seen_subcommand_from install' -l updating -r -d 'The asset that it is a new version of'
+complete -c parvel -n '__fish_seen_subcommand_from install' -l progress -x -a 'auto always never json' -d 'Show how far a copy has come'
+
+complete -c parvel -n '__fish_seen_subcommand_from update' -l into -r -d 'The folder'
+complete -c parvel -n '__fish_seen_subcommand_from update' -l existing -r -d 'The asset that it is a new version of'
+complete -c parvel -n '__fish_seen_subcommand_from update' -l force -d 'Replace another asset, too'
+
+for command in edit inflate install
+    complete -c parvel -n "__fish_seen_subcommand_from $command" -l temporary -r -d 'Have a book made there first'
+    complete -c parvel -n "__fish_seen_subcommand_from $command" -l direct -d 'Have a book made in its place'
+    complete -c parvel -n "__fish_seen_subcommand_from $command" -l force -d 'Lose what that costs'
+end

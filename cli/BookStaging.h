@@ -1,0 +1,51 @@
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <string>
+
+#include "cli/CommandLine.h"
+#include "cli/Result.h"
+#include "parvel/platform/StagingDirectory.h"
+
+namespace parvel::cli {
+
+/// Where a command has a book made before it takes its place: --temporary DIR; with --direct
+/// nowhere; else in a fresh hidden folder beside the place, which goes with this object.
+struct StagingPlace {
+    std::unique_ptr<StagingDirectory> fresh;
+    std::optional<URL> directory;  ///< what the library is given
+};
+
+/// The options of that choice, and what stands between them and a book that they would cost.
+class BookStaging {
+public:
+    void declare(CommandLine& line);
+    [[nodiscard]] bool isDirect() const { return m_isDirect; }
+
+    /// The place for the book of that URL, which is to stand in the folder. None where the result
+    /// says why not: the library would delete what it finds in its way, and unless it is forced to,
+    /// the program does not let it.
+    [[nodiscard]] std::optional<StagingPlace> placeFor(const URL& book, const URL& folder,
+                                                       bool isForced, Result& result) const;
+
+private:
+    std::optional<std::string> m_temporary;
+    bool m_isDirect = false;
+};
+
+/// Makes the result one that was refused before anything was touched.
+void refuse(Result& result, std::string reason, std::string advice);
+
+/// Whether anything stands there, a dangling link included.
+[[nodiscard]] bool standsAt(const URL& url);
+
+/// Where an asset would stand in a folder of the library: under its own name, or a book under its
+/// identity's. None where it has no such name.
+[[nodiscard]] std::optional<URL> placeInFolder(const AssetPtr& asset, const URL& folder,
+                                               bool takesAssetID);
+
+/// Whether both are one item on the disk, or the same place where nothing stands.
+[[nodiscard]] bool isSamePlace(const URL& url, const URL& other);
+
+}  // namespace parvel::cli

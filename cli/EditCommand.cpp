@@ -1,0 +1,172 @@
+#include "cli/AssetChanges.h"
+#include "cli/BookStaging.h"
+#include "cli/Command.h"
+#include "cli/FileContents.h"
+#include "cli/PropertyValue.h"
+#include "cli/RecordFile.h"
+#include "parvel/foundation/ValueReadings.h"
+#include "parvel/metadata/PVAssetMetadataKeys.h"
+#include "parvel/metadata/PVMutableAssetMetadata.h"
+#include "parvel/xattr/PNMetadataXattr.h"
+
+namespace parvel::cli {
+namespace {
+
+constexpr std::size_t kLargestCover = std::size_t{64} << 20;
+
+class EditCommand : public Command {
+public:
+    void declare(CommandLine& line) override;
+    int run(std::vector<std::string> operands) override;
+
+private:
+    void readUpdates();
+    [[nodiscard]] Dictionary updatesFor(const AssetPtr& asset) const;
+    [[nodiscard]] bool isRefused(const AssetPtr& asset, Result& result) const;
+    void edit(PVAssetMetadataFileManager& manager, const AssetPtr& asset, Result& result) const;
+    [[nodiscard]] std::string outcomeOf(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
+                                        const AssetPtr& edited) const;
+
+    std::vector<std::string> m_sets;
+    std::optional<std::string> m_updatesFile;
+    std::optional<std::string> m_coverFile;
+    bool m_restoresCover = false;
+    bool m_inflates = false;
+    BookStaging m_staging;
+    AssetChanges m_changes{Uninspectable::Fails};
+
+    std::vector<PropertyValue> m_values;
+    Dictionary m_updates;
+};
+
+void EditCommand::declare(CommandLine& line) {
+    line.group("What is changed");
+    line.list("--set", "KEY=VALUE",
+              "change KEY of the record, or the property of that name,\n"
+              "to VALUE",
+              m_sets);
+    line.option("--updates", "FILE",
+                "change what FILE, a property list or JSON dictionary,\n"
+                "says",
+                m_updatesFile);
+    line.option("--cover", "IMAGE", "make that file the cover", m_coverFile);
+    line.flag("--restore-cover", "take the first cover back", m_restoresCover);
+    line.exclusive({"--cover", "--restore-cover"});
+    line.flag("--inflate",
+              "write cover and metadata into the book too; a zipped one\n"
+              "is expanded in its place first",
+              m_inflates);
+    m_staging.declare(line);
+    m_changes.declareForce(line, "do it even where that loses something");
+    m_changes.declare(line);
+}
+
+int EditCommand::run(std::vector<std::string> operands) {
+    m_changes.begin();
+    readUpdates();
+    return m_changes.run("edit", std::move(operands),
+                         [this](PVAssetMetadataFileManager& manager, const AssetPtr& asset,
+                                Result& result) { edit(manager, asset, result); });
+}
+
+void EditCommand::readUpdates() {
+    for (const std::string& set : m_sets)
+        m_values.push_back(PropertyValue::fromText("--set", set));
+    std::string problem;
+    if (m_updatesFile) {
+        const auto updates = dictionaryFromFile(*m_updatesFile, problem);
+        if (!updates)
+            throw UsageError("--updates " + *m_updatesFile + ": " + problem);
+        m_updates = *updates;
+    }
+    if (m_coverFile) {
+        const auto cover = contentsOfFile(*m_coverFile, kLargestCover, problem);
+        if (cover && cover->empty())
+            problem = "the file is empty";
+        if (!cover || cover->empty())
+            throw UsageError("--cover " + *m_coverFile + ": " + problem);
+        m_updates.set(key::coverImageData, Data::copyOf(*cover));
+    }
+    if (m_restoresCover)
+        m_updates.set(key::coverImageData, Value());
+    if (m_sets.empty() && !m_updatesFile && !m_coverFile && !m_restoresCover)
+        throw UsageError("say what to change: --set, --updates, --cover or --restore-cover");
+}
+
+Dictionary EditCommand::updatesFor(const AssetPtr& asset) const {
+    Dictionary updates = m_updates;
+    for (const PropertyValue& value : m_values)
+        value.storeIn(updates, *asset->dictionaryRepresentation());
+    return updates;
+}
+
+bool EditCommand::isRefused(const AssetPtr& asset, Result& result) const {
+    if (m_changes.isForced())
+        return false;
+    const auto backup = asset->bazaarArtworkBackupURL();
+    if (m_restoresCover && m_inflates && backup && !standsAt(*backup)) {
+        refuse(result, "no first cover is kept in the book, and the present one would be lost",
+               "give --force to lose it");
+        return true;
+    }
+    // What the library writes, it writes under the stored path, whose extension is in lower case.
+    if (asset->url() != asset->copyWithUpdates([](PVMutableAssetMetadata&) {})->url()) {
+        refuse(result, "an edit would look for a name that ends in small letters",
+               "give it such a name first, with \"parvel move --to\"");
+        return true;
+    }
+    return false;
+}
+
+void EditCommand::edit(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
+                       Result& result) const {
+    if (isRefused(asset, result))
+        return;
+    const Dictionary updates = updatesFor(asset);
+    std::optional<StagingPlace> place = StagingPlace{};
+    const bool isExpanded = m_inflates && asset->isCompressedBookWithError() == true;
+    if (isExpanded)
+        place = m_staging.placeFor(*asset->url(), asset->url()->deletingLastPathComponent(),
+                                   m_changes.isForced(), result);
+    if (!place)
+        return;
+    const AssetPtr edited =
+        manager.updateAsset_withUpdates_temporaryDirectory_inflateIfNeeded_error(
+            asset, &updates, place->directory, m_inflates, &result.error);
+    setRecord(result, edited, PVAssetMetadataFlavorFull);
+    if (edited)
+        result.outcome = outcomeOf(manager, asset, edited);
+    else
+        result.nothing = "not edited";
+}
+
+std::string EditCommand::outcomeOf(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
+                                   const AssetPtr& edited) const {
+    // Where nothing but the name changes, the library gives the record of the old name.
+    if (edited == asset)
+        return manager.fileManager()->itemExistsAtPath(asset->url()->path())
+                   ? "says so already"
+                   : "renamed after its display name";
+    if (edited->url() != asset->url())
+        return "edited, renamed to " + edited->url()->path();
+    if (asset->isAudiobook())
+        return "nothing is written on an audiobook; this is what its record would be";
+    if (asset->isBook() && m_inflates)
+        return "edited";
+    const auto kept = manager.extendedAttributesForAsset_error(edited);
+    const Value* identity = kept ? kept->find(PNMetadataXattrAssetID) : nullptr;
+    const bool keepsAttributes = identity && stringForm(identity) == edited->assetID();
+    if (!keepsAttributes)
+        return "nothing is written: the file keeps no attributes of this asset; write them first, "
+               "with \"parvel attributes --write\"";
+    return asset->isBook() ? "its attributes are written; --inflate writes into the book, too"
+                           : "its attributes are written";
+}
+
+}  // namespace
+
+std::unique_ptr<Command> makeEditCommand() {
+    return std::make_unique<EditCommand>();
+}
+
+}  // namespace parvel::cli

@@ -1,0 +1,95 @@
+#include "cli/AssetChanges.h"
+#include "cli/BookStaging.h"
+#include "cli/Command.h"
+#include "cli/TransferAdvice.h"
+
+namespace parvel::cli {
+namespace {
+
+class UpdateCommand : public Command {
+public:
+    void declare(CommandLine& line) override;
+    int run(std::vector<std::string> operands) override;
+
+private:
+    void update(PVAssetMetadataFileManager& manager, const AssetPtr& asset, Result& result) const;
+    [[nodiscard]] bool isRefused(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
+                                 Result& result) const;
+
+    std::optional<std::string> m_into;
+    std::optional<std::string> m_existingPath;
+    AssetChanges m_changes{Uninspectable::Fails};
+
+    URL m_folder = URL::fileURLWithPath("");
+    AssetPtr m_existing;
+};
+
+void UpdateCommand::declare(CommandLine& line) {
+    line.group("Where to");
+    line.option("--into", "DIR", "the folder of the library", m_into);
+    line.option("--existing", "OLD",
+                "the asset of the library that NEW is a new version of;\n"
+                "one in synchronised storage is replaced there",
+                m_existingPath);
+    m_changes.declareForce(line, "do it even where that loses another book or a folder");
+    m_changes.declare(line);
+}
+
+int UpdateCommand::run(std::vector<std::string> operands) {
+    m_changes.begin();
+    if (!m_into)
+        throw UsageError("say where to: --into DIR");
+    m_folder = urlOfPath(*m_into);
+    m_changes.setTarget(m_folder);
+    if (m_existingPath) {
+        if (!m_changes.hasOnePath(operands))
+            throw UsageError("--existing takes one PATH");
+        Result existing = resultForPath(*m_existingPath);
+        m_existing = AssetRecord(Uninspectable::HasItsURLAlone).forResult(existing);
+    }
+    return m_changes.run("update", std::move(operands),
+                         [this](PVAssetMetadataFileManager& manager, const AssetPtr& asset,
+                                Result& result) { update(manager, asset, result); });
+}
+
+/// The library puts the new version over whatever stands at its name.
+bool UpdateCommand::isRefused(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
+                              Result& result) const {
+    if (m_changes.isForced() || (m_existing && m_existing->isUbiquitous()))
+        return false;
+    const std::optional<URL> place = placeInFolder(asset, m_folder, /*takesAssetID=*/true);
+    if (!place || isSamePlace(*place, *asset->url()) ||
+        !manager.fileManager()->itemExistsAtPath(place->path()))
+        return false;
+    if (m_existing && m_existing->url() && isSamePlace(*place, *m_existing->url()))
+        return false;
+    Result standing = resultForPath(place->path());
+    const AssetPtr other = AssetRecord(Uninspectable::Fails).forResult(standing);
+    if (other && other->hasMatchingIdentity(*asset))
+        return false;
+    refuse(result, place->path() + " is another asset, and would be lost",
+           "say with --existing that it is the one to replace, or give --force");
+    return true;
+}
+
+void UpdateCommand::update(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
+                           Result& result) const {
+    if (isRefused(manager, asset, result))
+        return;
+    const AssetPtr updated = manager.applyUpdate_onExistingAsset_targetDirectory_error(
+        asset, m_existing, m_folder, &result.error);
+    setRecord(result, updated, PVAssetMetadataFlavorFull);
+    result.nothing = "not brought in";
+    if (updated && updated->url() && !result.error)
+        result.outcome = "now " + updated->url()->path();
+    else
+        result.advice = adviceForTransfer(result, *asset->url(), "");
+}
+
+}  // namespace
+
+std::unique_ptr<Command> makeUpdateCommand() {
+    return std::make_unique<UpdateCommand>();
+}
+
+}  // namespace parvel::cli

@@ -18,7 +18,7 @@ constexpr std::size_t kLongestLine = 16'384;
 /// Of one conversation. The client pushes lines of its own between the answers.
 constexpr int kMostLines = 10'000;
 /// How often the disk is looked at while the client downloads.
-constexpr std::chrono::milliseconds kLook{50};
+constexpr std::chrono::milliseconds kSocketLook{50};
 
 bool isSameFolder(const std::string& left, const std::string& right) {
     struct stat leftStatus {};
@@ -173,7 +173,7 @@ bool NextcloudClient::fetch(const SyncedItem& item, const std::function<bool()>&
         const auto now = std::chrono::steady_clock::now();
         if (now >= deadline)
             return false;
-        if (conversation.listen(std::min(deadline, now + kLook)) != SocketOutcome::TimedOut)
+        if (conversation.listen(std::min(deadline, now + kSocketLook)) != SocketOutcome::TimedOut)
             return isHere();
     }
     return true;

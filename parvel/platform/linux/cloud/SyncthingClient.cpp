@@ -54,7 +54,7 @@ Reply parsedReply(std::string_view bytes) {
     return reply;
 }
 
-std::string percentEncoded(std::string_view text) {
+std::string queryEncoded(std::string_view text) {
     constexpr std::string_view hex = "0123456789ABCDEF";
     std::string encoded;
     for (const char c : text) {
@@ -143,10 +143,10 @@ ClientAnswer answerOfVersions(const Version& local, const Version& global, bool 
 
 ClientAnswer answerOfIndex(const SyncthingFolder& folder, const SyncedItem& item,
                            Deadline deadline) {
-    const Reply reply = get(folder,
-                            "/rest/db/file?folder=" + percentEncoded(folder.id) +
-                                "&file=" + percentEncoded(item.relative),
-                            deadline);
+    const Reply reply = get(
+        folder,
+        "/rest/db/file?folder=" + queryEncoded(folder.id) + "&file=" + queryEncoded(item.relative),
+        deadline);
     if (reply.status == 404)
         return {ClientWord::Unknown, "the client does not know the item yet"};
     if (reply.status != 200)
@@ -186,7 +186,7 @@ ClientAnswer answerOfPackage(const SyncthingFolder& folder, const SyncedItem& it
                              const ClientAnswer& own, Deadline deadline) {
     for (int number = 1; number <= kMostPages; ++number) {
         const Reply reply = get(folder,
-                                "/rest/db/need?folder=" + percentEncoded(folder.id) + "&perpage=" +
+                                "/rest/db/need?folder=" + queryEncoded(folder.id) + "&perpage=" +
                                     std::to_string(kPageSize) + "&page=" + std::to_string(number),
                                 deadline);
         if (reply.status != 200)

@@ -84,7 +84,8 @@ PVCrateAssetMetadataIOTask::initWithSourceMetadata_manager(
 AssetPtr PVCrateAssetMetadataIOTask::executeWithTargetDirectory_error(
     const std::optional<URL>& directory, ErrorOut error) {
     PVParvelLog().info("CrateCopy: start: targetDirectory: %@", directory);
-    m_copier.store(Service<ArchiveCopierFactory>::current().makeCopier());
+    m_copiers.push_back(Service<ArchiveCopierFactory>::current().makeCopier());
+    m_currentCopier.store(m_copiers.back().get(), std::memory_order_release);
 
     AssetPtr result = copyInto(directory, error);
 
@@ -105,7 +106,7 @@ AssetPtr PVCrateAssetMetadataIOTask::copyInto(const std::optional<URL>& director
     }
     const std::optional<URL> target = urlOfCopy(source, directory);
 
-    const std::shared_ptr<ArchiveCopier> copier = m_copier.load();
+    const std::shared_ptr<ArchiveCopier> copier = m_copiers.back();
     ArchiveCopier::Count count;
     if (*isDirectory) {
         count = copier->countTree(source->path());
@@ -143,13 +144,13 @@ AssetPtr PVCrateAssetMetadataIOTask::copyInto(const std::optional<URL>& director
 }
 
 std::shared_ptr<ArchiveCopier> PVCrateAssetMetadataIOTask::copier() const {
-    return m_copier.load();
+    return m_copiers.empty() ? nullptr : m_copiers.back();
 }
 
 // The flag comes first, so that a copy which ends by the copier's knows why.
 void PVCrateAssetMetadataIOTask::cancel() {
     m_isCancelled.store(true, std::memory_order_release);
-    if (const std::shared_ptr<ArchiveCopier> copier = m_copier.load())
+    if (ArchiveCopier* copier = m_currentCopier.load(std::memory_order_acquire))
         copier->cancel();
 }
 

@@ -2,6 +2,8 @@
 
 #include <atomic>
 #include <cstdint>
+#include <memory>
+#include <vector>
 
 #include "parvel/iotasks/PVAssetMetadataIOTask.h"
 
@@ -42,7 +44,9 @@ private:
 
     [[nodiscard]] AssetPtr copyInto(const std::optional<URL>& directory, ErrorOut error);
 
-    std::atomic<std::shared_ptr<ArchiveCopier>> m_copier;
+    /// One an execution, kept so that a late cancel meets none that is gone.
+    std::vector<std::shared_ptr<ArchiveCopier>> m_copiers;
+    std::atomic<ArchiveCopier*> m_currentCopier{nullptr};
     std::optional<Error> m_crateError;
     std::uint64_t m_totalBytes = 0;
     std::uint64_t m_bytesSoFar = 0;

@@ -73,6 +73,15 @@ TEST(ImageCodec, RefusesWhatIsNoImageAndServesTheNext) {
     EXPECT_TRUE(decodedInHelper(plainPNG(3, 2)));
 }
 
+TEST(ImageCodec, RefusesWhatTakesTooMuchMemoryAndServesTheNext) {
+    // All of a progressive image is held twice while it is decoded.
+    const JPEGSample large{.width = 8000, .height = 5000, .progressive = true};
+
+    EXPECT_FALSE(decodedInHelper(large.bytes()));
+
+    EXPECT_TRUE(decodedInHelper(plainPNG(3, 2)));
+}
+
 TEST(ImageCodec, ServesManyThreads) {
     const std::string bytes = plainPNG(20, 20, 0x3366CC);
     std::vector<std::thread> threads;

@@ -32,10 +32,13 @@ int AssetChanges::run(std::string_view command, std::vector<std::string> operand
                       const ChangeWork& work) {
     return runOnPaths(command, std::move(operands),
                       [&](PVAssetMetadataFileManager& manager, Result& result) {
-                          if (const AssetPtr asset = m_record.forResult(result)) {
-                              result.assetID = asset->assetID();
-                              work(manager, asset, result);
+                          const AssetPtr asset = m_record.forResult(result);
+                          if (!asset) {
+                              result.nothing = "no metadata";
+                              return;
                           }
+                          result.assetID = asset->assetID();
+                          work(manager, asset, result);
                       });
 }
 
@@ -49,6 +52,7 @@ int AssetChanges::runOnPaths(std::string_view command, std::vector<std::string> 
         manager->setFileManager(std::make_shared<FolderGuard>(manager->fileManager()));
     return runOverPaths(options, source, [&](const std::string& path) {
         Result result = resultForPath(path);
+        result.nothing = "nothing was done";
         work(*manager, result);
         return result;
     });

@@ -18,6 +18,7 @@ private:
                   Result& result) const;
 
     std::optional<std::string> m_into;
+    std::optional<URL> m_target;
     bool m_replaces = false;
     AssetChanges m_changes;
 };
@@ -94,14 +95,14 @@ void tellStatus(Result& result) {
 void CloudCommand::transfer(bool isInto, PVAssetMetadataFileManager& manager, const AssetPtr& asset,
                             Result& result) const {
     const AssetPtr moved = manager.setUbiquitous_asset_intoDirectory_replace_error(
-        isInto, asset, urlOfPath(*m_into), m_replaces, &result.error);
+        isInto, asset, *m_target, m_replaces, &result.error);
     setRecord(result, moved, PVAssetMetadataFlavorFull);
     if (m_replaces) {
         // The library reports no outcome; the disk tells.
         result.needsRecord = false;
         const bool isGone = !manager.fileManager()->itemExistsAtPath(urlOfPath(result.path).path());
-        result.outcome = isGone ? "moved into " + urlOfPath(*m_into).path()
-                                : "still where it was; nothing tells why";
+        result.outcome =
+            isGone ? "moved into " + m_target->path() : "still where it was; nothing tells why";
     } else if (moved && moved->url()) {
         result.outcome = "moved to " + moved->url()->path();
     } else {
@@ -135,7 +136,8 @@ int CloudCommand::run(std::vector<std::string> operands) {
             "cloud", std::move(operands),
             [](PVAssetMetadataFileManager&, Result& result) { tellStatus(result); });
     if (action != "replace") {
-        m_changes.setTarget(urlOfPath(*m_into));
+        m_target = urlOfOption("--into", *m_into);
+        m_changes.setTarget(*m_target);
         return m_changes.run(
             "cloud", std::move(operands),
             [&](PVAssetMetadataFileManager& manager, const AssetPtr& asset, Result& result) {

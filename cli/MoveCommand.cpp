@@ -16,6 +16,7 @@ private:
 
     std::optional<std::string> m_to;
     std::optional<std::string> m_into;
+    std::optional<URL> m_target;
     bool m_replaces = false;
     bool m_renames = false;
     bool m_takesAssetID = false;
@@ -45,8 +46,9 @@ int MoveCommand::run(std::vector<std::string> operands) {
         throw UsageError("--rename and --asset-id-name choose a name in a folder: use --into");
     if (m_to && !m_changes.hasOnePath(operands))
         throw UsageError("--to takes one PATH");
+    m_target = m_to ? urlOfOption("--to", *m_to) : urlOfOption("--into", *m_into);
     if (m_into)
-        m_changes.setTarget(urlOfPath(*m_into));
+        m_changes.setTarget(*m_target);
     return m_changes.run("move", std::move(operands),
                          [this](PVAssetMetadataFileManager& manager, const AssetPtr& asset,
                                 Result& result) { move(manager, asset, result); });
@@ -64,18 +66,20 @@ void MoveCommand::move(PVAssetMetadataFileManager& manager, const AssetPtr& asse
                        Result& result) const {
     const AssetPtr moved =
         m_to
-            ? manager.moveAsset_toURL_replaceExisting_error(asset, urlOfPath(*m_to), m_replaces,
+            ? manager.moveAsset_toURL_replaceExisting_error(asset, m_target, m_replaces,
                                                             &result.error)
             : manager
                   .moveAsset_toDirectory_replaceExisting_renameIfCollision_useAssetIDFileName_error(
-                      asset, urlOfPath(*m_into), m_replaces, m_renames, m_takesAssetID,
-                      &result.error);
+                      asset, *m_target, m_replaces, m_renames, m_takesAssetID, &result.error);
     setRecord(result, moved, PVAssetMetadataFlavorFull);
     if (moved == asset)
         result.outcome = "is there already";
     else if (moved && moved->url())
         result.outcome = "moved to " + moved->url()->path();
-    if (!moved)
+    const bool hasNoName = m_takesAssetID && result.error && !result.error->url();
+    if (hasNoName)
+        result.advice = "it has no identity that can be a name: --record can say one";
+    else if (!moved)
         result.advice =
             adviceForTransfer(result, urlOfPath(result.path), adviceForTakenPlace(asset));
 }

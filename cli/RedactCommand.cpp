@@ -14,6 +14,7 @@ private:
     void redact(PVAssetMetadataFileManager& manager, const AssetPtr& asset, Result& result) const;
 
     std::optional<std::string> m_into;
+    std::optional<URL> m_target;
     AssetChanges m_changes;
 };
 
@@ -27,7 +28,8 @@ int RedactCommand::run(std::vector<std::string> operands) {
     m_changes.begin();
     if (!m_into)
         throw UsageError("say where to: --into DIR");
-    m_changes.setTarget(urlOfPath(*m_into));
+    m_target = urlOfOption("--into", *m_into);
+    m_changes.setTarget(*m_target);
     return m_changes.run("redact", std::move(operands),
                          [this](PVAssetMetadataFileManager& manager, const AssetPtr& asset,
                                 Result& result) { redact(manager, asset, result); });
@@ -36,7 +38,7 @@ int RedactCommand::run(std::vector<std::string> operands) {
 void RedactCommand::redact(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
                            Result& result) const {
     const AssetPtr redacted =
-        manager.redactAsset_intoDirectory_error(asset, urlOfPath(*m_into), &result.error);
+        manager.redactAsset_intoDirectory_error(asset, *m_target, &result.error);
     setRecord(result, redacted, PVAssetMetadataFlavorFull);
     if (redacted && redacted->url())
         result.outcome = "redacted, and moved to " + redacted->url()->path();

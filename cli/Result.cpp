@@ -2,6 +2,8 @@
 
 #include <filesystem>
 
+#include "cli/CommandLine.h"
+
 namespace parvel::cli {
 
 std::string_view assetTypeName(PVAssetType type) {
@@ -29,6 +31,12 @@ URL urlOfPath(std::string_view path) {
         return std::filesystem::current_path(ignored).string();
     }();
     return URL::fileURLWithPath(pathAppending(workingDirectory, path));
+}
+
+URL urlOfOption(std::string_view option, std::string_view path) {
+    if (path.empty())
+        throw UsageError(std::string(option) + ": the path is empty");
+    return urlOfPath(path);
 }
 
 Result resultForPath(std::string_view path) {

@@ -37,6 +37,10 @@ std::string_view assetTypeName(PVAssetType type);
 /// empty, since it names nothing.
 URL urlOfPath(std::string_view path);
 
+/// The URL of a path that an option says. Throws UsageError for the empty one: it would name the
+/// working directory, and a shell variable that is not set is no wish for that.
+URL urlOfOption(std::string_view option, std::string_view path);
+
 /// The result of the PATH before anything was done with it.
 Result resultForPath(std::string_view path);
 

@@ -100,7 +100,7 @@ std::optional<std::string> resolvedPath(const std::string& item) {
     return pathAppending(real.get(), lastComponentOfPath(item));
 }
 
-/// Where file systems are mounted, each once.
+/// Where file systems are mounted, each once. To look at one that mounts itself would mount it.
 std::vector<std::string> mountedFolders() {
     const std::unique_ptr<FILE, int (*)(FILE*)> table(::setmntent("/proc/self/mounts", "re"),
                                                       &::endmntent);
@@ -108,7 +108,8 @@ std::vector<std::string> mountedFolders() {
     std::array<char, 3 * PATH_MAX> buffer{};
     mntent entry{};
     while (table && ::getmntent_r(table.get(), &entry, buffer.data(), buffer.size()))
-        folders.emplace_back(entry.mnt_dir);
+        if (std::string_view(entry.mnt_type) != "autofs")
+            folders.emplace_back(entry.mnt_dir);
     std::sort(folders.begin(), folders.end());
     folders.erase(std::unique(folders.begin(), folders.end()), folders.end());
     return folders;

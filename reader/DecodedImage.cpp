@@ -9,7 +9,7 @@
 namespace parvel::reader {
 
 Answer decodedImage(const Received& received) {
-    const InputMapping input(received.input.get());
+    const InputMapping input(received);
     Answer answer;
     Reply& reply = answer.reply;
     std::optional<MemoryFile> pixels;

@@ -138,7 +138,7 @@ Document::~Document() = default;
 
 Answer Document::open(const Received& received) {
     close();
-    m_bytes = std::make_unique<InputMapping>(received.input.get());
+    m_bytes = std::make_unique<InputMapping>(received);
     const std::span<const std::uint8_t> bytes = m_bytes->bytes();
     if (!bytes.empty())
         m_document.reset(poppler::document::load_from_raw_data(

@@ -29,13 +29,15 @@ std::map<std::string, int, std::less<>>& hostFiles() {
     return files;
 }
 
-volatile sig_atomic_t endsWhenFileIsWanted = 0;
+/// The request that is answered when a file is missing. Set and read on the one thread there is.
+const Request* volatile endingRequest = nullptr;
 
 /// What code is told that asks for a path that was not kept.
 long missingFile() {
-    if (endsWhenFileIsWanted != 0) {
+    if (const Request* request = endingRequest) {
         Answer wanted;
         wanted.reply.outcome = Outcome::FontsWanted;
+        wanted.reply.number = request->number;
         wanted.reply.spentMilliseconds =
             static_cast<std::uint32_t>(drawingMilliseconds - endProcessorTimeLimit());
         static_cast<void>(send(wanted));
@@ -107,12 +109,12 @@ void answerTrappedCalls() {
     ::sigaction(SIGSYS, &action, nullptr);
 }
 
-EndWhenFileIsWanted::EndWhenFileIsWanted(bool isInForce) {
-    endsWhenFileIsWanted = isInForce ? 1 : 0;
+EndWhenFileIsWanted::EndWhenFileIsWanted(const Request* request) {
+    endingRequest = request;
 }
 
 EndWhenFileIsWanted::~EndWhenFileIsWanted() {
-    endsWhenFileIsWanted = 0;
+    endingRequest = nullptr;
 }
 
 }  // namespace parvel::reader

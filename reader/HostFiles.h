@@ -2,6 +2,8 @@
 
 #include <string>
 
+#include "parvel/platform/linux/ReaderProtocol.h"
+
 namespace parvel::reader {
 
 /// The host's files that drawing may need: fonts, and the tables of the PDF library. They are
@@ -17,11 +19,12 @@ void keepHostFolder(const std::string& path);
 /// kept file, or as if the file were not there.
 void answerTrappedCalls();
 
-/// While it lives, asking for a file that was not kept ends the process, with the reply that says
-/// that fonts are wanted.
+/// While it lives, asking for a file that was not kept ends the process, with the reply to the
+/// request that says that fonts are wanted.
 class EndWhenFileIsWanted {
 public:
-    explicit EndWhenFileIsWanted(bool isInForce);
+    /// Null for not at all.
+    explicit EndWhenFileIsWanted(const Request* request);
     ~EndWhenFileIsWanted();
     EndWhenFileIsWanted(const EndWhenFileIsWanted&) = delete;
     EndWhenFileIsWanted& operator=(const EndWhenFileIsWanted&) = delete;

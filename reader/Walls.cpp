@@ -120,9 +120,12 @@ std::uint32_t raiseWalls(std::uint64_t inputBytes) {
 }
 
 void allowAddressSpace(std::uint64_t inputBytes) {
-    rlimit limits{};
-    ::getrlimit(RLIMIT_AS, &limits);
-    limits.rlim_cur = std::min<rlim_t>(addressSpace + inputBytes, limits.rlim_max);
+    static const rlim_t most = [] {
+        rlimit limits{};
+        ::getrlimit(RLIMIT_AS, &limits);
+        return limits.rlim_max;
+    }();
+    const rlimit limits{std::min<rlim_t>(addressSpace + inputBytes, most), most};
     ::setrlimit(RLIMIT_AS, &limits);
 }
 

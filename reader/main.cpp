@@ -38,9 +38,21 @@ class Reader {
 public:
     explicit Reader(bool hasFonts) : m_hasFonts(hasFonts) {}
 
-    /// False for a request that makes no sense.
-    bool answer(const Received& received, Answer& answer) {
+    /// False for a request that makes no sense, and when nobody hears the answer.
+    bool serve(const Received& received) {
+        if (received.request.ask == Ask::CloseDocument) {
+            m_document.close();
+            return true;
+        }
         allowAddressSpace(received.request.size);
+        Answer answer;
+        const bool isAnswered = makeAnswer(received, answer);
+        answer.reply.number = received.request.number;
+        return isAnswered && send(answer);
+    }
+
+private:
+    bool makeAnswer(const Received& received, Answer& answer) {
         switch (received.request.ask) {
             case Ask::OpenDocument:
                 limitProcessorTime(informationMilliseconds);
@@ -51,7 +63,7 @@ public:
                 return true;
             case Ask::DrawPage: {
                 limitProcessorTime(drawingTime(received.request));
-                const EndWhenFileIsWanted inForce(!m_hasFonts);
+                const EndWhenFileIsWanted inForce(m_hasFonts ? nullptr : &received.request);
                 answer = m_document.drawPage(received.request);
                 return true;
             }
@@ -59,16 +71,11 @@ public:
                 limitProcessorTime(drawingMilliseconds);
                 answer = decodedImage(received);
                 return true;
-            case Ask::CloseDocument:
-                m_document.close();
-                answer.reply.outcome = Outcome::Done;
-                return true;
             default:
                 return false;
         }
     }
 
-private:
     bool m_hasFonts;
     Document m_document;
 };
@@ -89,8 +96,7 @@ int run(std::uint64_t inputBytes, bool hasFonts) {
     bool isGoingOn = send(hello);
     while (isGoingOn) {
         Received received;
-        Answer answer;
-        isGoingOn = receive(received) && reader.answer(received, answer) && send(answer);
+        isGoingOn = receive(received) && reader.serve(received);
     }
     return EXIT_SUCCESS;
 }

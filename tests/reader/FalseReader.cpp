@@ -16,9 +16,13 @@
 namespace parvel::reader {
 namespace {
 
+/// Of the request that is answered.
+std::uint32_t number = 0;
+
 void say(const Reply& reply, const std::string& text = "", int file = -1,
          std::size_t headerSize = sizeof(Reply)) {
     Reply header = reply;
+    header.number = number;
     std::array<iovec, 2> parts{iovec{&header, headerSize},
                                iovec{const_cast<char*>(text.data()), text.size()}};
     msghdr message{};
@@ -38,7 +42,9 @@ void say(const Reply& reply, const std::string& text = "", int file = -1,
 }
 
 bool hear(Request& request) {
-    return ::recv(socketDescriptor, &request, sizeof request, 0) == sizeof request;
+    const bool isHeard = ::recv(socketDescriptor, &request, sizeof request, 0) == sizeof request;
+    number = request.number;
+    return isHeard;
 }
 
 int memoryFile(std::size_t size, bool isSealed) {
@@ -105,6 +111,8 @@ int run(const std::string& fault) {
             return 0;
         if (fault == "hangs")
             ::pause();
+        if (fault == "other-number")
+            ++number;
         if (request.ask == Ask::OpenDocument)
             sayInformation(fault);
         else if (request.ask == Ask::DescribePage)

@@ -38,9 +38,8 @@ bool closeForgottenDocument(HelperProcess& helper) {
         return true;
     reader::Request request;
     request.ask = reader::Ask::CloseDocument;
-    HelperAnswer answer;
     helper.hasOpenDocument = false;
-    return helper.ask(request, -1, answer) == HelperProcess::Exchange::Answered;
+    return helper.tell(request);
 }
 
 std::unique_ptr<HelperProcess> startHelper(const HelperMeans& means) {

@@ -235,7 +235,20 @@ bool HelperProcess::isOurs() const {
 
 HelperProcess::Exchange HelperProcess::ask(const Request& request, int descriptor,
                                            HelperAnswer& answer) {
+    ++m_number;
+    if (!send(request, descriptor))
+        return Exchange::NotAsked;
+    m_inputCount += isInput(request.ask) ? 1 : 0;
+    return receive(answer) ? Exchange::Answered : Exchange::Failed;
+}
+
+bool HelperProcess::tell(const Request& request) {
+    return send(request, -1);
+}
+
+bool HelperProcess::send(const Request& request, int descriptor) const {
     Request sent = request;
+    sent.number = m_number;
     iovec part{&sent, sizeof sent};
     msghdr message{};
     message.msg_iov = &part;
@@ -245,11 +258,7 @@ HelperProcess::Exchange HelperProcess::ask(const Request& request, int descripto
         attachDescriptor(message, space, descriptor);
     const ssize_t count =
         retried([&] { return ::sendmsg(m_socket.get(), &message, MSG_NOSIGNAL | MSG_DONTWAIT); });
-    if (count != static_cast<ssize_t>(sizeof sent))
-        return Exchange::NotAsked;
-
-    m_inputCount += isInput(request.ask) ? 1 : 0;
-    return receive(answer) ? Exchange::Answered : Exchange::Failed;
+    return count == static_cast<ssize_t>(sizeof sent);
 }
 
 bool HelperProcess::receive(HelperAnswer& answer) {
@@ -272,7 +281,7 @@ bool HelperProcess::receive(HelperAnswer& answer) {
     if (size < sizeof(Reply) || (message.msg_flags & (MSG_TRUNC | MSG_CTRUNC)) != 0)
         return false;
     answer.text = std::string_view(m_text.get(), size - sizeof(Reply));
-    return true;
+    return answer.reply.number == m_number;
 }
 
 bool HelperProcess::awaitReply() const {

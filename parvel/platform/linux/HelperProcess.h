@@ -18,7 +18,7 @@ struct HelperMeans {
     bool hasFonts = false;
 };
 
-/// A reply as it came. Nothing in it has been judged but its length.
+/// A reply as it came. Nothing in it has been judged but its length and that it is the request's.
 struct HelperAnswer {
     reader::Reply reply;
     std::string_view text;  ///< what followed the header, until the next request
@@ -49,6 +49,9 @@ public:
     [[nodiscard]] Exchange ask(const reader::Request& request, int descriptor,
                                HelperAnswer& answer);
 
+    /// Tells something that is not answered. False when the process had ended.
+    bool tell(const reader::Request& request);
+
     [[nodiscard]] const HelperMeans& means() const { return m_means; }
     /// The walls that stand, of reader::Wall.
     [[nodiscard]] std::uint32_t walls() const { return m_walls; }
@@ -63,6 +66,7 @@ public:
 
 private:
     HelperProcess(FileDescriptor socket, FileDescriptor process, const HelperMeans& means);
+    [[nodiscard]] bool send(const reader::Request& request, int descriptor) const;
     [[nodiscard]] bool receive(HelperAnswer& answer);
     [[nodiscard]] bool awaitReply() const;
 
@@ -71,6 +75,7 @@ private:
     HelperMeans m_means;
     pid_t m_owner;
     std::uint32_t m_walls = 0;
+    std::uint32_t m_number = 0;
     unsigned m_inputCount = 0;
     std::unique_ptr<char[]> m_text;
 };

@@ -28,7 +28,7 @@ enum class Ask : std::uint32_t {
     /// Draws the first page of the open document, `width` by `height`. Answered with pixels, or
     /// with FontsWanted.
     DrawPage = 2,
-    /// Unmaps and closes the open document, if any.
+    /// Unmaps and closes the open document, if any. The one request that is not answered.
     CloseDocument = 3,
     /// With the descriptor of an encoded image of `size` bytes. Answered with pixels.
     DecodeImage = 4,
@@ -38,6 +38,7 @@ enum class Ask : std::uint32_t {
 
 struct Request {
     Ask ask{};
+    std::uint32_t number = 0;  ///< counts the requests
     std::uint32_t width = 0;
     std::uint32_t height = 0;
     std::uint32_t stride = 0;
@@ -71,6 +72,7 @@ inline constexpr std::size_t longestText = 64 * 1024;
 /// are `height` rows of `stride` bytes, as Image.h has them.
 struct Reply {
     Outcome outcome{};
+    std::uint32_t number = 0;   ///< the request's; 0 for Hello
     std::uint32_t version = 0;  ///< Hello
     std::uint32_t walls = 0;    ///< Hello: the walls that stand
 

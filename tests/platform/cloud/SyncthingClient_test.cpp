@@ -1,0 +1,353 @@
+#include "parvel/platform/linux/cloud/SyncthingClient.h"
+
+#include <filesystem>
+#include <map>
+#include <mutex>
+#include <vector>
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "parvel/platform/linux/cloud/HostCloudStore.h"
+#include "tests/support/EnvironmentValue.h"
+#include "tests/support/StandInServer.h"
+#include "tests/support/TemporaryDirectory.h"
+
+namespace parvel::testing {
+namespace {
+
+using std::chrono::milliseconds;
+using std::chrono::steady_clock;
+using ::testing::ElementsAre;
+
+/// One side of an item in the index. `flags` is none of deleted, ignored and invalid by default.
+std::string sideJson(const std::string& counters, const std::string& set = "") {
+    const auto flag = [&set](const std::string& name) {
+        return "\"" + name + "\": " + (name == set ? "true" : "false");
+    };
+    return "{" + flag("deleted") + "," + flag("ignored") + "," + flag("invalid") +
+           ", \"version\": " + counters + "}";
+}
+
+std::string indexJson(const std::string& local, const std::string& global) {
+    return "{\"availability\": [], \"global\": " + global + ", \"local\": " + local + "}";
+}
+
+std::string neededJson(const std::vector<std::string>& names, bool deleted = false) {
+    std::string items;
+    for (const std::string& name : names)
+        items += std::string(items.empty() ? "" : ",") + "{\"name\": \"" + name +
+                 "\", \"deleted\": " + (deleted ? "true" : "false") + "}";
+    return "{\"page\": 1, \"progress\": [], \"queued\": [" + items + "], \"rest\": []}";
+}
+
+std::string okReply(const std::string& body) {
+    return "HTTP/1.0 200 OK\r\nContent-Type: application/json\r\nContent-Length: " +
+           std::to_string(body.size()) + "\r\n\r\n" + body;
+}
+
+const std::string kOne = "[\"ABC:1\"]";
+const std::string kTwo = "[\"ABC:1\", \"DEF:7\"]";
+const std::string kInStep = indexJson(sideJson(kOne), sideJson(kOne));
+
+/// A root with Syncthing's mark, whose REST interface a stand-in serves.
+class SyncthingStatus : public ::testing::Test {
+protected:
+    SyncthingStatus() {
+        m_folder.write("root/.stfolder/x", "");
+        m_folder.write("root/a.epub", "content");
+    }
+
+    /// The configuration names the stand-in's address, unless another is given.
+    void configure(const std::string& address = "", const std::string& guiAttributes = "") {
+        m_folder.write(
+            "config/syncthing/config.xml",
+            "<configuration version=\"36\"><folder id=\"other\" path=\"/nowhere\"/>" +
+                ("<folder id=\"my books\" path=\"" + m_path + "\"/>") + "<gui enabled=\"true\" " +
+                guiAttributes + "><address>" +
+                (address.empty() ? "127.0.0.1:" + std::to_string(m_server->port()) : address) +
+                "</address><apikey>" + m_apiKey + "</apikey></gui></configuration>");
+    }
+    void serveRaw(StandInServer::Serve serve) {
+        m_server.emplace(std::move(serve));
+        configure();
+    }
+    /// Gives each request its reply, by the start of the resource that it asks for.
+    void serve(std::map<std::string, std::string> replies) {
+        serveRaw([this, replies = std::move(replies)](StandInConnection& connection) {
+            std::string request;
+            connection.readLine(request);
+            std::string header;
+            for (std::string line; connection.readLine(line) && line != "\r";)
+                header += line;
+            {
+                const std::lock_guard lock(m_mutex);
+                m_requests.push_back(request.substr(0, request.find_last_of(' ')));
+                m_header = header;
+            }
+            for (const auto& [start, reply] : replies)
+                if (request.starts_with("GET " + start))
+                    connection.send(reply);
+        });
+    }
+    void serveFile(const std::string& body) { serve({{"/rest/db/file", okReply(body)}}); }
+
+    std::optional<DownloadingStatus> status(std::string_view name = "root/a.epub") {
+        std::optional<DownloadingStatus> result = DownloadingStatus::NotDownloaded;
+        const auto begin = steady_clock::now();
+        EXPECT_TRUE(m_store.downloadingStatus(m_folder.url(name), result, nullptr));
+        m_took = std::chrono::ceil<milliseconds>(steady_clock::now() - begin);
+        return result;
+    }
+    std::string reason(std::string_view name = "root/a.epub") {
+        return m_store.report(m_folder.url(name), nullptr).value().reason;
+    }
+
+    TemporaryDirectory m_folder;
+    EnvironmentValue m_state{"XDG_STATE_HOME", m_folder / "state"};
+    EnvironmentValue m_config{"XDG_CONFIG_HOME", m_folder / "config"};
+    std::string m_path = m_folder / "root";
+    std::string m_apiKey = "key-123";
+    host::HostCloudStore m_store{host::CloudWaits{milliseconds(400), milliseconds(0),
+                                                  milliseconds(1500), milliseconds(60'000)}};
+    milliseconds m_took{0};
+    std::mutex m_mutex;
+    std::vector<std::string> m_requests;
+    std::string m_header;
+    std::optional<StandInServer> m_server;
+};
+
+TEST_F(SyncthingStatus, TheNewestVersionIsCurrent) {
+    serveFile(kInStep);
+
+    EXPECT_EQ(status(), DownloadingStatus::Current);
+    EXPECT_THAT(m_requests, ElementsAre("GET /rest/db/file?folder=my%20books&file=a.epub"));
+    EXPECT_EQ(m_header, "Host: localhost\rX-API-Key: key-123\r");
+}
+
+TEST_F(SyncthingStatus, AnOlderVersionIsDownloaded) {
+    serveFile(indexJson(sideJson(kOne), sideJson(kTwo)));
+
+    EXPECT_EQ(status(), DownloadingStatus::Downloaded);
+}
+
+TEST_F(SyncthingStatus, AFileThatTheIndexDoesNotHoldYetIsDownloaded) {
+    serve({{"/rest/db/file", "HTTP/1.0 404 Not Found\r\n\r\nNo such object in the index\n"}});
+
+    EXPECT_EQ(status(), DownloadingStatus::Downloaded);
+    EXPECT_EQ(reason(), "the client does not know the item yet");
+}
+
+TEST_F(SyncthingStatus, AFileThatStandsIsAllHereThoughTheIndexHasAnotherOfItsName) {
+    serveFile(indexJson(sideJson("[]"), sideJson(kOne)));
+
+    EXPECT_EQ(status(), DownloadingStatus::Downloaded);
+}
+
+TEST_F(SyncthingStatus, AFileThatThePatternsLeaveOutIsDownloaded) {
+    serveFile(indexJson(sideJson(kOne, "ignored"), sideJson(kOne)));
+
+    EXPECT_EQ(status(), DownloadingStatus::Downloaded);
+    EXPECT_EQ(reason(), "the client leaves the item out");
+}
+
+TEST_F(SyncthingStatus, AFileThatIsStillToComeIsAPromise) {
+    serveFile(indexJson(sideJson("[]"), sideJson(kOne)));
+
+    EXPECT_TRUE(m_store.isPromisedItemReachable(m_folder.url("root/b.epub"), nullptr));
+    EXPECT_EQ(status("root/b.epub"), DownloadingStatus::NotDownloaded);
+}
+
+TEST_F(SyncthingStatus, ADeletedFileIsNoPromise) {
+    serveFile(indexJson(sideJson(kOne, "deleted"), sideJson(kOne, "deleted")));
+    std::optional<Error> error;
+
+    EXPECT_FALSE(m_store.isPromisedItemReachable(m_folder.url("root/b.epub"), &error));
+    ASSERT_TRUE(error);
+    EXPECT_EQ(error->code(), 4);
+}
+
+TEST_F(SyncthingStatus, APackageIsNotDownloadedWhileAMemberIsNeeded) {
+    m_folder.write("root/p.epub/mimetype", "");
+    serve({{"/rest/db/file", okReply(kInStep)},
+           {"/rest/db/need", okReply(neededJson({"x", "p.epub/OPS/book.opf"}))}});
+
+    EXPECT_EQ(status("root/p.epub"), DownloadingStatus::NotDownloaded);
+}
+
+TEST_F(SyncthingStatus, APackageOfWhichNothingIsNeededIsCurrent) {
+    m_folder.write("root/p.epub/mimetype", "");
+    serve({{"/rest/db/file", okReply(kInStep)},
+           {"/rest/db/need", okReply(neededJson({"p.epub2/x", "p.epu"}))}});
+
+    EXPECT_EQ(status("root/p.epub"), DownloadingStatus::Current);
+}
+
+TEST_F(SyncthingStatus, APackageThatOnlyLosesAMemberIsHere) {
+    m_folder.write("root/p.epub/mimetype", "");
+    serve({{"/rest/db/file", okReply(kInStep)},
+           {"/rest/db/need", okReply(neededJson({"p.epub/old"}, /*deleted=*/true))}});
+
+    EXPECT_EQ(status("root/p.epub"), DownloadingStatus::Current);
+}
+
+TEST_F(SyncthingStatus, TheNextPagesOfWhatIsNeededAreReadToo) {
+    m_folder.write("root/p.epub/mimetype", "");
+    serve({{"/rest/db/file", okReply(kInStep)},
+           {"/rest/db/need?folder=my%20books&perpage=1000&page=1 ",
+            okReply(neededJson(std::vector<std::string>(1000, "x")))},
+           {"/rest/db/need?folder=my%20books&perpage=1000&page=2 ",
+            okReply(neededJson({"p.epub/y"}))}});
+
+    EXPECT_EQ(status("root/p.epub"), DownloadingStatus::NotDownloaded);
+}
+
+TEST_F(SyncthingStatus, AFolderThatNeedsWithoutEndGivesNoStatusOfPackages) {
+    m_folder.write("root/p.epub/mimetype", "");
+    serve({{"/rest/db/file", okReply(kInStep)},
+           {"/rest/db/need", okReply(neededJson(std::vector<std::string>(1000, "x")))}});
+
+    EXPECT_EQ(status("root/p.epub"), std::nullopt);
+}
+
+TEST_F(SyncthingStatus, AWrongAnswerGivesNoStatus) {
+    std::string deep(100'000, '[');
+    for (const std::string& reply :
+         {okReply("{}"), okReply("[]"), okReply("null"), okReply("{\"local\": 1}"),
+          okReply(kInStep.substr(1)), okReply(kInStep + "x"), okReply(deep),
+          okReply(indexJson("{}", sideJson(kOne))),
+          okReply(indexJson(sideJson("3"), sideJson(kOne))),
+          std::string("HTTP/1.0 403 Forbidden\r\n\r\n"), std::string("nonsense"),
+          std::string("HTTP/1.0 200 OK\r\nContent-Length: 5\r\n\r\n") + kInStep,
+          std::string("HTTP/1.0 200 OK\r\ncontent-length: 99999999999999999999\r\n\r\n{}"),
+          std::string("HTTP/1.0 2\r\n\r\n"), std::string("HTTP/1.")}) {
+        serve({{"/rest/db/file", reply}});
+
+        EXPECT_EQ(status(), std::nullopt) << reply.substr(0, 200);
+        EXPECT_EQ(reason(), "the client's answer is not understood") << reply.substr(0, 200);
+    }
+}
+
+TEST_F(SyncthingStatus, AnAnswerWithoutEndGivesNoStatus) {
+    serveRaw([](StandInConnection& connection) {
+        connection.send("HTTP/1.0 200 OK\r\n\r\n");
+        while (connection.send(std::string(65'536, ' '))) {
+        }
+    });
+
+    EXPECT_EQ(status(), std::nullopt);
+}
+
+TEST_F(SyncthingStatus, ASilentClientGivesNoStatusWithinTheWait) {
+    serveRaw([](StandInConnection& connection) { connection.waitForEnd(); });
+
+    EXPECT_EQ(status(), std::nullopt);
+    EXPECT_LT(m_took, milliseconds(1500));
+}
+
+TEST_F(SyncthingStatus, AClientThatDripsItsAnswerGivesNoStatusWithinTheWait) {
+    serveRaw([](StandInConnection& connection) {
+        while (connection.send("x"))
+            std::this_thread::sleep_for(milliseconds(20));
+    });
+
+    EXPECT_EQ(status(), std::nullopt);
+    EXPECT_LT(m_took, milliseconds(1500));
+}
+
+TEST_F(SyncthingStatus, AClientThatClosesLeavesWhatTheDiskShows) {
+    serveRaw([](StandInConnection&) {});
+
+    EXPECT_EQ(status(), DownloadingStatus::Downloaded);
+}
+
+TEST_F(SyncthingStatus, AClientThatDoesNotRunLeavesWhatTheDiskShows) {
+    serveFile(kInStep);
+    m_server.reset();
+
+    EXPECT_EQ(status(), DownloadingStatus::Downloaded);
+    EXPECT_EQ(reason(), "the client does not run");
+}
+
+TEST_F(SyncthingStatus, WithoutAConfigurationWhatTheDiskShowsCounts) {
+    EXPECT_EQ(status(), DownloadingStatus::Downloaded);
+    EXPECT_EQ(reason(), "the client's configuration has no such folder");
+}
+
+TEST_F(SyncthingStatus, ADamagedConfigurationIsNone) {
+    for (const char* text : {"", "<configuration", "<configuration/>", "<a><folder/></a>"}) {
+        m_folder.write("config/syncthing/config.xml", text);
+
+        EXPECT_EQ(status(), DownloadingStatus::Downloaded) << text;
+    }
+}
+
+TEST_F(SyncthingStatus, TheKeyIsNotSentToAnotherMachineNorOverTLS) {
+    serveFile(kInStep);
+    const std::string port = ":" + std::to_string(m_server->port());
+    for (const std::string& address :
+         {"192.0.2.1" + port, "example.org" + port, "[2001:db8::1]" + port,
+          std::string("127.0.0.1"), std::string("127.0.0.1:x"), std::string("127.0.0.1:0"),
+          std::string("/run/syncthing")}) {
+        configure(address);
+
+        EXPECT_EQ(status(), DownloadingStatus::Downloaded) << address;
+    }
+    configure("", "tls=\"true\"");
+    EXPECT_EQ(status(), DownloadingStatus::Downloaded);
+    EXPECT_EQ(m_server->connections(), 0);
+}
+
+TEST_F(SyncthingStatus, AnInterfaceThatListensEverywhereIsAskedOnTheLoopback) {
+    serveFile(kInStep);
+    const std::string port = ":" + std::to_string(m_server->port());
+    for (const std::string& address : {"0.0.0.0" + port, port, "localhost" + port}) {
+        configure(address);
+
+        EXPECT_EQ(status(), DownloadingStatus::Current) << address;
+    }
+}
+
+TEST_F(SyncthingStatus, AKeyThatWouldBreakItsHeaderIsNotSent) {
+    m_apiKey = "a&#13;&#10;X: b";
+    serveFile(kInStep);
+
+    EXPECT_EQ(status(), DownloadingStatus::Downloaded);
+    EXPECT_EQ(m_server->connections(), 0);
+}
+
+TEST_F(SyncthingStatus, AFolderInTheHomeMayBeWrittenWithATilde) {
+    const EnvironmentValue home("HOME", m_folder.path().string());
+    m_path = "~/root";
+    serveFile(kInStep);
+
+    EXPECT_EQ(status(), DownloadingStatus::Current);
+}
+
+TEST_F(SyncthingStatus, AFolderBelowAndALinkToItArePathsInTheSameFolder) {
+    m_folder.write("root/deep/ü b.epub", "content");
+    std::filesystem::create_directory_symlink("root/deep", m_folder / "link");
+    serveFile(kInStep);
+
+    EXPECT_EQ(status("link/ü b.epub"), DownloadingStatus::Current);
+    EXPECT_THAT(m_requests, ElementsAre("GET /rest/db/file?folder=my%20books&file="
+                                        "deep%2F%C3%BC%20b.epub"));
+}
+
+TEST_F(SyncthingStatus, AnItemThatDoesNotComeInTimeFailsTheDownload) {
+    m_folder.write("root/p.epub/mimetype", "");
+    serve({{"/rest/db/file", okReply(kInStep)},
+           {"/rest/db/need", okReply(neededJson({"p.epub/x"}))}});
+    std::optional<Error> error;
+    const auto begin = steady_clock::now();
+
+    EXPECT_FALSE(m_store.fetchContent(m_folder.url("root/p.epub"), &error));
+
+    EXPECT_LT(steady_clock::now() - begin, milliseconds(4000));
+    ASSERT_TRUE(error);
+    EXPECT_EQ(error->code(), ETIMEDOUT);
+    EXPECT_EQ(*error->url(), m_folder.url("root/p.epub"));
+}
+
+}  // namespace
+}  // namespace parvel::testing

@@ -1,12 +1,11 @@
 #include "cli/AssetRecord.h"
 #include "cli/Batch.h"
 #include "cli/Command.h"
+#include "cli/DryRun.h"
 #include "cli/OutputOptions.h"
 #include "cli/PathSource.h"
 #include "cli/PropertyValue.h"
-#include "parvel/filemanager/PVAssetMetadataFileManager.h"
 #include "parvel/metadata/PVMutableAssetMetadata.h"
-#include "parvel/platform/Rehearsal.h"
 #include "parvel/xattr/ExtendedAttributes.h"
 #include "parvel/xattr/PNMetadataXattr.h"
 
@@ -24,10 +23,10 @@ private:
     [[nodiscard]] Result update(const std::string& path) const;
 
     bool m_write = false;
-    bool m_dryRun = false;
     std::vector<std::string> m_updates;
     std::vector<PropertyValue> m_updateValues;
     std::optional<std::string> m_jobs;
+    DryRun m_dryRun;
     AssetRecord m_record{Uninspectable::HasItsURLAlone};
     OutputOptions m_output;
     PathOptions m_paths;
@@ -40,8 +39,8 @@ void AttributesCommand::declare(CommandLine& line) {
               "change KEY of the record to VALUE, and write what then\n"
               "differs of title, author, genre and the explicit mark",
               m_updates);
-    line.flag("--dry-run", "say what would be written, and write nothing", m_dryRun);
     m_record.declare(line);
+    m_dryRun.declare(line);
     m_paths.declare(line);
     line.option("-j,--jobs", "N", "read N files at once; one a core if not given", m_jobs);
     line.exclusive({"--write", "--update", "--jobs"});
@@ -54,9 +53,7 @@ int AttributesCommand::run(std::vector<std::string> operands) {
     BatchOptions options{.command = "attributes", .form = m_output.form()};
     for (const std::string& update : m_updates)
         m_updateValues.push_back(PropertyValue::fromText("--update", update));
-    std::optional<Rehearsal> rehearsal;
-    if (m_dryRun)
-        rehearsal.emplace();
+    m_dryRun.begin();
     const bool reads = !m_write && m_updates.empty();
     // What is written is written in the order given.
     options.jobs = reads ? jobsFromOption(m_jobs) : 1;
@@ -93,8 +90,8 @@ Result AttributesCommand::read(const std::string& path) const {
     result.nothing = "its attributes can't be read";
     const AssetPtr asset = m_record.forResult(result);
     result.assetID = asset->assetID();
-    if (auto attributes = PVAssetMetadataFileManager::init()->extendedAttributesForAsset_error(
-            asset, &result.error))
+    if (auto attributes =
+            m_dryRun.makeManager()->extendedAttributesForAsset_error(asset, &result.error))
         result.record = std::make_shared<const Dictionary>(std::move(*attributes));
     else if (std::optional<Error> error; !keptIdentity(urlOfPath(path), error) && error)
         result.reason = error->message();
@@ -104,8 +101,8 @@ Result AttributesCommand::read(const std::string& path) const {
 Result AttributesCommand::write(const std::string& path) const {
     Result result = resultForPath(path);
     const AssetPtr asset = m_record.forResult(result);
-    const bool written = PVAssetMetadataFileManager::init()->setExtendedAttributesForAsset_error(
-        asset, &result.error);
+    const bool written =
+        m_dryRun.makeManager()->setExtendedAttributesForAsset_error(asset, &result.error);
     result.fields.push_back({"written", Number::boolean(written)});
     setRecord(result, asset, PVAssetMetadataFlavorFull);
     result.advice = "nothing in it or on it says which asset it is; --record can say it";
@@ -125,8 +122,8 @@ Result AttributesCommand::update(const std::string& path) const {
         copy.combineWithMetadata(updates.get());
         copy.setUrl(asset->url());  // its extension as it was typed
     });
-    const bool written = PVAssetMetadataFileManager::init()->updateExtendedAttributesForAsset_error(
-        changed, &result.error);
+    const bool written =
+        m_dryRun.makeManager()->updateExtendedAttributesForAsset_error(changed, &result.error);
     result.fields.push_back({"written", Number::boolean(written)});
     setRecord(result, changed, PVAssetMetadataFlavorFull);
     if (result.error && result.error->domain() == PVParvelFoundationErrorDomain)

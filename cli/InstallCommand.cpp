@@ -93,7 +93,7 @@ int InstallCommand::run(std::vector<std::string> operands) {
     m_form = m_progress.form();
     if (!m_into)
         throw UsageError("say where to: --into DIR");
-    m_folder = urlOfPath(*m_into);
+    m_folder = urlOfOption("--into", *m_into);
     m_changes.setTarget(m_folder);
     if (m_updatingPath) {
         if (!m_changes.hasOnePath(operands))

@@ -39,7 +39,7 @@ int UpdateCommand::run(std::vector<std::string> operands) {
     m_changes.begin();
     if (!m_into)
         throw UsageError("say where to: --into DIR");
-    m_folder = urlOfPath(*m_into);
+    m_folder = urlOfOption("--into", *m_into);
     m_changes.setTarget(m_folder);
     if (m_existingPath) {
         if (!m_changes.hasOnePath(operands))

@@ -6,6 +6,7 @@
 #include <sys/syscall.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <filesystem>
 #include <map>
@@ -38,8 +39,9 @@ long missingFile() {
         Answer wanted;
         wanted.reply.outcome = Outcome::FontsWanted;
         wanted.reply.number = request->number;
-        wanted.reply.spentMilliseconds =
-            static_cast<std::uint32_t>(drawingMilliseconds - endProcessorTimeLimit());
+        // The kernel rounds a timer up, so what is left may be more than was given.
+        const int left = std::min(endProcessorTimeLimit(), drawingMilliseconds);
+        wanted.reply.spentMilliseconds = static_cast<std::uint32_t>(drawingMilliseconds - left);
         static_cast<void>(send(wanted));
         ::_exit(0);
     }

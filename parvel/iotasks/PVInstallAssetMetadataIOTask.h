@@ -21,6 +21,7 @@ public:
     PVInstallAssetMetadataIOTask(Construction construction, AssetPtr sourceMetadata,
                                  std::shared_ptr<PVAssetMetadataFileManager> manager,
                                  std::shared_ptr<PVAssetMetadataIOTask> subtask);
+    /// Manager and subtask must be there.
     static std::shared_ptr<PVInstallAssetMetadataIOTask> initWithSourceMetadata_manager_subtask(
         AssetPtr sourceMetadata, std::shared_ptr<PVAssetMetadataFileManager> manager,
         std::shared_ptr<PVAssetMetadataIOTask> subtask);

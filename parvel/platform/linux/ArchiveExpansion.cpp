@@ -105,19 +105,16 @@ class FoldersBelow {
 public:
     explicit FoldersBelow(FileDescriptor root) : m_root(std::move(root)) {}
 
-    [[nodiscard]] int root() const { return m_root.get(); }
-
     /// The open folder of that path, made with those on the way to it; negative with errno set.
     [[nodiscard]] int open(std::string_view path) {
         if (path.empty())
             return m_root.get();
         if (m_last && path == m_lastPath)
             return m_last.get();
-        const std::string wanted(path);
-        m_last = openBeneath(m_root.get(), wanted.c_str(), O_PATH | O_DIRECTORY);
+        m_lastPath = path;
+        m_last = openBeneath(m_root.get(), m_lastPath.c_str(), O_PATH | O_DIRECTORY);
         if (!m_last && errno == ENOENT)
-            m_last = make(wanted);
-        m_lastPath = wanted;
+            m_last = make(m_lastPath);
         return m_last.get();
     }
 
@@ -188,8 +185,8 @@ private:
                    const std::string& path) {
         const std::size_t slash = name.rfind('/');
         const bool isAtTop = slash == std::string_view::npos;
-        const int folder = m_folders.open(isAtTop ? "" : name.substr(0, slash));
         const std::string last(isAtTop ? name : name.substr(slash + 1));
+        const int folder = m_folders.open(isAtTop ? "" : name.substr(0, slash));
         FileDescriptor file;
         if (folder >= 0)
             file = FileDescriptor(::openat(
@@ -255,7 +252,8 @@ int checkClaims(const OpenArchive& source, const std::string& destination) {
     if (stored > source.size)
         return EBADMSG;
     struct statvfs room {};
-    const bool isKnown = ::statvfs(parentFolderOf(destination).c_str(), &room) == 0;
+    const bool isKnown = ::statvfs(parentFolderOf(destination).c_str(), &room) == 0 &&
+                         room.f_frsize > 0 && room.f_blocks > 0;
     return isKnown && content / room.f_frsize > room.f_bavail ? ENOSPC : 0;
 }
 

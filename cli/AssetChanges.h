@@ -31,6 +31,7 @@ public:
     /// Declares --force; without it no folder that is no asset is lost.
     void declareForce(CommandLine& line, std::string_view help);
     [[nodiscard]] bool isForced() const { return m_isForced; }
+    [[nodiscard]] bool isDryRun() const { return m_dryRun.isAsked(); }
     /// Assets that lie in the folder already are left out where a PATH's subfolders are searched.
     void setTarget(const URL& folder) { m_paths.target = folder; }
     /// Whether there is but one PATH among the operands, and no other source of PATHs.

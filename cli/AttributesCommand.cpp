@@ -1,7 +1,13 @@
+#include <cstring>
+
 #include "cli/AssetRecord.h"
 #include "cli/Batch.h"
 #include "cli/Command.h"
 #include "cli/DryRun.h"
+#include "cli/Interrupt.h"
+#include "cli/KeptAttributes.h"
+#include "cli/Messages.h"
+#include "cli/Output.h"
 #include "cli/OutputOptions.h"
 #include "cli/PathSource.h"
 #include "cli/PropertyValue.h"
@@ -21,10 +27,16 @@ private:
     [[nodiscard]] Result read(const std::string& path) const;
     [[nodiscard]] Result write(const std::string& path) const;
     [[nodiscard]] Result update(const std::string& path) const;
+    [[nodiscard]] Result dump(const std::string& path);
+    [[nodiscard]] Result apply(const std::string& path) const;
+    [[nodiscard]] Result resultOf(const std::string& path);
 
     bool m_write = false;
     std::vector<std::string> m_updates;
     std::vector<PropertyValue> m_updateValues;
+    std::optional<std::string> m_dumpFile;
+    std::optional<std::string> m_applyFile;
+    KeptAttributes m_kept;
     std::optional<std::string> m_jobs;
     DryRun m_dryRun;
     AssetRecord m_record{Uninspectable::HasItsURLAlone};
@@ -39,11 +51,17 @@ void AttributesCommand::declare(CommandLine& line) {
               "change KEY of the record to VALUE, and write what then\n"
               "differs of title, author, genre and the explicit mark",
               m_updates);
+    line.option("--dump", "FILE", "keep the attributes of all assets in FILE", m_dumpFile);
+    line.option("--apply", "FILE",
+                "write the attributes that FILE keeps for the same assets,\n"
+                "wherever they lie now",
+                m_applyFile);
     m_record.declare(line);
     m_dryRun.declare(line);
     m_paths.declare(line);
     line.option("-j,--jobs", "N", "read N files at once; one a core if not given", m_jobs);
-    line.exclusive({"--write", "--update", "--jobs"});
+    line.exclusive({"--write", "--update", "--dump", "--apply"});
+    line.exclusive({"--write", "--update", "--apply", "--jobs"});
     m_output.declare(line);
 }
 
@@ -53,17 +71,33 @@ int AttributesCommand::run(std::vector<std::string> operands) {
     BatchOptions options{.command = "attributes", .form = m_output.form()};
     for (const std::string& update : m_updates)
         m_updateValues.push_back(PropertyValue::fromText("--update", update));
+    if (m_applyFile)
+        m_kept.read(*m_applyFile);
     m_dryRun.begin();
-    const bool reads = !m_write && m_updates.empty();
+    const bool reads = !m_write && m_updates.empty() && !m_applyFile;
     // What is written is written in the order given.
     options.jobs = reads ? jobsFromOption(m_jobs) : 1;
-    options.makeText = reads ? makeAttributesFormat : makeOutcomeFormat;
+    options.makeText = reads && !m_dumpFile ? makeAttributesFormat : makeOutcomeFormat;
     PathSource source(std::move(operands), m_paths);
-    return runOverPaths(options, source, [this, reads](const std::string& path) {
-        if (reads)
-            return read(path);
-        return m_write ? write(path) : update(path);
-    });
+    const int status =
+        runOverPaths(options, source, [this](const std::string& path) { return resultOf(path); });
+    const int error =
+        m_dumpFile && !m_dryRun.isAsked() && !interrupted() ? m_kept.write(*m_dumpFile) : 0;
+    if (error == 0)
+        return status;
+    writeToStandardError(
+        problemLine("attributes", "--dump " + *m_dumpFile + ": " + strerrordesc_np(error)));
+    return kFailure;
+}
+
+Result AttributesCommand::resultOf(const std::string& path) {
+    if (m_write)
+        return write(path);
+    if (m_applyFile)
+        return apply(path);
+    if (m_dumpFile)
+        return dump(path);
+    return m_updates.empty() ? read(path) : update(path);
 }
 
 /// The identity that the file keeps. The error tells what the library's own read tells nobody.
@@ -129,6 +163,28 @@ Result AttributesCommand::update(const std::string& path) const {
     if (result.error && result.error->domain() == PVParvelFoundationErrorDomain)
         result.advice = adviceOnUpdate(urlOfPath(path));
     result.outcome = written ? "attributes updated" : "nothing to write";
+    return result;
+}
+
+Result AttributesCommand::dump(const std::string& path) {
+    Result result = read(path);
+    const bool keepsAny = result.record && !result.record->empty() && result.assetID;
+    if (keepsAny)
+        m_kept.add(*result.assetID, *result.record);
+    result.outcome = keepsAny ? "kept" : "keeps no attributes";
+    return result;
+}
+
+/// By the identity that the asset has now: one that a file keeps goes before what it holds.
+Result AttributesCommand::apply(const std::string& path) const {
+    Result result = resultForPath(path);
+    const AssetPtr asset = m_record.forResult(result);
+    setRecord(result, asset, PVAssetMetadataFlavorFull);
+    const Dictionary* kept = result.assetID ? m_kept.find(*result.assetID) : nullptr;
+    const bool written = kept && m_dryRun.makeManager()->_writeExtendedAttributes_url_error(
+                                     *kept, asset->url(), &result.error);
+    result.fields.push_back({"written", Number::boolean(written)});
+    result.outcome = written ? "has its attributes" : "none are kept for it";
     return result;
 }
 

@@ -52,6 +52,7 @@ std::unique_ptr<Command> makeInspectCommand();
 std::unique_ptr<Command> makeInstallCommand();
 std::unique_ptr<Command> makeMatchCommand();
 std::unique_ptr<Command> makeMoveCommand();
+std::unique_ptr<Command> makePackCommand();
 std::unique_ptr<Command> makeRedactCommand();
 std::unique_ptr<Command> makeRemoveCommand();
 std::unique_ptr<Command> makeRenameCommand();

@@ -19,6 +19,7 @@ std::span<const CommandEntry> commands() {
                      makeEditCommand},
         CommandEntry{"inflate", "PATH...", "Expand zipped books in their places.",
                      makeInflateCommand},
+        CommandEntry{"pack", "PATH", "Make a zipped book of a package folder.", makePackCommand},
         CommandEntry{"update", "NEW...", "Bring new versions of assets into the library.",
                      makeUpdateCommand},
         CommandEntry{"move", "PATH...", "Move assets to another place or into a folder.",

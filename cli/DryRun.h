@@ -16,6 +16,7 @@ public:
     /// Begins the rehearsal where one is asked for. It lasts as long as this object.
     void begin();
 
+    [[nodiscard]] bool isAsked() const { return m_isAsked; }
     [[nodiscard]] std::shared_ptr<PVAssetMetadataFileManager> makeManager() const;
 
 private:

@@ -89,13 +89,14 @@ std::optional<std::vector<Value>> valuesOf(const std::string& contents, std::str
 
 }  // namespace
 
+std::optional<std::vector<Value>> valuesFromFile(const std::string& path, std::string& problem) {
+    const auto contents = contentsOfFile(path, longestRecordFile, problem);
+    return contents ? valuesOf(*contents, problem) : std::nullopt;
+}
+
 std::optional<std::vector<StoredRecord>> recordsFromFile(const std::string& path,
                                                          std::string& problem) {
-    std::optional<std::string> contents = contentsOfFile(path, longestRecordFile, problem);
-    if (!contents)
-        return std::nullopt;
-    const auto values = valuesOf(*contents, problem);
-    contents.reset();
+    const auto values = valuesFromFile(path, problem);
     if (!values)
         return std::nullopt;
     std::vector<StoredRecord> records;

@@ -14,6 +14,9 @@ namespace parvel::cli {
 /// none, with the reason in `problem`.
 std::shared_ptr<const Dictionary> dictionaryFromFile(const std::string& path, std::string& problem);
 
+/// What a file of the same forms holds: an array's values, lines of JSON one by one, or one value.
+std::optional<std::vector<Value>> valuesFromFile(const std::string& path, std::string& problem);
+
 /// A record out of a file of many.
 struct StoredRecord {
     Dictionary record;

@@ -4,7 +4,7 @@ _parvel_options() {
     case $1 in
         '') echo '--log --version --json --help -h' ;;
         attributes)
-            echo '--write --update --dry-run --record --files-from --null -0 --recursive -r --jobs -j
+            echo '--write --update --dump --apply --dry-run --record --files-from --null -0 --recursive -r --jobs -j
                 --json --jsonl --plist --log --help -h'
             ;;
         check)
@@ -38,6 +38,10 @@ _parvel_options() {
         match) echo '--key --json --jsonl --plist --log --help -h' ;;
         move)
             echo '--to --into --replace --rename --asset-id-name --force --record --dry-run --files-from --null -0 --recursive -r
+                --json --jsonl --plist --log --help -h'
+            ;;
+        pack)
+            echo '--output -o --record --dry-run --files-from --null -0 --recursive -r
                 --json --jsonl --plist --log --help -h'
             ;;
         redact)
@@ -103,8 +107,8 @@ _parvel() {
         mapfile -t COMPREPLY < <(compgen -W "$(_parvel_options "$command")" -- "$current")
     elif [[ -z $command ]]; then
         mapfile -t COMPREPLY < <(compgen -W \
-            'attributes check cloud cover edit inflate inspect install match
-                move redact remove rename trash update' -- "$current")
+            'attributes check cloud cover edit inflate inspect install match move
+                pack redact remove rename trash update' -- "$current")
     else
         compopt -o filenames
         mapfile -t COMPREPLY < <(compgen -f -- "$current")

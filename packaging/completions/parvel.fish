@@ -2,7 +2,7 @@
 
 function __parvel_needs_command
     not __fish_seen_subcommand_from \
-        attributes check cloud cover edit inflate inspect install match move redact remove rename trash update
+        attributes check cloud cover edit inflate inspect install match move pack redact remove rename trash update
 end
 
 set -l levels 'off fault error default debug'
@@ -16,6 +16,7 @@ complete -c parvel -n __parvel_needs_command -f -a install -d 'Bring assets into
 complete -c parvel -n __parvel_needs_command -f -a edit -d 'Change titles, covers and more'
 complete -c parvel -n __parvel_needs_command -f -a inflate -d 'Expand zipped books'
 complete -c parvel -n __parvel_needs_command -f -a update -d 'Bring in new versions'
+complete -c parvel -n __parvel_needs_command -f -a pack -d 'Make a zipped book of a folder'
 complete -c parvel -n __parvel_needs_command -f -a move -d 'Move assets to another place'
 complete -c parvel -n __parvel_needs_command -f -a rename -d 'Name PDF documents after their display names'
 complete -c parvel -n __parvel_needs_command -f -a trash -d 'Move assets to the trash, or back'
@@ -28,28 +29,30 @@ complete -c parvel -n __parvel_needs_command -l json -d 'Print the version as JS
 complete -c parvel -l log -x -a $levels -d 'Print log lines'
 complete -c parvel -s h -l help -d 'Print the options'
 
-for command in attributes check cloud cover edit inflate inspect install match move redact remove rename trash update
+for command in attributes check cloud cover edit inflate inspect install match move pack redact remove rename trash update
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l json -d 'Print one JSON array'
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l jsonl -d 'Print lines of JSON'
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l plist -d 'Print a property list'
 end
 
-for command in attributes check cloud edit inflate inspect install move redact remove rename trash update
+for command in attributes check cloud edit inflate inspect install move pack redact remove rename trash update
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l files-from -r -d 'Read PATHs from a file'
     complete -c parvel -n "__fish_seen_subcommand_from $command" -s 0 -l null -d 'PATHs end with a NUL'
 end
 
-for command in attributes cloud edit inflate inspect install move redact remove rename trash update
+for command in attributes cloud edit inflate inspect install move pack redact remove rename trash update
     complete -c parvel -n "__fish_seen_subcommand_from $command" -s r -l recursive -d 'Take all assets below a folder'
 end
 
-for command in cloud edit inflate install move redact remove rename trash update
+for command in cloud edit inflate install move pack redact remove rename trash update
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l record -r -d 'Take the record from a file'
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l dry-run -d 'Touch nothing'
 end
 
 complete -c parvel -n '__fish_seen_subcommand_from attributes' -l write -d 'Write what the record says'
 complete -c parvel -n '__fish_seen_subcommand_from attributes' -l update -x -d 'Change KEY=VALUE and write that'
+complete -c parvel -n '__fish_seen_subcommand_from attributes' -l dump -r -d 'Keep the attributes in a file'
+complete -c parvel -n '__fish_seen_subcommand_from attributes' -l apply -r -d 'Write what a file keeps'
 complete -c parvel -n '__fish_seen_subcommand_from attributes' -l dry-run -d 'Write nothing'
 complete -c parvel -n '__fish_seen_subcommand_from attributes' -l record -r -d 'Take the record from a file'
 complete -c parvel -n '__fish_seen_subcommand_from attributes' -s j -l jobs -x -d 'How many at once'
@@ -116,3 +119,5 @@ for command in edit inflate install
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l direct -d 'Have a book made in its place'
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l force -d 'Lose what that costs'
 end
+
+complete -c parvel -n '__fish_seen_subcommand_from pack' -s o -l output -r -d 'The zipped book to make'

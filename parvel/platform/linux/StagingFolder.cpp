@@ -1,96 +1,81 @@
 #include "parvel/platform/linux/StagingFolder.h"
 
-#include <dirent.h>
-#include <fcntl.h>
-#include <sys/file.h>
-#include <sys/random.h>
 #include <sys/stat.h>
 
-#include <array>
-#include <memory>
-#include <vector>
+#include <chrono>
+#include <map>
+#include <mutex>
+#include <tuple>
 
-#include "parvel/foundation/URL.h"
-#include "parvel/platform/linux/ItemTree.h"
+#include "parvel/platform/linux/MountPlace.h"
+#include "parvel/platform/linux/Paths.h"
+#include "parvel/platform/linux/cloud/SyncedPlace.h"
 
 namespace parvel::host {
 
 namespace {
 
-constexpr std::string_view kStagingPrefix = ".parvel-stage-";
-constexpr int kStagingAttempts = 100;
+using Clock = std::chrono::steady_clock;
 
-/// Opens and locks the folder; closed when another holds it or it is gone.
-FileDescriptor lockedFolder(const std::string& path) {
-    FileDescriptor folder(::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
-    if (!folder || ::flock(folder.get(), LOCK_EX | LOCK_NB) != 0)
-        return {};
-    struct stat mine {};
-    struct stat named {};
-    const bool isStillThere = ::fstat(folder.get(), &mine) == 0 &&
-                              ::lstat(path.c_str(), &named) == 0 && mine.st_ino == named.st_ino &&
-                              mine.st_dev == named.st_dev;
-    return isStillThere ? std::move(folder) : FileDescriptor{};
+constexpr auto kTimeKnown = std::chrono::hours(1);
+constexpr std::size_t kMostFoldersKnown = 1000;
+
+/// Where items for a folder are staged, as it was found out at a time.
+struct KnownPlace {
+    std::string path;
+    Clock::time_point since;
+};
+
+/// Beside the root of the synchronised storage that the folder lies in, else the folder.
+std::string findPlaceFor(const std::string& folder) {
+    const auto root = markedRootAbove(folder);
+    if (!root)
+        return folder;
+    std::string beside = parentFolderOf(*root);
+    return mountPlaceOf(beside) == mountPlaceOf(folder) ? beside : folder;
 }
 
-void clearStale(const std::string& parent) {
-    std::vector<std::string> stale;
-    const std::unique_ptr<DIR, int (*)(DIR*)> listing(::opendir(parent.c_str()), &::closedir);
-    if (!listing)
-        return;
-    while (const dirent* entry = ::readdir(listing.get())) {
-        if (isStagingName(entry->d_name))
-            stale.emplace_back(pathAppending(parent, entry->d_name));
+/// The only thing that is remembered between two calls: finding out lists the folder and those
+/// above, which takes long where they are large.
+std::string placeFor(const std::string& folder) {
+    using Key = std::tuple<std::string, dev_t, ino_t>;
+    static std::mutex mutex;
+    static std::map<Key, KnownPlace> known;
+
+    struct stat status {};
+    if (::stat(folder.c_str(), &status) != 0)
+        return folder;
+    const Key key{folder, status.st_dev, status.st_ino};
+    const Clock::time_point now = Clock::now();
+    {
+        const std::lock_guard lock(mutex);
+        const auto found = known.find(key);
+        if (found != known.end() && now - found->second.since < kTimeKnown)
+            return found->second.path;
     }
-    for (const std::string& path : stale) {
-        struct stat status {};
-        if (::lstat(path.c_str(), &status) != 0 || status.st_uid != ::geteuid())
-            continue;
-        if (const FileDescriptor lock = lockedFolder(path))
-            (void)removeTree(path);
-    }
+    std::string place = findPlaceFor(folder);
+    clearStaleItems(folder);
+    if (place != folder)
+        clearStaleItems(place);
+    const std::lock_guard lock(mutex);
+    if (known.size() >= kMostFoldersKnown)
+        known.clear();
+    known[key] = {place, now};
+    return place;
 }
 
 }  // namespace
 
-std::string randomName(std::string_view prefix) {
-    static constexpr std::string_view letters = "abcdefghijklmnopqrstuvwxyz234567";
-    std::array<unsigned char, 12> bytes{};
-    // Twelve bytes come whole; a name that is taken all the same is only tried again.
-    if (::getrandom(bytes.data(), bytes.size(), 0) < 0)
-        bytes.fill(static_cast<unsigned char>(::getpid()));
-    std::string name(prefix);
-    for (const unsigned char byte : bytes)
-        name += letters[byte % letters.size()];
-    return name;
-}
-
-bool isStagingName(std::string_view name) {
-    return name.starts_with(kStagingPrefix);
-}
-
 std::optional<StagingFolder> StagingFolder::makeIn(const std::string& parent, int& error) {
-    clearStale(parent);
-    for (int attempt = 0; attempt < kStagingAttempts; ++attempt) {
-        std::string path = pathAppending(parent, randomName(kStagingPrefix));
-        if (::mkdir(path.c_str(), 0700) != 0) {
-            if (errno == EEXIST)
-                continue;
-            error = errno;
-            return std::nullopt;
-        }
-        // Another process may have cleared the folder before it was locked; then the next name.
-        if (FileDescriptor folder = lockedFolder(path))
-            return StagingFolder(std::move(path), std::move(folder));
-        ::rmdir(path.c_str());
+    const std::string place = placeFor(parent);
+    if (place != parent) {
+        if (auto beside = HiddenItem::makeFolderIn(place, error))
+            return StagingFolder(std::move(*beside));
     }
-    error = EBUSY;
-    return std::nullopt;
-}
-
-StagingFolder::~StagingFolder() {
-    if (m_descriptor)
-        (void)removeTree(m_path);
+    auto item = HiddenItem::makeFolderIn(parent, error);
+    if (!item)
+        return std::nullopt;
+    return StagingFolder(std::move(*item));
 }
 
 }  // namespace parvel::host

@@ -2,40 +2,29 @@
 
 #include <optional>
 #include <string>
-#include <string_view>
+#include <utility>
 
-#include "parvel/platform/linux/FileDescriptor.h"
+#include "parvel/platform/linux/HiddenItem.h"
 
 namespace parvel::host {
 
-/// A hidden folder `.parvel-stage-<random>`, beside a target and so on its file system, in which an
-/// item is made before it gets its final name. It is locked while its owner lives and removed, with
-/// what is left in it, when the owner goes; what a killed process left unlocked is cleared by the
-/// next one that stages in the same place.
+/// A hidden, locked folder on a target's file system, in which an item is made before it gets its
+/// final name. It goes with its owner, with what is left in it.
 class StagingFolder {
 public:
-    /// Makes one in `parent`, after clearing stale ones there; none, with errno in `error`.
+    /// Makes one for items that will stand in `parent`: there or, where that is synchronised
+    /// storage, beside the storage's root if that lies on the same file system and can be written,
+    /// so that no client sees it. What killed processes left in the place is cleared before, by a
+    /// process once an hour. None, with errno in `error`.
     static std::optional<StagingFolder> makeIn(const std::string& parent, int& error);
 
-    StagingFolder(StagingFolder&&) noexcept = default;
-    StagingFolder& operator=(StagingFolder&&) = delete;
-    ~StagingFolder();
-
-    [[nodiscard]] const std::string& path() const { return m_path; }
-    [[nodiscard]] int descriptor() const { return m_descriptor.get(); }
+    [[nodiscard]] const std::string& path() const { return m_item.path(); }
+    [[nodiscard]] int descriptor() const { return m_item.descriptor(); }
 
 private:
-    StagingFolder(std::string path, FileDescriptor descriptor)
-        : m_path(std::move(path)), m_descriptor(std::move(descriptor)) {}
+    explicit StagingFolder(HiddenItem item) : m_item(std::move(item)) {}
 
-    std::string m_path;
-    FileDescriptor m_descriptor;  ///< holds the lock
+    HiddenItem m_item;
 };
-
-/// The prefix and twelve letters and digits by chance.
-[[nodiscard]] std::string randomName(std::string_view prefix);
-
-/// Whether a name, one path component, is that of a staging folder.
-[[nodiscard]] bool isStagingName(std::string_view name);
 
 }  // namespace parvel::host

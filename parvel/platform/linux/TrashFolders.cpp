@@ -16,33 +16,19 @@
 #include <memory>
 
 #include "parvel/foundation/URL.h"
+#include "parvel/platform/linux/MountPlace.h"
 #include "parvel/platform/linux/Paths.h"
 
 namespace parvel::host {
 
 namespace {
 
-/// Which mount and file system something lies on.
-struct Place {
-    std::uint64_t mount;
-    std::uint32_t major;
-    std::uint32_t minor;
-    friend bool operator==(const Place&, const Place&) = default;
-};
-
-std::optional<Place> placeOf(const std::string& path) {
-    struct statx status {};
-    if (::statx(AT_FDCWD, path.c_str(), AT_SYMLINK_NOFOLLOW, STATX_MNT_ID, &status) != 0)
-        return std::nullopt;
-    return Place{status.stx_mnt_id, status.stx_dev_major, status.stx_dev_minor};
-}
-
 /// The place that a folder has, or would have once it is made.
-std::optional<Place> placeOfFolder(std::string path) {
-    std::optional<Place> place = placeOf(path);
+std::optional<MountPlace> placeOfFolder(std::string path) {
+    std::optional<MountPlace> place = mountPlaceOf(path);
     while (!place && errno == ENOENT && path != "/") {
         path = parentFolderOf(path);
-        place = placeOf(path);
+        place = mountPlaceOf(path);
     }
     return place;
 }
@@ -66,11 +52,11 @@ TrashFolder homeTrash() {
 }
 
 /// The topmost folder of the mount that the item lies on.
-std::string topDirectoryOf(const std::string& parent, const Place& place) {
+std::string topDirectoryOf(const std::string& parent, const MountPlace& place) {
     std::string top = parent;
     while (top != "/") {
         std::string above = parentFolderOf(top);
-        if (placeOf(above) != place)
+        if (mountPlaceOf(above) != place)
             break;
         top = std::move(above);
     }
@@ -129,14 +115,14 @@ std::optional<TrashPlan> planTrash(const std::string& item) {
     auto absolute = resolvedPath(item);
     if (!absolute)
         return std::nullopt;
-    const auto place = placeOf(*absolute);
+    const auto place = mountPlaceOf(*absolute);
     if (!place)
         return std::nullopt;
     const TrashFolder home = homeTrash();
     TrashPlan plan{{}, std::move(*absolute)};
     // An item may be the top of its own mount; then only a copy can trash it.
     const std::string folder = parentFolderOf(plan.absolute);
-    if (placeOfFolder(home.path) != place && placeOf(folder) == place)
+    if (placeOfFolder(home.path) != place && mountPlaceOf(folder) == place)
         plan.folders = volumeTrashes(topDirectoryOf(folder, *place));
     plan.folders.push_back(home);
     return plan;

@@ -126,4 +126,16 @@ std::optional<SyncedPlace> desktopPlaceOf(const std::string& path,
     });
 }
 
+std::optional<std::string> markedRootAbove(const std::string& folder) {
+    const std::unique_ptr<char, void (*)(void*)> real(::realpath(folder.c_str(), nullptr), &::free);
+    std::optional<std::string> root;
+    std::string name;
+    for (std::string path = real ? real.get() : "/"; path != "/"; path = parentFolderOf(path)) {
+        const FileDescriptor opened = openFolder(AT_FDCWD, path.c_str(), O_PATH);
+        if (opened && syncMarkOf(opened.get(), name) != SyncMark::None)
+            root = path;
+    }
+    return root;
+}
+
 }  // namespace parvel::host

@@ -44,4 +44,7 @@ struct SyncedPlace {
 [[nodiscard]] std::optional<SyncedPlace> desktopPlaceOf(const std::string& path,
                                                         const std::vector<DesktopRoot>& desktop);
 
+/// The outermost marked root that the folder is or lies below, links resolved; none elsewhere.
+[[nodiscard]] std::optional<std::string> markedRootAbove(const std::string& folder);
+
 }  // namespace parvel::host

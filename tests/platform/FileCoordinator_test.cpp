@@ -197,6 +197,18 @@ TEST_F(Coordination, AFolderThatOthersMayWriteIsNotUsedForLocks) {
     EXPECT_TRUE(fs::is_empty(m_folder / "parvel-coord"));
 }
 
+TEST_F(Coordination, AProcessThatWasNotToldOfTheSessionMeetsTheOthersThere) {
+    const fs::path session = "/run/user/" + std::to_string(geteuid());
+    if (!fs::is_directory(session))
+        GTEST_SKIP() << "no session here: " << session.string() << " is missing";
+    const URL book = URL::fileURLWithPath(m_folder.write("a.epub", "1"));
+    unsetenv("XDG_RUNTIME_DIR");
+
+    m_coordinator->coordinateWriting(book, WritingIntent::ForReplacing, nullptr, [&](const auto&) {
+        EXPECT_FALSE(fs::is_empty(session / "parvel-coord"));
+    });
+}
+
 TEST_F(Coordination, ALockFileGoesWithItsHolder) {
     const URL book = URL::fileURLWithPath(m_folder.write("a.epub", "1"));
 

@@ -6,6 +6,7 @@
 #include <sys/xattr.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <memory>
@@ -97,12 +98,16 @@ std::optional<std::vector<std::string>> userAttributeNames(int file) {
     return names;
 }
 
-/// File systems without attributes lose them silently; some FUSE mounts say EIO for that.
-bool isLossTolerated(int error, int file) {
-    if (error == ENOTSUP || error == EPERM || error == EACCES)
-        return true;
+/// A file system that keeps no attributes has none to be lost; some FUSE mounts say EIO for that.
+bool hasNoAttributes(int error, int file) {
     struct statfs system {};
-    return error == EIO && ::fstatfs(file, &system) == 0 && system.f_type == kFuseMagic;
+    return error == ENOTSUP ||
+           (error == EIO && ::fstatfs(file, &system) == 0 && system.f_type == kFuseMagic);
+}
+
+/// Where attributes can't be set at all, they are lost silently.
+bool isLossTolerated(int error, int file) {
+    return error == EPERM || error == EACCES || hasNoAttributes(error, file);
 }
 
 int copyAttribute(int from, int to, const std::string& name, int flags) {
@@ -141,14 +146,25 @@ int copyContent(int from, int to, std::uint64_t size, const PieceReport& report)
 
 int copyAttributes(int from, int to, bool onlyMissing) {
     const auto names = userAttributeNames(from);
-    if (!names)
-        return errno == ENOTSUP || isLossTolerated(errno, from) ? 0 : errno;
+    if (!names) {
+        const int error = errno;
+        return hasNoAttributes(error, from) ? 0 : error;
+    }
     for (const std::string& name : *names) {
         const int error = copyAttribute(from, to, name, onlyMissing ? XATTR_CREATE : 0);
         if (error != 0 && !(onlyMissing && error == EEXIST))
             return error;
     }
     return 0;
+}
+
+bool hasAttributesOf(int from, int to) {
+    const auto wanted = userAttributeNames(from);
+    const auto present = userAttributeNames(to);
+    return wanted && present &&
+           std::all_of(wanted->begin(), wanted->end(), [&](const std::string& name) {
+               return std::find(present->begin(), present->end(), name) != present->end();
+           });
 }
 
 /// Owner and group first, since a change of owner drops mode bits; times last.

@@ -20,8 +20,12 @@ using PieceReport = std::function<int(std::uint64_t copied)>;
                               const PieceReport& report = nullptr);
 
 /// Copies the `user.` attributes, or those that are missing there. File systems without attributes
-/// lose them.
+/// lose them; what can't be read is an error.
 [[nodiscard]] int copyAttributes(int from, int to, bool onlyMissing = false);
+
+/// Whether one has every attribute that the other has, whatever its value; false where either can't
+/// be told.
+[[nodiscard]] bool hasAttributesOf(int from, int to);
 
 /// Gives it owner and group as far as allowed, the mode without set-id bits, and the times.
 [[nodiscard]] int copyStatus(const struct stat& status, int to);

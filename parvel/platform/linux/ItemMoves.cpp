@@ -13,10 +13,12 @@
 #include <sys/stat.h>
 
 #include <cerrno>
+#include <functional>
 
 #include "parvel/foundation/URL.h"
 #include "parvel/platform/ResourceQueries.h"
 #include "parvel/platform/Service.h"
+#include "parvel/platform/linux/HiddenItem.h"
 #include "parvel/platform/linux/ItemTree.h"
 #include "parvel/platform/linux/Paths.h"
 #include "parvel/platform/linux/StagingFolder.h"
@@ -44,16 +46,23 @@ bool isFlagUnsupported(int error) {
     return error == EINVAL || error == ENOSYS || error == ENOTSUP;
 }
 
+bool isLinkUnsupported(int error) {
+    return error == EPERM || error == ENOTSUP || error == ENOSYS || error == EMLINK;
+}
+
 /// Takes a free name by an exclusively made file, which the rename then replaces in one step.
 int renameOntoPlaceholder(const std::string& source, const std::string& destination) {
     struct stat made {};
     struct stat named {};
     const FileDescriptor placeholder(
         ::open(destination.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600));
-    if (!placeholder || ::fstat(placeholder.get(), &made) != 0)
+    if (!placeholder)
         return errno;
-    const int error = plainRename(source, destination);
-    if (error != 0 && status(destination, named) == 0 && isSameItem(made, named))
+    int error = ::fstat(placeholder.get(), &made) == 0 ? 0 : errno;
+    const bool isKnown = error == 0;
+    if (error == 0)
+        error = plainRename(source, destination);
+    if (error != 0 && (!isKnown || status(destination, named) != 0 || isSameItem(made, named)))
         ::unlink(destination.c_str());
     return error;
 }
@@ -72,9 +81,7 @@ int renameExclusivelyWithoutFlag(const std::string& source, const std::string& d
         return error;
     }
     if (::linkat(AT_FDCWD, source.c_str(), AT_FDCWD, destination.c_str(), 0) != 0)
-        return errno == EPERM || errno == ENOTSUP || errno == ENOSYS
-                   ? renameOntoPlaceholder(source, destination)
-                   : errno;
+        return isLinkUnsupported(errno) ? renameOntoPlaceholder(source, destination) : errno;
     if (::unlink(source.c_str()) == 0)
         return 0;
     const int error = errno;
@@ -126,10 +133,25 @@ std::optional<StagedCopy> stageCopy(const std::string& source, const std::string
     return StagedCopy{std::move(*folder), std::move(path)};
 }
 
+bool isFolder(const std::string& path) {
+    struct stat item {};
+    return status(path, item) == 0 && S_ISDIR(item.st_mode);
+}
+
+/// A folder that forbids changes can't be renamed into another parent, only within it.
+int publishClosedFolder(const std::string& staged, const std::string& destination) {
+    int error = 0;
+    const auto beside = HiddenItem::bring(staged, parentFolderOf(destination), error);
+    return beside ? renameExclusively(beside->path(), destination) : error;
+}
+
 int publish(const StagedCopy& staged, const std::string& destination) {
-    if (const int error = renameExclusively(staged.path, destination))
+    int error = renameExclusively(staged.path, destination);
+    if (error == EACCES && isFolder(staged.path))
+        error = publishClosedFolder(staged.path, destination);
+    if (error != 0)
         return error;
-    const int error = syncFolder(parentFolderOf(destination));
+    error = syncFolder(parentFolderOf(destination));
     if (error != 0)
         (void)discardItem(destination);
     return error;
@@ -151,67 +173,107 @@ int moveAcrossFileSystems(const std::string& source, const std::string& destinat
     return error;
 }
 
+/// What has to be done before a replaced item may go; 0, or the errno value.
+using LastStep = std::function<int()>;
+
+int settle(const std::string& existing, const LastStep& lastStep) {
+    const int error = syncFolder(parentFolderOf(existing));
+    return error != 0 ? error : lastStep();
+}
+
+/// A file over a file: one plain rename. Until all is settled the old one keeps a hidden second
+/// name, to come back by; where the file system has no such names, the new one stays after a
+/// failure.
+int takePlaceOfFile(const std::string& existing, const std::string& replacement,
+                    const LastStep& lastStep) {
+    int error = 0;
+    const auto old = HiddenItem::linkTo(existing, error);
+    if (!old && !isLinkUnsupported(error))
+        return error;
+    if ((error = plainRename(replacement, existing)) != 0)
+        return error;
+    error = settle(existing, lastStep);
+    if (error != 0 && old &&
+        ::linkat(AT_FDCWD, existing.c_str(), AT_FDCWD, replacement.c_str(), 0) == 0)
+        (void)plainRename(old->path(), existing);
+    return error;
+}
+
 /// For file systems that can't exchange two names: the old item steps aside, under a hidden name
-/// that nobody clears, and goes once the new one stands in its place; it comes back on a failure.
-int exchangeWithoutFlag(const std::string& replacement, const std::string& existing) {
-    struct stat oldItem {};
-    struct stat newItem {};
-    if (const int error = status(existing, oldItem))
-        return error;
-    if (const int error = status(replacement, newItem))
-        return error;
-    if (!S_ISDIR(oldItem.st_mode) && !S_ISDIR(newItem.st_mode))
-        return plainRename(replacement, existing);
+/// that nobody clears until the new one stands in its place, and comes back on a failure.
+int takePlaceByStepAside(const std::string& existing, const std::string& replacement,
+                         const LastStep& lastStep) {
     const std::string aside = pathAppending(parentFolderOf(existing), randomName(kAsidePrefix));
-    if (const int error = renameExclusively(existing, aside))
+    int error = renameExclusively(existing, aside);
+    if (error != 0)
         return error;
-    if (const int error = renameExclusively(replacement, existing)) {
+    if ((error = renameExclusively(replacement, existing)) != 0) {
         (void)renameExclusively(aside, existing);
         return error;
     }
-    (void)discardItem(aside);
-    return 0;
-}
-
-/// After it the new item stands at `existing`. The old one is gone, unless the two were exchanged
-/// in one step: then it stands at `replacement`, and the step can be taken back.
-int exchange(const std::string& replacement, const std::string& existing, bool& isExchanged) {
-    const int error = renameWithFlags(replacement, existing, RENAME_EXCHANGE);
-    isExchanged = error == 0;
-    if (!isFlagUnsupported(error))
+    auto old = HiddenItem::hide(aside, error);
+    if (old)
+        error = settle(existing, lastStep);
+    if (error == 0 || renameExclusively(existing, replacement) != 0)
         return error;
-    // The kernel says the same of a folder and what lies in it; that may not step aside.
-    if (liesWithin(parentFolderOf(replacement), existing) ||
-        liesWithin(parentFolderOf(existing), replacement))
-        return EINVAL;
-    return exchangeWithoutFlag(replacement, existing);
+    if (renameExclusively(old ? old->path() : aside, existing) == 0 && old)
+        old->release();
+    return error;
 }
 
-int inheritIfAsked(const std::string& existing, const std::string& replacement,
-                   ReplaceOptions options) {
-    return options == ReplaceOptions::Default ? inheritMetadata(existing, replacement) : 0;
+/// Folders, or a folder and a file: the two are exchanged in one step, which can be taken back, and
+/// the old one is hidden in the next.
+int takePlaceByExchange(const std::string& existing, const std::string& replacement,
+                        const LastStep& lastStep) {
+    int error = renameWithFlags(replacement, existing, RENAME_EXCHANGE);
+    if (isFlagUnsupported(error)) {
+        // The kernel says the same of a folder and what lies in it; that may not step aside.
+        return liesWithin(parentFolderOf(replacement), existing) ||
+                       liesWithin(parentFolderOf(existing), replacement)
+                   ? EINVAL
+                   : takePlaceByStepAside(existing, replacement, lastStep);
+    }
+    if (error != 0)
+        return error;
+    auto old = HiddenItem::hide(replacement, error);
+    if (!old) {
+        (void)renameWithFlags(replacement, existing, RENAME_EXCHANGE);
+        return error;
+    }
+    error = settle(existing, lastStep);
+    if (error != 0 && renameExclusively(old->path(), replacement) == 0) {
+        old->release();
+        (void)renameWithFlags(replacement, existing, RENAME_EXCHANGE);
+    }
+    return error;
 }
 
-int replaceAcrossFileSystems(const std::string& existing, const std::string& replacement,
-                             ReplaceOptions options) {
+/// Puts an item on the same file system in the existing one's place.
+int takePlace(const std::string& existing, const std::string& replacement,
+              const LastStep& lastStep) {
+    return isFolder(existing) || isFolder(replacement)
+               ? takePlaceByExchange(existing, replacement, lastStep)
+               : takePlaceOfFile(existing, replacement, lastStep);
+}
+
+/// Replaces by a staged copy: across file systems, and where the new item has to change before it
+/// takes the place.
+int replaceByCopy(const std::string& existing, const std::string& replacement,
+                  ReplaceOptions options) {
     int error = 0;
     const auto staged = stageCopy(replacement, existing, error);
     if (!staged)
         return error;
-    if ((error = inheritIfAsked(existing, staged->path, options)) != 0)
+    if (options == ReplaceOptions::Default) {
+        if ((error = inheritMetadata(existing, staged->path)) != 0)
+            return error;
+    }
+    const LastStep discardOriginal = [&replacement] { return discardCopied(replacement); };
+    error = takePlace(existing, staged->path, discardOriginal);
+    if (error != EACCES || !isFolder(staged->path))
         return error;
-    bool isExchanged = false;
-    if ((error = exchange(staged->path, existing, isExchanged)) != 0)
-        return error;
-    error = syncFolder(parentFolderOf(existing));
-    if (error == 0)
-        error = discardCopied(replacement);
-    // The old item comes back from the staging folder after a failure; where it is gone, the new
-    // stays.
-    if (error == 0 || !isExchanged)
-        return 0;
-    (void)renameWithFlags(staged->path, existing, RENAME_EXCHANGE);
-    return error;
+    const auto beside = HiddenItem::bring(staged->path, parentFolderOf(existing), error);
+    return beside ? takePlace(existing, beside->path(), discardOriginal) : error;
 }
 
 /// Two names of one file: a rename of one onto the other would do nothing and leave both.
@@ -273,29 +335,16 @@ int replace(const std::string& existing, const std::string& replacement, Replace
     if (isSameItem(oldItem, newItem))
         return replaceByOtherName(existing, replacement);
 
+    if (options == ReplaceOptions::Default && hasToInherit(existing, replacement))
+        return replaceByCopy(existing, replacement, options);
     // What stands under the final name after a power cut is to be whole, whoever wrote it.
     if (const int error = syncItem(replacement))
         return error;
-    if (const int error = inheritIfAsked(existing, replacement, options))
-        return error;
-    bool isExchanged = false;
-    int error = exchange(replacement, existing, isExchanged);
-    if (error == EXDEV)
-        return replaceAcrossFileSystems(existing, replacement, options);
-    if (error != 0)
-        return error;
-    error = syncParents(replacement, existing);
-    if (!isExchanged)
-        return 0;
-    if (error != 0) {
-        (void)renameWithFlags(replacement, existing, RENAME_EXCHANGE);
-        return error;
-    }
-    // An old item that can't go stays under the replacement's old name; the replacement stands.
-    struct stat left {};
-    if (status(replacement, left) == 0 && isSameItem(left, oldItem))
-        (void)discardItem(replacement);
-    return 0;
+    const std::string from = parentFolderOf(replacement);
+    const int error = takePlace(existing, replacement, [&] {
+        return from == parentFolderOf(existing) ? 0 : syncFolder(from);
+    });
+    return error == EXDEV ? replaceByCopy(existing, replacement, options) : error;
 }
 
 }  // namespace parvel::host

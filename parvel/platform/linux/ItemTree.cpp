@@ -12,9 +12,9 @@
 
 #include "parvel/foundation/URL.h"
 #include "parvel/platform/linux/FileDescriptor.h"
+#include "parvel/platform/linux/HiddenItem.h"
 #include "parvel/platform/linux/ItemContent.h"
 #include "parvel/platform/linux/Paths.h"
-#include "parvel/platform/linux/StagingFolder.h"
 
 namespace parvel::host {
 
@@ -124,10 +124,12 @@ int copyEntry(int fromFolder, const char* fromName, int toFolder, const char* to
 
 // Removing
 
-/// One folder on the way down: its name in the folder above, and which item that folder is.
+/// One folder on the way down: its name in the folder above, which item that folder is, and the
+/// mode that it had before it was opened up for its removal.
 struct Descent {
     std::string name;
     struct stat above;
+    std::optional<mode_t> oldMode;
 };
 
 /// Steps back up to the folder that the descent came from; closed when that is another folder now.
@@ -141,67 +143,111 @@ FileDescriptor folderAbove(int folder, const struct stat& expected) {
     return above;
 }
 
-/// Removes one entry. A folder of our own that forbids it is opened up first.
+/// Removes one entry. A folder of our own that forbids it is opened up first, and closed again
+/// where that did not help.
 int unlinkEntry(int folder, const char* name, int flags) {
     if (::unlinkat(folder, name, flags) == 0)
         return 0;
+    struct stat status {};
     if (errno != EACCES)
         return errno;
-    if (::fchmod(folder, 0700) != 0)
+    if (::fstat(folder, &status) != 0 || ::fchmod(folder, S_IRWXU) != 0)
         return EACCES;
-    return ::unlinkat(folder, name, flags) == 0 ? 0 : errno;
+    if (::unlinkat(folder, name, flags) == 0)
+        return 0;
+    const int error = errno;
+    (void)::fchmod(folder, status.st_mode & ALLPERMS);
+    return error;
 }
 
-/// Opens a folder on the way down, made readable first where it is our own and was not.
-FileDescriptor openForRemoval(int folder, const char* name) {
+/// Opens a folder on the way down, made readable first where it is our own and was not; then
+/// `oldMode` is the mode that it had.
+FileDescriptor openForRemoval(int folder, const char* name, std::optional<mode_t>& oldMode) {
     const int flags = O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
     FileDescriptor below(::openat(folder, name, flags));
-    if (below || errno != EACCES || ::fchmodat(folder, name, 0700, AT_SYMLINK_NOFOLLOW) != 0)
+    struct stat status {};
+    if (below || errno != EACCES)
         return below;
-    return FileDescriptor(::openat(folder, name, flags));
+    if (::fstatat(folder, name, &status, AT_SYMLINK_NOFOLLOW) != 0 ||
+        ::fchmodat(folder, name, S_IRWXU, AT_SYMLINK_NOFOLLOW) != 0) {
+        errno = EACCES;
+        return below;
+    }
+    oldMode = status.st_mode & ALLPERMS;
+    below = FileDescriptor(::openat(folder, name, flags));
+    if (!below) {
+        const int error = errno;
+        (void)::fchmodat(folder, name, *oldMode, AT_SYMLINK_NOFOLLOW);
+        errno = error;
+    }
+    return below;
+}
+
+/// Gives the folders of a descent that removed nothing the modes back that they had.
+void closeAgain(FileDescriptor folder, std::vector<Descent>& path) {
+    for (; !path.empty(); path.pop_back()) {
+        const Descent& last = path.back();
+        folder = folderAbove(folder.get(), last.above);
+        if (!folder)
+            return;
+        if (last.oldMode)
+            (void)::fchmodat(folder.get(), last.name.c_str(), *last.oldMode, AT_SYMLINK_NOFOLLOW);
+    }
+}
+
+/// Removes the entries of the folder up to one that is a folder itself, which is then the last of
+/// the path; at the end of the listing the path stays as it is.
+int removeEntries(FileDescriptor& folder, std::vector<Descent>& path, bool& removedAny) {
+    const Listing listing = listFolder(folder.get());
+    if (!listing)
+        return lastError();
+    while (const char* name = nextName(listing.get())) {
+        const int error = unlinkEntry(folder.get(), name, 0);
+        if (error == 0) {
+            removedAny = true;
+            continue;
+        }
+        if (error != EISDIR && error != EPERM)
+            return error;
+        Descent descent{name, {}, std::nullopt};
+        if (::fstat(folder.get(), &descent.above) != 0)
+            return errno;
+        FileDescriptor below = openForRemoval(folder.get(), name, descent.oldMode);
+        if (!below)
+            return errno == ENOTDIR || errno == ELOOP ? error : errno;
+        path.push_back(std::move(descent));
+        folder = std::move(below);
+        return 0;
+    }
+    return errno;
 }
 
 /// Empties a folder with one descriptor at a time, however deep it is.
 int emptyFolder(FileDescriptor folder, bool& removedAny) {
     std::vector<Descent> path;
-    for (;;) {
-        const Listing listing = listFolder(folder.get());
-        if (!listing)
-            return lastError();
-        bool isDescending = false;
-        while (const char* name = nextName(listing.get())) {
-            const int error = unlinkEntry(folder.get(), name, 0);
-            if (error == 0) {
-                removedAny = true;
-                continue;
-            }
-            if (error != EISDIR && error != EPERM)
-                return error;
-            FileDescriptor below = openForRemoval(folder.get(), name);
-            if (!below)
-                return errno == ENOTDIR || errno == ELOOP ? error : errno;
-            struct stat status {};
-            if (::fstat(folder.get(), &status) != 0)
-                return errno;
-            path.push_back({name, status});
-            folder = std::move(below);
-            isDescending = true;
-            break;
-        }
-        if (isDescending)
+    int error = 0;
+    while (error == 0) {
+        const std::size_t depth = path.size();
+        error = removeEntries(folder, path, removedAny);
+        if (error != 0 || path.size() > depth)
             continue;
-        if (errno != 0)
-            return errno;
         if (path.empty())
             return 0;
-        folder = folderAbove(folder.get(), path.back().above);
-        if (!folder)
-            return lastError();
-        if (const int error = unlinkEntry(folder.get(), path.back().name.c_str(), AT_REMOVEDIR))
-            return error;
-        removedAny = true;
-        path.pop_back();
+        FileDescriptor above = folderAbove(folder.get(), path.back().above);
+        if (!above) {
+            error = lastError();
+            break;
+        }
+        folder = std::move(above);
+        error = unlinkEntry(folder.get(), path.back().name.c_str(), AT_REMOVEDIR);
+        if (error == 0) {
+            removedAny = true;
+            path.pop_back();
+        }
     }
+    if (!removedAny)
+        closeAgain(std::move(folder), path);
+    return error;
 }
 
 }  // namespace
@@ -217,10 +263,13 @@ int removeTree(const std::string& path, bool* removedAny) {
         return errno;
     if (!S_ISDIR(status.st_mode))
         return ::unlink(path.c_str()) == 0 ? 0 : errno;
-    FileDescriptor folder = openForRemoval(AT_FDCWD, path.c_str());
+    std::optional<mode_t> oldMode;
+    FileDescriptor folder = openForRemoval(AT_FDCWD, path.c_str(), oldMode);
     int error = folder ? emptyFolder(std::move(folder), any) : lastError();
     if (error == 0 && ::rmdir(path.c_str()) != 0)
         error = errno;
+    if (error != 0 && !any && oldMode)
+        (void)::fchmodat(AT_FDCWD, path.c_str(), *oldMode, AT_SYMLINK_NOFOLLOW);
     if (removedAny)
         *removedAny = any;
     return error;
@@ -233,21 +282,16 @@ int discardItem(const std::string& path) {
     if (!S_ISDIR(status.st_mode))
         return ::unlink(path.c_str()) == 0 ? 0 : errno;
     int error = 0;
-    const auto staging = StagingFolder::makeIn(parentFolderOf(path), error);
-    if (!staging)
+    auto hidden = HiddenItem::hide(path, error);
+    if (!hidden)
         return error;
-    const std::string aside = pathAppending(staging->path(), "discarded");
-    if (::rename(path.c_str(), aside.c_str()) != 0) {
-        // A folder that forbids changes can't change its parent either; it is going anyway.
-        if (errno != EACCES || ::fchmodat(AT_FDCWD, path.c_str(), 0700, AT_SYMLINK_NOFOLLOW) != 0 ||
-            ::rename(path.c_str(), aside.c_str()) != 0)
-            return errno;
-    }
     bool removedAny = false;
-    error = removeTree(aside, &removedAny);
+    error = removeTree(hidden->path(), &removedAny);
     // An item of which nothing could go is whole, and comes back.
-    if (error != 0 && !removedAny)
-        (void)::rename(aside.c_str(), path.c_str());
+    if (error != 0 && !removedAny && ::rename(hidden->path().c_str(), path.c_str()) != 0)
+        return error;
+    if (error == 0 || !removedAny)
+        hidden->release();
     return error;
 }
 
@@ -272,6 +316,20 @@ int syncFolder(const std::string& path) {
     return ::fsync(folder.get()) == 0 || errno == EINVAL || errno == ENOSYS ? 0 : errno;
 }
 
+bool hasToInherit(const std::string& oldItem, const std::string& newItem) {
+    const int flags = O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
+    const FileDescriptor from(::open(oldItem.c_str(), flags));
+    const FileDescriptor to(::open(newItem.c_str(), flags));
+    struct stat oldStatus {};
+    struct stat newStatus {};
+    if (!from || !to || ::fstat(from.get(), &oldStatus) != 0 || ::fstat(to.get(), &newStatus) != 0)
+        return true;
+    const bool isSameKind = S_ISDIR(oldStatus.st_mode) == S_ISDIR(newStatus.st_mode);
+    if (isSameKind && oldStatus.st_mode != newStatus.st_mode)
+        return true;
+    return !hasAttributesOf(from.get(), to.get());
+}
+
 int inheritMetadata(const std::string& oldItem, const std::string& newItem) {
     const int flags = O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
     const FileDescriptor from(::open(oldItem.c_str(), flags));
@@ -279,8 +337,7 @@ int inheritMetadata(const std::string& oldItem, const std::string& newItem) {
     struct stat oldStatus {};
     struct stat newStatus {};
     if (!from || !to)
-        return errno == ELOOP || errno == EACCES ? 0
-                                                 : errno;  // a link carries no metadata of its own
+        return errno == ELOOP ? 0 : errno;  // a link carries no metadata of its own
     if (::fstat(from.get(), &oldStatus) != 0 || ::fstat(to.get(), &newStatus) != 0)
         return errno;
     if (const int error = copyAttributes(from.get(), to.get(), /*onlyMissing=*/true))

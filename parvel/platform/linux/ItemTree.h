@@ -16,7 +16,7 @@ namespace parvel::host {
 [[nodiscard]] int copyTree(const std::string& source, const std::string& destination);
 
 /// Removes an item with all that is in it. `removedAny`, where given, tells whether anything went
-/// before a failure.
+/// before a failure; where nothing did, the item is as it was, modes included.
 [[nodiscard]] int removeTree(const std::string& path, bool* removedAny = nullptr);
 
 /// Makes the item's name free in one step, then removes the item. Where nothing of it can be
@@ -29,6 +29,9 @@ namespace parvel::host {
 /// Writes a folder's entries through to the disk; a file system that can't is no error.
 [[nodiscard]] int syncFolder(const std::string& path);
 
+/// Whether an item that takes another's place lacks anything of what inheritMetadata gives it, or
+/// that can't be told.
+[[nodiscard]] bool hasToInherit(const std::string& oldItem, const std::string& newItem);
 /// Puts the mode of the old item, and those of its `user.` attributes that the new one lacks, on
 /// the new one.
 [[nodiscard]] int inheritMetadata(const std::string& oldItem, const std::string& newItem);

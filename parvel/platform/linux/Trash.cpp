@@ -62,11 +62,15 @@ int moveInto(const TrashFolder& trash, const std::string& item, const std::strin
     return EEXIST;
 }
 
-/// The item's info file; none where there is none.
+/// The item's info file; none where there is none. One that can't be looked at is one: its own
+/// rename then tells.
 std::optional<std::string> infoFileThere(const std::string& item) {
     std::optional<std::string> info = infoFileOfTrashed(item);
     struct stat status {};
-    if (!info || ::lstat(info->c_str(), &status) != 0 || !S_ISREG(status.st_mode))
+    if (!info)
+        return std::nullopt;
+    const bool isFound = ::lstat(info->c_str(), &status) == 0;
+    if (isFound ? !S_ISREG(status.st_mode) : errno == ENOENT || errno == ENOTDIR)
         return std::nullopt;
     return info;
 }
@@ -75,9 +79,12 @@ std::optional<std::string> infoFileThere(const std::string& item) {
 int renameWithinTrash(const std::string& oldInfo, const std::string& source,
                       const std::string& destination) {
     const std::string newInfo = infoFileOfTrashed(destination).value_or(std::string());
-    if (const int error = renameExclusively(oldInfo, newInfo))
+    int error = renameExclusively(oldInfo, newInfo);
+    if (error != 0)
         return error;
-    const int error = moveExclusively(source, destination);
+    error = syncFolder(parentFolderOf(newInfo));
+    if (error == 0)
+        error = moveExclusively(source, destination);
     if (error != 0)
         (void)renameExclusively(newInfo, oldInfo);
     return error;

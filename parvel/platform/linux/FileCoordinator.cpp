@@ -49,14 +49,18 @@ bool isPrivateFolder(const std::string& path) {
            status.st_uid == ::geteuid() && (status.st_mode & 0077) == 0;
 }
 
+/// The user's folder of short-lived files: also a process that was started outside the session,
+/// and so was not told of it, is to meet the others there.
+std::string runtimeFolder() {
+    const char* told = ::getenv("XDG_RUNTIME_DIR");
+    return told && *told == '/' ? told : "/run/user/" + std::to_string(::geteuid());
+}
+
 /// The folder of lock files; empty with errno set where none is safe.
 std::string lockFolder() {
-    std::string path;
-    if (const char* runtime = ::getenv("XDG_RUNTIME_DIR"); runtime && *runtime == '/') {
-        path = pathAppending(runtime, kFolderName);
-        if ((::mkdir(path.c_str(), 0700) == 0 || errno == EEXIST) && isPrivateFolder(path))
-            return path;
-    }
+    std::string path = pathAppending(runtimeFolder(), kFolderName);
+    if ((::mkdir(path.c_str(), 0700) == 0 || errno == EEXIST) && isPrivateFolder(path))
+        return path;
     std::error_code ignored;
     const std::string temporary = std::filesystem::temp_directory_path(ignored).string();
     path = pathAppending(temporary.empty() ? "/tmp" : temporary,

@@ -99,6 +99,7 @@ AssetPtr PVAssetMetadataFileManager::
     if (!name)
         return nullptr;
     CountedTarget target(directory, *name);
+    const std::optional<Error> errorBefore = valueOf(error);
     for (;;) {
         // Deliberate: the last candidate is used as it stands, taken or not.
         while (renameIfCollision && !target.isExhausted() &&
@@ -111,6 +112,7 @@ AssetPtr PVAssetMetadataFileManager::
                                        m_fileManager->itemExistsAtPath(target.url().path());
         if (!wasTakenMeanwhile)
             return moved;
+        assign(error, errorBefore);  // a try that is made again leaves none of its own
         target.countUp();
     }
 }

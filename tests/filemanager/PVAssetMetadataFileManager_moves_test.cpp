@@ -307,6 +307,17 @@ TEST_F(Moves, ACompetitorThatTookTheNameSendsTheCountOn) {
     EXPECT_TRUE(log.lines()[3].starts_with("default Rename: Move without replacement."));
 }
 
+TEST_F(Moves, ATryThatWasMadeAgainLeavesNoErrorBesideTheResult) {
+    m_manager->setFileManager(std::make_shared<CompetingService>());
+    RecordedLog log;
+
+    EXPECT_TRUE(moveInto(asset("Guide.pdf"), makeFolder("library"), {.renameIfCollision = true}));
+
+    EXPECT_FALSE(m_error);
+    EXPECT_FALSE(log.lines()[1].ends_with("error: (null)"));
+    EXPECT_TRUE(log.lines()[3].ends_with("error: (null)"));
+}
+
 TEST_F(Moves, AFreeNameDoesNotChange) {
     EXPECT_EQ(m_manager->nonCollidingNameForFileName_inDestPath("a.pdf", m_folder.path()), "a.pdf");
 }

@@ -1,0 +1,36 @@
+#pragma once
+
+#include <functional>
+#include <string>
+#include <vector>
+
+#include "parvel/filemanager/PVAssetMetadataFileManager.h"
+#include "tests/faults/TestLibrary.h"
+
+namespace parvel::testing {
+
+/// An operation that is cut short everywhere: a row of the table in Operations.cpp.
+struct Operation {
+    std::string name;
+    Layout before;
+    Layout after;
+    /// Whether it succeeded; called in a process of its own.
+    std::function<bool(PVAssetMetadataFileManager& manager, const TestLibrary& library)> run;
+    /// What else it may leave when it failed or was killed on the way.
+    std::vector<Layout> between = {};
+    /// What else a kill may leave, for the length of one system call.
+    std::vector<Layout> killed = {};
+    /// What more must hold whatever happened; what is wrong, or nothing.
+    std::function<std::string(const TestLibrary& library)> alsoHolds = nullptr;
+    bool answers = true;  ///< whether its result tells its success
+    bool hasTrashOnOtherFileSystem = false;
+
+    [[nodiscard]] bool needsTwoFileSystems() const;
+};
+
+[[nodiscard]] const std::vector<Operation>& operations();
+
+/// The name that a failed test is known by.
+void PrintTo(const Operation& operation, std::ostream* stream);
+
+}  // namespace parvel::testing

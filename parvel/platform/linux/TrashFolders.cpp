@@ -51,12 +51,15 @@ TrashFolder homeTrash() {
     return {pathAppending(base, "Trash"), ""};
 }
 
-/// The topmost folder of the mount that the item lies on.
-std::string topDirectoryOf(const std::string& parent, const MountPlace& place) {
+/// The topmost folder of the mount that the item lies on; none where the way up can't be followed.
+std::optional<std::string> topDirectoryOf(const std::string& parent, const MountPlace& place) {
     std::string top = parent;
     while (top != "/") {
         std::string above = parentFolderOf(top);
-        if (mountPlaceOf(above) != place)
+        const auto placeAbove = mountPlaceOf(above);
+        if (!placeAbove)
+            return std::nullopt;
+        if (*placeAbove != place)
             break;
         top = std::move(above);
     }
@@ -122,8 +125,10 @@ std::optional<TrashPlan> planTrash(const std::string& item) {
     TrashPlan plan{{}, std::move(*absolute)};
     // An item may be the top of its own mount; then only a copy can trash it.
     const std::string folder = parentFolderOf(plan.absolute);
-    if (placeOfFolder(home.path) != place && mountPlaceOf(folder) == place)
-        plan.folders = volumeTrashes(topDirectoryOf(folder, *place));
+    if (placeOfFolder(home.path) != place && mountPlaceOf(folder) == place) {
+        if (const auto top = topDirectoryOf(folder, *place))
+            plan.folders = volumeTrashes(*top);
+    }
     plan.folders.push_back(home);
     return plan;
 }

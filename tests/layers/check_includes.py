@@ -29,8 +29,9 @@ LOWER = {
 }
 
 # Ties that run back up, from source files alone: a task calls the manager that made it, and the
-# inspector's attribute read is the manager's.
+# inspector's attribute read is the manager's; staging asks where synchronised storage begins.
 BACK = {
+    ("parvel/platform/linux", "parvel/platform/linux/cloud/SyncedPlace.h"),
     ("parvel/iotasks", "parvel/filemanager/PVAssetMetadataFileManager.h"),
     ("parvel/inspection", "parvel/filemanager/PVAssetMetadataFileManager.h"),
 }

@@ -47,7 +47,7 @@ public:
         if (::posix_spawnp(&m_process, "setpriv", &actions, nullptr, arguments, environ) != 0)
             m_process = -1;
         posix_spawn_file_actions_destroy(&actions);
-        for (int i = 0; i < 500 && !std::filesystem::exists(socket); ++i)
+        for (int i = 0; i < 500 && !takesConnections(socket); ++i)
             std::this_thread::sleep_for(milliseconds(10));
     }
     ~PrivateBus() {
@@ -60,6 +60,12 @@ public:
     PrivateBus& operator=(const PrivateBus&) = delete;
 
 private:
+    static bool takesConnections(const std::string& socket) {
+        host::ClientSocket probe;
+        return probe.connectToPath(socket, steady_clock::now() + milliseconds(100)) ==
+               host::SocketOutcome::Done;
+    }
+
     pid_t m_process = -1;
 };
 

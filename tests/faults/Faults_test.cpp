@@ -120,6 +120,7 @@ protected:
         const std::size_t points = calls * pointsOfCall;
         const std::size_t usual = m_host.fileSystem ? kUsualCalls : 2 * kUsualCalls;
         const std::size_t tried = std::min(points, testRounds(usual) * pointsOfCall);
+        RecordProperty("points", static_cast<int>(tried));
         for (std::size_t i = 0; i < tried; ++i) {
             tryPoint(i * points / tried);
             if (HasFailure() && ++m_failures == 5)

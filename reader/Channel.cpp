@@ -45,10 +45,9 @@ bool receive(Received& received) {
            (message.msg_flags & (MSG_TRUNC | MSG_CTRUNC)) == 0;
 }
 
-bool send(const Answer& answer) {
-    Reply reply = answer.reply;
-    std::array<iovec, 2> parts{iovec{&reply, sizeof reply},
-                               iovec{const_cast<char*>(answer.text.data()), answer.text.size()}};
+bool send(Answer& answer) {
+    std::array<iovec, 2> parts{iovec{&answer.reply, sizeof answer.reply},
+                               iovec{answer.text.data(), answer.text.size()}};
     msghdr message{};
     message.msg_iov = parts.data();
     message.msg_iovlen = parts.size();

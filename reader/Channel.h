@@ -26,6 +26,6 @@ struct Answer {
 /// Waits for a request. False at the end of the conversation, and for what is no request.
 [[nodiscard]] bool receive(Received& received);
 /// Callable from a signal handler where the answer holds no text.
-[[nodiscard]] bool send(const Answer& answer);
+[[nodiscard]] bool send(Answer& answer);
 
 }  // namespace parvel::reader

@@ -109,9 +109,8 @@ std::shared_ptr<const std::uint8_t[]> sealedBytes(const FileDescriptor& file, st
     void* bytes = ::mmap(nullptr, size, PROT_READ, MAP_SHARED, file.get(), 0);
     if (bytes == MAP_FAILED)
         return nullptr;
-    return {static_cast<const std::uint8_t*>(bytes), [size](const std::uint8_t* mapped) {
-                ::munmap(const_cast<std::uint8_t*>(mapped), size);
-            }};
+    return {static_cast<const std::uint8_t*>(bytes),
+            [bytes, size](const std::uint8_t*) { ::munmap(bytes, size); }};
 }
 
 std::optional<Image> imageOf(const HelperAnswer& answer) {

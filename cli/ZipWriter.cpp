@@ -13,7 +13,7 @@
 namespace parvel::cli {
 namespace {
 
-constexpr std::uint16_t kVersion = 20;  // deflate and folders: 2.0
+constexpr std::uint16_t kFormatVersion = 20;  // deflate and folders: 2.0
 constexpr std::uint16_t kUtf8Names = 0x0800;
 constexpr std::uint16_t kDeflated = 8;
 constexpr std::uint16_t kFirstDay = 0x0021;  // 1 January 1980, the first that the format can say
@@ -49,7 +49,7 @@ std::uint16_t flagsFor(std::string_view name) {
     return 0;
 }
 
-int writeAll(int file, std::string_view bytes, off_t offset) {
+int writeAt(int file, std::string_view bytes, off_t offset) {
     while (!bytes.empty()) {
         const ssize_t written = pwrite(file, bytes.data(), bytes.size(), offset);
         if (written < 0 && errno != EINTR)
@@ -65,7 +65,7 @@ int writeAll(int file, std::string_view bytes, off_t offset) {
 /// What the local header and the directory say of an entry alike.
 template <class Entry>
 void appendCommon(std::string& out, const Entry& entry) {
-    append16(out, kVersion);
+    append16(out, kFormatVersion);
     append16(out, flagsFor(entry.name));
     append16(out, entry.method);
     append16(out, 0);
@@ -89,7 +89,7 @@ std::string localHeader(const Entry& entry) {
 int ZipWriter::write(std::string_view bytes) {
     if (m_offset + bytes.size() > kLargest)
         return EFBIG;
-    const int error = writeAll(m_file, bytes, static_cast<off_t>(m_offset));
+    const int error = writeAt(m_file, bytes, static_cast<off_t>(m_offset));
     m_offset += bytes.size();
     return error;
 }
@@ -106,7 +106,7 @@ int ZipWriter::begin(Entry& entry, std::string_view name) {
 
 /// The header is written again: only now are the sizes known.
 int ZipWriter::complete(Entry entry) {
-    const int error = writeAll(m_file, localHeader(entry), static_cast<off_t>(entry.offset));
+    const int error = writeAt(m_file, localHeader(entry), static_cast<off_t>(entry.offset));
     m_entries.push_back(std::move(entry));
     return error;
 }
@@ -173,7 +173,7 @@ int ZipWriter::finish() {
     const std::uint64_t start = m_offset;
     for (const Entry& entry : m_entries) {
         std::string header = "PK\x01\x02";
-        append16(header, kVersion);
+        append16(header, kFormatVersion);
         appendCommon(header, entry);
         append16(header, 0);  // no comment
         append16(header, 0);  // the first disk

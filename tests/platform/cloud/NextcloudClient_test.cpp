@@ -79,7 +79,7 @@ protected:
     host::HostCloudStore m_store{host::CloudWaits{milliseconds(300), milliseconds(10'000),
                                                   milliseconds(2000), milliseconds(60'000)}};
     milliseconds m_took{0};
-    std::mutex m_mutex;
+    std::mutex m_mutex;  ///< of m_lines
     std::vector<std::string> m_lines;
     std::optional<StandInServer> m_server;
 };
@@ -181,6 +181,14 @@ TEST_F(NextcloudStatus, AClientThatDoesNotRunLeavesWhatTheDiskShows) {
     m_server.reset();  // its socket stays behind
     EXPECT_TRUE(std::filesystem::exists(m_folder / "Nextcloud/socket"));
     EXPECT_EQ(status(), DownloadingStatus::Downloaded);
+}
+
+TEST_F(NextcloudStatus, WithoutARuntimeFolderNobodyIsAsked) {
+    const EnvironmentValue none("XDG_RUNTIME_DIR", "");
+    serveStatus("OK");
+
+    EXPECT_EQ(status(), DownloadingStatus::Downloaded);
+    EXPECT_EQ(m_server->connections(), 0);
 }
 
 TEST_F(NextcloudStatus, AClientThatKeepsOtherFoldersLeavesWhatTheDiskShows) {

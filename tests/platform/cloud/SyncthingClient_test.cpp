@@ -90,6 +90,14 @@ protected:
                     connection.send(reply);
         });
     }
+    std::vector<std::string> requests() {
+        const std::lock_guard lock(m_mutex);
+        return m_requests;
+    }
+    std::string header() {
+        const std::lock_guard lock(m_mutex);
+        return m_header;
+    }
     void serveFile(const std::string& body) { serve({{"/rest/db/file", okReply(body)}}); }
 
     std::optional<DownloadingStatus> status(std::string_view name = "root/a.epub") {
@@ -111,7 +119,7 @@ protected:
     host::HostCloudStore m_store{host::CloudWaits{milliseconds(400), milliseconds(0),
                                                   milliseconds(1500), milliseconds(60'000)}};
     milliseconds m_took{0};
-    std::mutex m_mutex;
+    std::mutex m_mutex;  ///< of the next two
     std::vector<std::string> m_requests;
     std::string m_header;
     std::optional<StandInServer> m_server;
@@ -121,8 +129,8 @@ TEST_F(SyncthingStatus, TheNewestVersionIsCurrent) {
     serveFile(kInStep);
 
     EXPECT_EQ(status(), DownloadingStatus::Current);
-    EXPECT_THAT(m_requests, ElementsAre("GET /rest/db/file?folder=my%20books&file=a.epub"));
-    EXPECT_EQ(m_header, "Host: localhost\rX-API-Key: key-123\r");
+    EXPECT_THAT(requests(), ElementsAre("GET /rest/db/file?folder=my%20books&file=a.epub"));
+    EXPECT_EQ(header(), "Host: localhost\rX-API-Key: key-123\r");
 }
 
 TEST_F(SyncthingStatus, AnOlderVersionIsDownloaded) {
@@ -330,7 +338,7 @@ TEST_F(SyncthingStatus, AFolderBelowAndALinkToItArePathsInTheSameFolder) {
     serveFile(kInStep);
 
     EXPECT_EQ(status("link/ü b.epub"), DownloadingStatus::Current);
-    EXPECT_THAT(m_requests, ElementsAre("GET /rest/db/file?folder=my%20books&file="
+    EXPECT_THAT(requests(), ElementsAre("GET /rest/db/file?folder=my%20books&file="
                                         "deep%2F%C3%BC%20b.epub"));
 }
 

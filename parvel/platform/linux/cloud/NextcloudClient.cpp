@@ -53,8 +53,10 @@ public:
     /// client keeps no such folder.
     SocketOutcome begin(const SyncedItem& item) {
         const char* folder = ::secure_getenv("XDG_RUNTIME_DIR");
-        SocketOutcome outcome = m_socket.connectToPath(
-            std::string(folder ? folder : "") + "/Nextcloud/socket", m_deadline);
+        if (!folder || *folder != '/')
+            return SocketOutcome::Gone;
+        SocketOutcome outcome =
+            m_socket.connectToPath(std::string(folder) + "/Nextcloud/socket", m_deadline);
         if (outcome == SocketOutcome::Done)
             outcome = m_socket.send("VERSION:\n", m_deadline);
         std::string line;

@@ -8,8 +8,8 @@
 
 namespace parvel {
 
-/// Reads and writes encoded images: `Service<ImageCodec>::current()`. They are decoded in a confined
-/// process. For any thread.
+/// Reads and writes encoded images: `Service<ImageCodec>::current()`. They are decoded in a
+/// confined process. For any thread.
 class ImageCodec {
 public:
     /// The longest side and the most pixels of an image that is decoded.

@@ -24,9 +24,8 @@ TEST(Messages, OfDamagedContentHaveTheLogsReason) {
 }
 
 TEST(Messages, OfAnErrorWithItsOwnReasonHaveThat) {
-    EXPECT_EQ(failureLine("inspect",
-                          damagedResult({{std::string(PVLocalizedFailureReasonErrorKey),
-                                          "The helper program can't be started."}})),
+    EXPECT_EQ(failureLine("inspect", damagedResult({{std::string(PVLocalizedFailureReasonErrorKey),
+                                                     "The helper program can't be started."}})),
               "parvel: inspect: a.pdf: The helper program can't be started "
               "(PVFileErrorDomain 259)\n");
 }

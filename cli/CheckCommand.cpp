@@ -151,6 +151,7 @@ Value arrayOf(const std::vector<AssetPtr>& assets) {
 
 Value arrayOf(const std::vector<MovedAsset>& moved) {
     std::vector<Value> values;
+    values.reserve(moved.size());
     for (const MovedAsset& each : moved)
         values.emplace_back(
             Dictionary{{"from", each.orphan->url() ? Value(pathOf(each.orphan)) : Value()},

@@ -383,7 +383,8 @@ TEST_F(HelperProcessTest, IsFoundByARelativePathToo) {
     const std::string program = readerProgramPath();
     const GivenReaderProgram given(std::filesystem::relative(program).string());
 
-    EXPECT_EQ(readerProgramPath(), program);
+    EXPECT_TRUE(std::filesystem::path(readerProgramPath()).is_absolute());
+    EXPECT_TRUE(std::filesystem::equivalent(readerProgramPath(), program));
     EXPECT_EQ(authorOf(), "Ann");
 }
 

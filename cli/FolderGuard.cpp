@@ -16,10 +16,19 @@ bool isFolderAlone(const URL& url) {
 
 }  // namespace
 
+bool isLinkTo(const URL& url, const URL& item) {
+    std::error_code unknown;
+    return std::filesystem::is_symlink(std::filesystem::symlink_status(url.path(), unknown)) &&
+           !std::filesystem::is_symlink(std::filesystem::symlink_status(item.path(), unknown)) &&
+           std::filesystem::equivalent(url.path(), item.path(), unknown);
+}
+
 bool FolderGuard::replaceItem(const URL& existing, const URL& replacement, ReplaceOptions options,
                               std::optional<URL>* resulting, ErrorOut error) {
     if (isFolderAlone(existing))
         return fail(error, makePOSIXError(EISDIR, existing));
+    if (isLinkTo(replacement, existing))
+        return fail(error, makePOSIXError(EINVAL, existing));
     return ForwardingFileSystemService::replaceItem(existing, replacement, options, resulting,
                                                     error);
 }

@@ -5,7 +5,8 @@
 namespace parvel::cli {
 
 /// Lets no folder be lost that is no asset: a person who names one means what is in it. Replacing
-/// or removing it fails with EISDIR and touches nothing. A link to a folder is no folder.
+/// or removing it fails with EISDIR and touches nothing. A link to a folder is no folder. Nor does
+/// a link take the place of what it leads to, and lose it: that fails with EINVAL.
 class FolderGuard : public ForwardingFileSystemService {
 public:
     using ForwardingFileSystemService::ForwardingFileSystemService;
@@ -14,5 +15,8 @@ public:
                      std::optional<URL>* resulting, ErrorOut error) override;
     bool removeItem(const URL& item, ErrorOut error) override;
 };
+
+/// Whether the URL is a link that leads to the item, which is none.
+[[nodiscard]] bool isLinkTo(const URL& url, const URL& item);
 
 }  // namespace parvel::cli

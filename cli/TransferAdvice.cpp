@@ -27,7 +27,8 @@ std::string adviceForPOSIXError(std::int64_t code, const URL& place) {
             return place.path() +
                    " is a folder and no book: with --force it goes with all that is in it";
         case EINVAL:
-            return "a folder can't go into itself, nor take the place of one that it lies in";
+            return "a folder can't go into itself, nor anything take the place of what it lies in or "
+                   "leads to";
         case ETIMEDOUT:
             return "its content is not on this device: let the sync client download it and try "
                    "again";

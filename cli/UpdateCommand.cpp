@@ -1,6 +1,7 @@
 #include "cli/AssetChanges.h"
 #include "cli/BookStaging.h"
 #include "cli/Command.h"
+#include "cli/FolderGuard.h"
 #include "cli/TransferAdvice.h"
 
 namespace parvel::cli {
@@ -58,8 +59,9 @@ bool UpdateCommand::isRefused(PVAssetMetadataFileManager& manager, const AssetPt
     if (m_changes.isForced() || (m_existing && m_existing->isUbiquitous()))
         return false;
     const std::optional<URL> place = placeInFolder(asset, m_folder, /*takesAssetID=*/true);
-    if (!place || isSamePlace(*place, *asset->url()) ||
-        !manager.fileManager()->itemExistsAtPath(place->path()))
+    const bool isThere =
+        place && isSamePlace(*place, *asset->url()) && !isLinkTo(*asset->url(), *place);
+    if (!place || isThere || !manager.fileManager()->itemExistsAtPath(place->path()))
         return false;
     if (m_existing && m_existing->url() && isSamePlace(*place, *m_existing->url()))
         return false;

@@ -73,6 +73,9 @@ int AttributesCommand::run(std::vector<std::string> operands) {
         m_updateValues.push_back(PropertyValue::fromText("--update", update));
     if (m_applyFile)
         m_kept.read(*m_applyFile);
+    if (m_dumpFile &&
+        PVAssetMetadata::assetTypeForAssetAtURL(urlOfPath(*m_dumpFile)) != PVAssetTypeUnknown)
+        throw UsageError("--dump " + *m_dumpFile + ": that is the name of an asset");
     m_dryRun.begin();
     const bool reads = !m_write && m_updates.empty() && !m_applyFile;
     // What is written is written in the order given.

@@ -132,6 +132,9 @@ int CoverCommand::run(std::vector<std::string> operands) {
             "an image is nothing for a terminal: give -o FILE, or send the output elsewhere");
     if (hasFile() && isSameFile(*m_file, operands[0]))
         throw UsageError("-o " + *m_file + ": that is the asset itself");
+    if (hasFile() &&
+        PVAssetMetadata::assetTypeForAssetAtURL(urlOfPath(*m_file)) != PVAssetTypeUnknown)
+        throw UsageError("-o " + *m_file + ": that is the name of an asset");
 
     Result result = resultForPath(operands[0]);
     result.nothing = "no cover image";

@@ -3,6 +3,7 @@
 #include <filesystem>
 
 #include "parvel/foundation/ValueReadings.h"
+#include "parvel/metadata/PVMutableAssetMetadata.h"
 
 namespace parvel::cli {
 
@@ -15,10 +16,15 @@ void BookStaging::declare(CommandLine& line) {
     line.exclusive({"--temporary", "--direct"});
 }
 
+void BookStaging::begin() {
+    if (m_temporary)
+        m_directory = urlOfOption("--temporary", *m_temporary);
+}
+
 std::optional<StagingPlace> BookStaging::placeFor(const URL& book, const URL& folder, bool isForced,
                                                   Result& result) const {
     StagingPlace place;
-    if (!m_isDirect && !m_temporary) {
+    if (!m_isDirect && !m_directory) {
         place.fresh = StagingDirectory::makeIn(folder, &result.error);
         if (!place.fresh) {
             if (result.error->domain() == PVFileErrorDomain)
@@ -29,8 +35,7 @@ std::optional<StagingPlace> BookStaging::placeFor(const URL& book, const URL& fo
         return place;
     }
 
-    if (m_temporary)
-        place.directory = urlOfPath(*m_temporary);
+    place.directory = m_directory;
     const URL inTheWay =
         place.directory.value_or(folder).appendingPathComponent(book.lastPathComponent());
     if (isForced || !standsAt(inTheWay))
@@ -49,6 +54,18 @@ void refuse(Result& result, std::string reason, std::string advice) {
     result.nothing = "refused";
     result.reason = std::move(reason);
     result.advice = std::move(advice);
+}
+
+std::optional<URL> storedURL(const AssetPtr& asset) {
+    return asset->copyWithUpdates([](PVMutableAssetMetadata&) {})->url();
+}
+
+bool isRefusedForCapitals(const AssetPtr& asset, Result& result) {
+    if (asset->url() == storedURL(asset))
+        return false;
+    refuse(result, "the library would look for a name that ends in small letters",
+           "give it such a name first, with \"parvel move --to\"");
+    return true;
 }
 
 bool standsAt(const URL& url) {

@@ -21,6 +21,8 @@ struct StagingPlace {
 class BookStaging {
 public:
     void declare(CommandLine& line);
+    /// Reads what was asked for. Throws UsageError.
+    void begin();
     [[nodiscard]] bool isDirect() const { return m_isDirect; }
 
     /// The place for the book of that URL, which is to stand in the folder. None where the result
@@ -32,10 +34,19 @@ public:
 private:
     std::optional<std::string> m_temporary;
     bool m_isDirect = false;
+
+    std::optional<URL> m_directory;
 };
 
 /// Makes the result one that was refused before anything was touched.
 void refuse(Result& result, std::string reason, std::string advice);
+
+/// Where the library looks for an asset once it has written its record: what it writes, it writes
+/// under the stored path, whose extension is in small letters.
+[[nodiscard]] std::optional<URL> storedURL(const AssetPtr& asset);
+
+/// Refuses an asset that the library would take another file for, by the capitals in its extension.
+[[nodiscard]] bool isRefusedForCapitals(const AssetPtr& asset, Result& result);
 
 /// Whether anything stands there, a dangling link included.
 [[nodiscard]] bool standsAt(const URL& url);

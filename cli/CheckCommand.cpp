@@ -4,6 +4,7 @@
 
 #include <unistd.h>
 
+#include "cli/BookStaging.h"
 #include "cli/CallLog.h"
 #include "cli/Command.h"
 #include "cli/DryRun.h"
@@ -94,6 +95,18 @@ std::vector<AssetPtr> CheckCommand::readRecords() const {
     return records;
 }
 
+/// The attributes of a missing asset whose extension holds capitals would go to another file of
+/// that name in small letters.
+bool isLeftOut(Result& result) {
+    const URL url = urlOfPath(result.path);
+    const auto stored = storedURL(PVAssetMetadata::metadataWithURL_dictionary(url, nullptr));
+    if (!stored || *stored == url || !standsAt(*stored) || isSamePlace(*stored, url))
+        return false;
+    refuse(result, "the library would take " + stored->path() + " for it",
+           "give it a name that ends in small letters, with \"parvel move --to\"");
+    return true;
+}
+
 std::vector<URL> CheckCommand::findURLs(std::vector<std::string> operands) {
     std::vector<URL> urls;
     if (operands.empty() && !m_paths.filesFrom)
@@ -101,11 +114,14 @@ std::vector<URL> CheckCommand::findURLs(std::vector<std::string> operands) {
     m_paths.recursive = true;
     PathSource source(std::move(operands), m_paths);
     while (const std::optional<FoundPath> found = interrupted() ? std::nullopt : source.next()) {
+        Result result = resultForPath(found->path);
         if (found->readErrno == 0) {
-            urls.push_back(urlOfPath(found->path));
+            if (isLeftOut(result))
+                reportFailure(result);
+            else
+                urls.push_back(urlOfPath(found->path));
             continue;
         }
-        Result result = resultForPath(found->path);
         result.error = makePOSIXError(found->readErrno, urlOfPath(found->path));
         reportFailure(result);
     }

@@ -6,7 +6,6 @@
 #include "cli/RecordFile.h"
 #include "parvel/foundation/ValueReadings.h"
 #include "parvel/metadata/PVAssetMetadataKeys.h"
-#include "parvel/metadata/PVMutableAssetMetadata.h"
 #include "parvel/xattr/PNMetadataXattr.h"
 
 namespace parvel::cli {
@@ -63,6 +62,7 @@ void EditCommand::declare(CommandLine& line) {
 
 int EditCommand::run(std::vector<std::string> operands) {
     m_changes.begin();
+    m_staging.begin();
     readUpdates();
     return m_changes.run("edit", std::move(operands),
                          [this](PVAssetMetadataFileManager& manager, const AssetPtr& asset,
@@ -109,13 +109,7 @@ bool EditCommand::isRefused(const AssetPtr& asset, Result& result) const {
                "give --force to lose it");
         return true;
     }
-    // What the library writes, it writes under the stored path, whose extension is in lower case.
-    if (asset->url() != asset->copyWithUpdates([](PVMutableAssetMetadata&) {})->url()) {
-        refuse(result, "an edit would look for a name that ends in small letters",
-               "give it such a name first, with \"parvel move --to\"");
-        return true;
-    }
-    return false;
+    return isRefusedForCapitals(asset, result);
 }
 
 void EditCommand::edit(PVAssetMetadataFileManager& manager, const AssetPtr& asset,

@@ -26,6 +26,7 @@ void InflateCommand::declare(CommandLine& line) {
 
 int InflateCommand::run(std::vector<std::string> operands) {
     m_changes.begin();
+    m_staging.begin();
     return m_changes.run("inflate", std::move(operands),
                          [this](PVAssetMetadataFileManager& manager, const AssetPtr& asset,
                                 Result& result) { inflate(manager, asset, result); });
@@ -34,6 +35,8 @@ int InflateCommand::run(std::vector<std::string> operands) {
 void InflateCommand::inflate(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
                              Result& result) const {
     const bool isZipped = asset->isCompressedBookWithError() == true;
+    if (isZipped && !m_changes.isForced() && isRefusedForCapitals(asset, result))
+        return;
     std::optional<StagingPlace> place = StagingPlace{};
     if (isZipped)
         place = m_staging.placeFor(*asset->url(), asset->url()->deletingLastPathComponent(),

@@ -52,6 +52,7 @@ private:
                                  Result& result) const;
     [[nodiscard]] std::optional<URL> takenPlace(PVAssetMetadataFileManager& manager,
                                                 const AssetPtr& asset) const;
+    [[nodiscard]] std::optional<URL> placeOfOldName(PVAssetMetadataFileManager& manager) const;
 
     std::optional<std::string> m_into;
     bool m_moves = false;
@@ -90,6 +91,7 @@ void InstallCommand::declare(CommandLine& line) {
 
 int InstallCommand::run(std::vector<std::string> operands) {
     m_changes.begin();
+    m_staging.begin();
     m_form = m_progress.form();
     if (!m_into)
         throw UsageError("say where to: --into DIR");
@@ -98,7 +100,7 @@ int InstallCommand::run(std::vector<std::string> operands) {
     if (m_updatingPath) {
         if (!m_changes.hasOnePath(operands))
             throw UsageError("--updating takes one PATH");
-        Result updating = resultForPath(*m_updatingPath);
+        Result updating = resultForPath(urlOfOption("--updating", *m_updatingPath).path());
         m_updating = AssetRecord(Uninspectable::HasItsURLAlone).forResult(updating);
     }
     return m_changes.run("install", std::move(operands),
@@ -118,10 +120,31 @@ std::optional<URL> InstallCommand::takenPlace(PVAssetMetadataFileManager& manage
     return isTaken ? place : std::nullopt;
 }
 
+/// What stands under the updated asset's name in a folder that it does not lie in.
+std::optional<URL> InstallCommand::placeOfOldName(PVAssetMetadataFileManager& manager) const {
+    const bool takesOldName = m_updating && m_replaces && !m_goesToCloud;
+    const auto old = takesOldName ? m_updating->url() : std::nullopt;
+    if (!old)
+        return std::nullopt;
+    const URL place = m_folder.appendingPathComponent(old->lastPathComponent());
+    const bool isOther =
+        manager.fileManager()->itemExistsAtPath(place.path()) && !isSamePlace(place, *old);
+    return isOther ? std::optional(place) : std::nullopt;
+}
+
 bool InstallCommand::isRefused(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
                                Result& result) const {
-    if (!m_moves || m_changes.isForced())
+    if (m_changes.isForced())
         return false;
+    if (const std::optional<URL> other = placeOfOldName(manager)) {
+        refuse(result, other->path() + " is another asset than the updated one, and would be lost",
+               "give its folder with --into, or --force to lose it");
+        return true;
+    }
+    if (!m_moves)
+        return false;
+    if (isRefusedForCapitals(asset, result))
+        return true;
     const std::optional<URL> taken = takenPlace(manager, asset);
     if (taken)
         refuse(result, taken->path() + " is taken, and the library would delete the book then",

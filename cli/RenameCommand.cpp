@@ -1,4 +1,5 @@
 #include "cli/AssetChanges.h"
+#include "cli/BookStaging.h"
 #include "cli/Command.h"
 #include "cli/TransferAdvice.h"
 #include "parvel/metadata/PVMutableAssetMetadata.h"
@@ -37,6 +38,8 @@ int RenameCommand::run(std::vector<std::string> operands) {
 
 void RenameCommand::rename(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
                            Result& result) const {
+    if (asset->isPDF() && isRefusedForCapitals(asset, result))
+        return;
     AssetPtr named = asset;
     if (m_displayName)
         named = asset->copyWithUpdates(

@@ -45,7 +45,7 @@ int UpdateCommand::run(std::vector<std::string> operands) {
     if (m_existingPath) {
         if (!m_changes.hasOnePath(operands))
             throw UsageError("--existing takes one PATH");
-        Result existing = resultForPath(*m_existingPath);
+        Result existing = resultForPath(urlOfOption("--existing", *m_existingPath).path());
         m_existing = AssetRecord(Uninspectable::HasItsURLAlone).forResult(existing);
     }
     return m_changes.run("update", std::move(operands),
@@ -56,7 +56,11 @@ int UpdateCommand::run(std::vector<std::string> operands) {
 /// The library puts the new version over whatever stands at its name.
 bool UpdateCommand::isRefused(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
                               Result& result) const {
-    if (m_changes.isForced() || (m_existing && m_existing->isUbiquitous()))
+    if (m_changes.isForced())
+        return false;
+    if (isRefusedForCapitals(asset, result))
+        return true;
+    if (m_existing && m_existing->isUbiquitous())
         return false;
     const std::optional<URL> place = placeInFolder(asset, m_folder, /*takesAssetID=*/true);
     const bool isThere =

@@ -1,5 +1,6 @@
 #include "cli/AssetChanges.h"
 
+#include "cli/ArrivalGuard.h"
 #include "cli/Batch.h"
 #include "cli/FolderGuard.h"
 
@@ -50,6 +51,8 @@ int AssetChanges::runOnPaths(std::string_view command, std::vector<std::string> 
     const auto manager = m_dryRun.makeManager();
     if (m_isGuarded && !m_isForced)
         manager->setFileManager(std::make_shared<FolderGuard>(manager->fileManager()));
+    if (m_isGuarded && !m_isForced && m_paths.target)
+        manager->setFileManager(std::make_shared<ArrivalGuard>(manager->fileManager()));
     return runOverPaths(options, source, [&](const std::string& path) {
         Result result = resultForPath(path);
         result.nothing = "nothing was done";

@@ -32,7 +32,8 @@ public:
     void declareForce(CommandLine& line, std::string_view help);
     [[nodiscard]] bool isForced() const { return m_isForced; }
     [[nodiscard]] bool isDryRun() const { return m_dryRun.isAsked(); }
-    /// Assets that lie in the folder already are left out where a PATH's subfolders are searched.
+    /// Assets that lie in the folder already are left out where a PATH's subfolders are searched;
+    /// what the run brings there it does not replace, unless forced to.
     void setTarget(const URL& folder) { m_paths.target = folder; }
     /// Whether there is but one PATH among the operands, and no other source of PATHs.
     [[nodiscard]] bool hasOnePath(const std::vector<std::string>& operands) const;

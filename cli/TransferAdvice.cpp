@@ -29,6 +29,8 @@ std::string adviceForPOSIXError(std::int64_t code, const URL& place) {
         case EINVAL:
             return "a folder can't go into itself, nor anything take the place of what it lies in or "
                    "leads to";
+        case EALREADY:
+            return place.path() + " was brought there by this run; --force replaces it";
         case ETIMEDOUT:
             return "its content is not on this device: let the sync client download it and try "
                    "again";

@@ -12,6 +12,7 @@
 #include "parvel/platform/Rehearsal.h"
 #include "parvel/xattr/ExtendedAttributes.h"
 #include "parvel/xattr/PNMetadataXattr.h"
+#include "tests/support/EnvironmentValue.h"
 #include "tests/support/TemporaryDirectory.h"
 
 namespace parvel::testing {
@@ -43,18 +44,6 @@ using Operation = std::function<bool(FileSystemService& service, Said& said)>;
 /// A folder in which every operation is rehearsed, and then done.
 class RehearsedFolder : public ::testing::Test {
 protected:
-    void SetUp() override {
-        if (const char* data = getenv("XDG_DATA_HOME"))
-            m_savedData = data;
-        setenv("XDG_DATA_HOME", (m_folder / "data").c_str(), 1);
-    }
-    void TearDown() override {
-        if (m_savedData)
-            setenv("XDG_DATA_HOME", m_savedData->c_str(), 1);
-        else
-            unsetenv("XDG_DATA_HOME");
-    }
-
     [[nodiscard]] URL at(const std::string& name) const { return m_folder.url(name); }
 
     /// Every name below the folder, with the content of files and the target of links.
@@ -123,9 +112,9 @@ protected:
     }
 
     TemporaryDirectory m_folder;
+    const EnvironmentValue m_dataHome{"XDG_DATA_HOME", m_folder / "data"};
 
 private:
-    std::optional<std::string> m_savedData;
 };
 
 TEST_F(RehearsedFolder, AMovedItemIsFoundAtItsNewPlaceAlone) {
@@ -346,7 +335,6 @@ std::optional<String> attributeAt(const URL& url, std::string_view name) {
 class RehearsedAttributesOfFiles : public RehearsedFolder {
 protected:
     void SetUp() override {
-        RehearsedFolder::SetUp();
         m_folder.write("a.epub", "1");
         if (!pvamfm_setExtendedAttributeString_forKey_error(at("a.epub"), "A", "one"))
             GTEST_SKIP() << "the file system keeps no extended attributes";

@@ -7,6 +7,7 @@
 #include <gtest/gtest.h>
 
 #include "parvel/platform/FileSystemService.h"
+#include "tests/support/EnvironmentValue.h"
 #include "tests/support/TemporaryDirectory.h"
 
 namespace parvel::testing {
@@ -17,29 +18,17 @@ namespace fs = std::filesystem;
 /// A home trash of the test's own, on the file system of its items.
 class Trash : public ::testing::Test {
 protected:
-    void SetUp() override {
-        if (const char* data = getenv("XDG_DATA_HOME"))
-            m_savedData = data;
-        setenv("XDG_DATA_HOME", (m_folder / "data").c_str(), 1);
-    }
-    void TearDown() override {
-        if (m_savedData)
-            setenv("XDG_DATA_HOME", m_savedData->c_str(), 1);
-        else
-            unsetenv("XDG_DATA_HOME");
-    }
-
     [[nodiscard]] fs::path trash(const std::string& name) const {
         return m_folder.path() / "data/Trash" / name;
     }
 
     TemporaryDirectory m_folder;
+    const EnvironmentValue m_dataHome{"XDG_DATA_HOME", m_folder / "data"};
     std::shared_ptr<FileSystemService> m_service = FileSystemService::makeDefault();
     std::optional<URL> m_resulting;
     std::optional<Error> m_error;
 
 private:
-    std::optional<std::string> m_savedData;
 };
 
 TEST_F(Trash, ATrashedItemLiesInTheHomeTrashWithItsInfoFile) {

@@ -7,6 +7,7 @@
 
 #include "parvel/platform/FileSystemService.h"
 #include "parvel/platform/TrashedItems.h"
+#include "tests/support/EnvironmentValue.h"
 #include "tests/support/TemporaryDirectory.h"
 
 namespace parvel::testing {
@@ -15,18 +16,6 @@ namespace {
 /// A home trash of the test's own; what lies in other volumes' trash folders is passed over.
 class TrashedItems : public ::testing::Test {
 protected:
-    void SetUp() override {
-        if (const char* data = getenv("XDG_DATA_HOME"))
-            m_savedData = data;
-        setenv("XDG_DATA_HOME", (m_folder / "data").c_str(), 1);
-    }
-    void TearDown() override {
-        if (m_savedData)
-            setenv("XDG_DATA_HOME", m_savedData->c_str(), 1);
-        else
-            unsetenv("XDG_DATA_HOME");
-    }
-
     void trash(const std::string& name) {
         m_folder.write(name, name);
         ASSERT_TRUE(m_service->trashItem(m_folder.url(name), nullptr));
@@ -48,10 +37,10 @@ protected:
     }
 
     TemporaryDirectory m_folder;
+    const EnvironmentValue m_dataHome{"XDG_DATA_HOME", m_folder / "data"};
     std::shared_ptr<FileSystemService> m_service = FileSystemService::makeDefault();
 
 private:
-    std::optional<std::string> m_savedData;
 };
 
 using Pairs = std::vector<std::pair<std::string, std::string>>;

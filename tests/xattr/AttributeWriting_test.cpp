@@ -14,6 +14,7 @@
 #include "tests/support/AttributeFolder.h"
 #include "tests/support/ForwardingXattrStore.h"
 #include "tests/support/RecordedLog.h"
+#include "tests/support/RefusingSizeQuery.h"
 
 namespace parvel::testing {
 namespace {
@@ -264,31 +265,10 @@ TEST_F(AttributeWriting, AnItemThatCanNotBeQueriedHasNoSizeAndSaysWhy) {
     EXPECT_EQ(log.lines(), std::vector<std::string>{"error Failed to state file for directory"});
 }
 
-/// A host that can't tell a file's size.
-class SizelessQueries : public ResourceQueries {
-public:
-    bool isReachable(const URL& url, ErrorOut error) override {
-        return host().isReachable(url, error);
-    }
-    std::optional<bool> isDirectory(const URL& url, ErrorOut error) override {
-        return host().isDirectory(url, error);
-    }
-    std::optional<std::uint64_t> totalAllocatedSize(const URL& url, ErrorOut error) override {
-        return fail(error, makePOSIXError(EIO, url));
-    }
-    std::optional<DirectoryRelationship> relationship(const URL& directory, const URL& item,
-                                                      ErrorOut error) override {
-        return host().relationship(directory, item, error);
-    }
-
-private:
-    Service<ResourceQueries>::Replacement m_replacement{*this};
-};
-
 TEST_F(AttributeWriting, AFileWhoseSizeCanNotBeToldGivesNoneAndNoError) {
     const URL url = file();
     m_error = makeNoIdentityError();
-    const SizelessQueries queries;
+    const RefusingSizeQuery queries;
     RecordedLog log;
 
     EXPECT_EQ(fixPermissionsAndCalculateAllocatedSize(url, &m_error), 0U);

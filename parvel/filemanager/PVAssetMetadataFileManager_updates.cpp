@@ -37,7 +37,7 @@ PVAssetMetadataFileManager::updateAsset_withUpdates_temporaryDirectory_inflateIf
     }
 
     const bool isKnown = renamed->containsAsset(*changes);
-    const AssetPtr combined = renamed->copyWithUpdates([&](PVMutableAssetMetadata& copy) {
+    AssetPtr combined = renamed->copyWithUpdates([&](PVMutableAssetMetadata& copy) {
         copy.combineWithMetadata(changes.get());
         copy.setGenerationCount(copy.generationCount() + 1);
         // Deliberate: updates that don't speak of a preview make it none.
@@ -61,8 +61,7 @@ PVAssetMetadataFileManager::updateAsset_withUpdates_temporaryDirectory_inflateIf
         PVParvelLog().error("updateMetadata: Inflate failed -- Bailing Out");
         return nullptr;
     }
-    const AssetPtr covered =
-        _updateImageCoverDataForMetadta_updates_error(inflated, changes, slot.out());
+    AssetPtr covered = _updateImageCoverDataForMetadta_updates_error(inflated, changes, slot.out());
     if (!covered) {
         PVParvelLog().error("updateMetadata: Update image cover failed -- Bailing Out");
         return nullptr;

@@ -72,7 +72,7 @@ PVAssetMetadataInspector::_pdf_metadataForAssetAtURL_preloadedMetadata_includeCo
         return nullptr;
     }
 
-    const MutableAssetPtr record = PVAssetMetadata::metadataWithURL_dictionary(url, nullptr);
+    MutableAssetPtr record = PVAssetMetadata::metadataWithURL_dictionary(url, nullptr);
     const String name = withReplacedInvalidUTF8(pathWithoutExtension(url.lastPathComponent()));
     record->setArtistName(document->author());
     // Deliberate: the document's own title is not read.

@@ -154,6 +154,10 @@ void Document::close() {
     m_bytes.reset();
 }
 
+std::uint64_t Document::inputSize() const {
+    return m_bytes ? m_bytes->bytes().size() : 0;
+}
+
 Answer Document::describePage() const {
     Answer answer;
     answer.reply.outcome = Outcome::Done;

@@ -27,6 +27,8 @@ public:
     /// Refused for what is no document.
     [[nodiscard]] Answer open(const Received& received);
     void close();
+    /// How many bytes the open document takes in the address space; 0 for none.
+    [[nodiscard]] std::uint64_t inputSize() const;
     [[nodiscard]] Answer describePage() const;
     /// Refused when there is no page to draw.
     [[nodiscard]] Answer drawPage(const Request& request) const;

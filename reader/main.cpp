@@ -44,7 +44,8 @@ public:
             m_document.close();
             return true;
         }
-        allowAddressSpace(received.request.size);
+        // A document that is open stays mapped while something else is asked.
+        allowAddressSpace(received.request.size + m_document.inputSize());
         Answer answer;
         const bool isAnswered = makeAnswer(received, answer);
         answer.reply.number = received.request.number;
@@ -68,7 +69,7 @@ private:
                 return true;
             }
             case Ask::DecodeImage:
-                limitProcessorTime(drawingMilliseconds);
+                limitProcessorTime(decodingMilliseconds);
                 answer = decodedImage(received);
                 return true;
             default:

@@ -40,15 +40,16 @@ public:
 
     /// Whether the document is encrypted and the empty password does not open it.
     [[nodiscard]] virtual bool isLocked() const = 0;
-    /// The entry of the document information; none when it is missing, is no text or is longer than
-    /// 64 KiB as UTF-8.
+    /// The entry of the document information; none when it is missing or is longer than 64 KiB as
+    /// UTF-8, empty when it is no text.
     [[nodiscard]] virtual std::optional<std::string> author() const = 0;
     [[nodiscard]] virtual std::optional<std::string> subject() const = 0;
     /// None when the entry is missing or is no date.
     [[nodiscard]] virtual std::optional<Date> creationDate() const = 0;
     [[nodiscard]] virtual std::optional<Date> modificationDate() const = 0;
     [[nodiscard]] virtual std::uint32_t pageCount() const = 0;
-    /// Null when there is none, also where the page count says otherwise.
+    /// Null when there is none, also where the page count says otherwise. One of which nothing
+    /// could be learnt has no size and is not drawn.
     [[nodiscard]] virtual std::unique_ptr<PdfPage> firstPage() = 0;
 };
 

@@ -10,6 +10,7 @@
 #include <filesystem>
 #include <thread>
 
+#include "parvel/inspection/PVAssetMetadataInspector.h"
 #include "parvel/platform/PdfDocument.h"
 #include "parvel/platform/ReaderProgram.h"
 #include "tests/support/HelperProcesses.h"
@@ -366,12 +367,32 @@ TEST_F(HelperProcessTest, OpensNothingWhenItsAnswerDoesNotAddUp) {
         expectNoDocumentFrom(fault);
 }
 
-TEST_F(HelperProcessTest, DescribesNoPageWithoutNumbers) {
-    const GivenReaderProgram given(falseReader("no-number"));
-    const auto document = open();
+TEST_F(HelperProcessTest, DrawsNoPageOfWhichNothingCouldBeLearnt) {
+    for (const char* fault : {"no-number", "ends-over-page"}) {
+        const GivenReaderProgram given(falseReader(fault));
+        const auto document = open();
+        ASSERT_TRUE(document) << fault;
 
-    ASSERT_TRUE(document);
-    EXPECT_FALSE(document->firstPage());
+        const auto page = document->firstPage();
+
+        ASSERT_TRUE(page) << fault;
+        EXPECT_EQ(page->cropBoxWidth(), 0) << fault;
+        EXPECT_FALSE(PVAssetMetadataInspector::_new_pdf_coverImage_imageSize(m_folder.url("a.pdf"),
+                                                                             340, 380))
+            << fault;
+    }
+}
+
+TEST_F(HelperProcessTest, GetsNoDescriptorInThatItDidNotAskFor) {
+    const GivenReaderProgram given(falseReader("two-files"));
+    const auto document = open();
+    const auto page = document ? document->firstPage() : nullptr;
+    ASSERT_TRUE(page);
+    const std::set<std::string> before = openDescriptors();
+
+    EXPECT_FALSE(page->draw(10, 10));
+
+    EXPECT_LE(openDescriptors().size(), before.size());
 }
 
 TEST_F(HelperProcessTest, DrawsNothingWhenItsPixelsDoNotAddUp) {

@@ -1,6 +1,8 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <fstream>
+#include <string>
 
 #include "parvel/platform/PdfDocument.h"
 #include "tests/support/Colours.h"
@@ -147,6 +149,28 @@ TEST_F(PdfPageTest, IsNotDrawnWhereThatTakesTooLong) {
 
     EXPECT_FALSE(draw(PdfBuilder{}.page("", curves), 293, 380));
     EXPECT_TRUE(draw(PdfBuilder{}.page(""), 293, 380)) << "the next page is drawn";
+}
+
+TEST_F(PdfPageTest, IsDrawnOutOfADocumentLongerThanTheHelpersMemory) {
+    // A hole in front of the cross-reference table, where no object stands.
+    constexpr std::size_t hole = 300 << 20;
+    const std::string bytes = PdfBuilder{}.page("", cornerMarks(0, 0, 612, 792)).bytes();
+    const std::size_t table = bytes.rfind("xref", bytes.rfind("startxref") - 1);
+    std::string end = bytes.substr(table, bytes.rfind("startxref") - table);
+    end += "startxref\n" + std::to_string(table + hole) + "\n%%EOF\n";
+    std::ofstream file(m_folder / "a.pdf", std::ios::binary);
+    file << bytes.substr(0, table);
+    file.seekp(static_cast<std::streamoff>(table + hole));
+    file << end << std::flush;
+    const auto document = PdfDocuments::host().open(m_folder.url("a.pdf"));
+    ASSERT_TRUE(document);
+    const auto page = document->firstPage();
+    ASSERT_TRUE(page);
+
+    const std::optional<Image> image = page->draw(293, 380);
+
+    ASSERT_TRUE(image);
+    EXPECT_EQ(cornersOf(*image), (std::vector<std::uint32_t>{blue, white, red, green}));
 }
 
 TEST_F(PdfPageTest, IsDrawnAgainAfterAnotherDocumentWasOpened) {

@@ -19,8 +19,9 @@ namespace {
 /// Of the request that is answered.
 std::uint32_t number = 0;
 
+/// With `count` descriptors of the file.
 void say(const Reply& reply, const std::string& text = "", int file = -1,
-         std::size_t headerSize = sizeof(Reply)) {
+         std::size_t headerSize = sizeof(Reply), std::size_t count = 1) {
     Reply header = reply;
     header.number = number;
     std::array<iovec, 2> parts{iovec{&header, headerSize},
@@ -28,15 +29,16 @@ void say(const Reply& reply, const std::string& text = "", int file = -1,
     msghdr message{};
     message.msg_iov = parts.data();
     message.msg_iovlen = parts.size();
-    alignas(cmsghdr) std::array<char, CMSG_SPACE(sizeof(int))> space{};
+    const std::array<int, 2> files{file, file};
+    alignas(cmsghdr) std::array<char, CMSG_SPACE(sizeof files)> space{};
     if (file >= 0) {
         message.msg_control = space.data();
-        message.msg_controllen = space.size();
+        message.msg_controllen = CMSG_SPACE(count * sizeof file);
         cmsghdr* control = CMSG_FIRSTHDR(&message);
         control->cmsg_level = SOL_SOCKET;
         control->cmsg_type = SCM_RIGHTS;
-        control->cmsg_len = CMSG_LEN(sizeof file);
-        std::memcpy(CMSG_DATA(control), &file, sizeof file);
+        control->cmsg_len = CMSG_LEN(count * sizeof file);
+        std::memcpy(CMSG_DATA(control), files.data(), count * sizeof file);
     }
     ::sendmsg(socketDescriptor, &message, MSG_NOSIGNAL);
 }
@@ -95,7 +97,8 @@ void sayPixels(const std::string& fault, const Request& request) {
     reply.size = std::uint64_t{reply.stride} * reply.height;
     if (fault == "no-file")
         return say(reply);
-    say(reply, "", memoryFile(reply.size - (fault == "small-file" ? 1 : 0), fault != "unsealed"));
+    say(reply, "", memoryFile(reply.size - (fault == "small-file" ? 1 : 0), fault != "unsealed"),
+        sizeof(Reply), fault == "two-files" ? 2 : 1);
 }
 
 int run(const std::string& fault) {
@@ -115,6 +118,8 @@ int run(const std::string& fault) {
             ++number;
         if (request.ask == Ask::OpenDocument)
             sayInformation(fault);
+        else if (request.ask == Ask::DescribePage && fault == "ends-over-page")
+            return 0;
         else if (request.ask == Ask::DescribePage)
             sayPage(fault);
         else if (request.ask == Ask::DrawPage)

@@ -277,7 +277,8 @@ bool HelperProcess::receive(HelperAnswer& answer) {
     message.msg_iovlen = parts.size();
     DescriptorSpace space;
     message.msg_control = space.bytes.data();
-    message.msg_controllen = space.bytes.size();
+    // No room for a second one, which would then be nobody's.
+    message.msg_controllen = CMSG_LEN(sizeof(int));
     const ssize_t count =
         retried([&] { return ::recvmsg(m_socket.get(), &message, MSG_CMSG_CLOEXEC); });
     if (count <= 0)

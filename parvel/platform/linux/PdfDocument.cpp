@@ -253,13 +253,15 @@ public:
         Request request;
         request.ask = Ask::DescribePage;
         HelperAnswer answer;
-        if (isLocked() || pageCount() == 0 || !askOfPage(m_document, request, answer))
+        if (isLocked() || pageCount() == 0)
             return nullptr;
+        const bool isAnswered = askOfPage(m_document, request, answer);
         const Reply& reply = answer.reply;
-        if (reply.hasFirstPage == 0 || !isLength(reply.cropBoxWidth) ||
-            !isLength(reply.cropBoxHeight))
+        if (isAnswered && reply.hasFirstPage == 0)
             return nullptr;
-        return std::make_unique<HelperPdfPage>(m_document, reply);
+        const bool isSound =
+            isAnswered && isLength(reply.cropBoxWidth) && isLength(reply.cropBoxHeight);
+        return std::make_unique<HelperPdfPage>(m_document, isSound ? reply : Reply());
     }
 
 private:

@@ -100,10 +100,12 @@ struct Reply {
 /// The longest side of a page that is drawn.
 inline constexpr std::uint32_t longestDrawnSide = 16384;
 
-/// The CPU time that may go into all information of a document, and into the drawing of a page; a
-/// person waits for no cover longer than that. And the longest wait for a reply.
+/// The CPU time that may go into all information of a document, into the drawing of a page (a list
+/// of covers waits for no one longer than that) and into the decoding of an image. And the longest
+/// wait for a reply.
 inline constexpr int informationMilliseconds = 1500;
 inline constexpr int drawingMilliseconds = 1200;
+inline constexpr int decodingMilliseconds = 5000;
 inline constexpr int longestWaitMilliseconds = 10000;
 /// Address space beyond the input's own bytes, and what a helper gets for the input unless that is
 /// longer.

@@ -49,11 +49,21 @@ AssetPtr PVAssetMetadataFileManager::setUbiquitous_asset_intoDirectory_replace_e
         return nullptr;
     }
 
-    const URL target = directory.appendingPathComponent(
-        nonCollidingNameForFileName_inDestPath(name, directory.path()));
-    if (!m_fileManager->setUbiquitous(ubiquitous, *source, target, error))
-        return nullptr;
-    return asset->copyWithUpdatedURL(target);
+    for (;;) {
+        const URL target = directory.appendingPathComponent(
+            nonCollidingNameForFileName_inDestPath(name, directory.path()));
+        std::optional<Error> failure;
+        if (m_fileManager->setUbiquitous(ubiquitous, *source, target, &failure))
+            return asset->copyWithUpdatedURL(target);
+        // A competitor that took the name meanwhile sends the count on.
+        const bool isTaken = failure == makeFileError(PVFileErrorCode::FileExists, target) &&
+                             m_fileManager->itemExistsAtPath(target.path());
+        if (!isTaken) {
+            if (failure)
+                assign(error, std::move(failure));
+            return nullptr;
+        }
+    }
 }
 
 AssetPtr PVAssetMetadataFileManager::replaceUbiquitousAsset_withAsset_error(

@@ -72,6 +72,7 @@ AssetPtr PVAssetMetadataFileManager::_renameExistingPDFMetadata_toDisplayName_er
         return nullptr;
     }
 
+    // Deliberate: the prefix differs from the other lines.
     PVParvelLog().info("PDFRenamed: renamed -- Success");
     return asset->copyWithUpdates([&](PVMutableAssetMetadata& copy) {
         copy.setUrl(proposed);

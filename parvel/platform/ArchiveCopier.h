@@ -66,11 +66,11 @@ public:
     /// (EOPNOTSUPP), and a file that grows or shrinks meanwhile (EIO).
     ///
     /// An archive's files become 0600, its folders 0700. Refused are a file that is no archive, or
-    /// whose entries claim more than it can hold (EBADMSG), or more than the disk has room for
-    /// (ENOSPC), all fatal; entries with an absolute name or an empty, `.` or `..` component
-    /// (EPERM), a name too long or too deep (ENAMETOOLONG), links (ELOOP), devices and unknown
-    /// methods (EOPNOTSUPP), encrypted ones (EACCES), a name's second one (EEXIST), and those whose
-    /// content is not of the size and checksum that they claim (EBADMSG).
+    /// whose entries claim more than it can hold, or more than 100,000 folders (EBADMSG), or more
+    /// than the disk has room for (ENOSPC), all fatal; entries with an absolute name or an empty,
+    /// `.` or `..` component (EPERM), a name too long or too deep (ENAMETOOLONG), links (ELOOP),
+    /// devices and unknown methods (EOPNOTSUPP), encrypted ones (EACCES), a name's second one
+    /// (EEXIST), and those whose content is not of the size and checksum that they claim (EBADMSG).
     [[nodiscard]] virtual int copy(const std::string& source, const std::string& destination,
                                    const Dictionary& options) = 0;
     /// Ends a copy, running or to come, within its current piece.

@@ -17,8 +17,8 @@ enum class WritingIntent { ForMoving = 2, ForReplacing = 8 };
 /// give it another.
 class PV_EXPORT FileCoordinator {
 public:
-    /// Called once with the URL to use: the one asked for, the place to which its last holder moved
-    /// the item, or none when its folder is gone.
+    /// Called once with the URL to use: the one asked for, the place to which the holder that it
+    /// waited for moved the item, or none when its folder is gone.
     using Accessor = std::function<void(const std::optional<URL>& url)>;
 
     virtual ~FileCoordinator() = default;
@@ -28,8 +28,8 @@ public:
     /// within the accessor to an item that this thread holds does not wait for itself.
     virtual bool coordinateWriting(const URL& url, WritingIntent intent, ErrorOut error,
                                    const Accessor& accessor) = 0;
-    /// Tells, from within an accessor, that the item that it holds was moved: whoever waits for it,
-    /// or comes later and finds nothing there, is handed the new place.
+    /// Tells, from within an accessor, that the item that it holds was moved: whoever waits for it
+    /// meanwhile is handed the new place. Whoever comes later is handed the place that it asks for.
     virtual void itemDidMove(const URL& from, const URL& to) = 0;
 
     /// A new default coordinator. A killed holder leaves no lock behind.

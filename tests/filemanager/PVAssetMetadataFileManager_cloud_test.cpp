@@ -1,3 +1,6 @@
+#include <fstream>
+#include <utility>
+
 #include <gtest/gtest.h>
 
 #include "tests/support/ManagedFolder.h"
@@ -31,6 +34,33 @@ protected:
 
     TemporaryDirectory m_locks;
 };
+
+/// Takes the name in the synchronised folder between the test and the move, once.
+class CompetingCloudService : public ForwardingFileSystemService {
+public:
+    CompetingCloudService() : ForwardingFileSystemService(FileSystemService::makeDefault()) {}
+    bool setUbiquitous(bool ubiquitous, const URL& source, const URL& destination,
+                       ErrorOut error) override {
+        if (!std::exchange(m_hasCompeted, true))
+            std::ofstream(destination.path()) << "competitor";
+        return ForwardingFileSystemService::setUbiquitous(ubiquitous, source, destination, error);
+    }
+
+private:
+    bool m_hasCompeted = false;
+};
+
+TEST_F(SynchronisedFolder, ACompetitorThatTookTheNameSendsTheCountOn) {
+    m_manager->setFileManager(std::make_shared<CompetingCloudService>());
+
+    const AssetPtr moved = setUbiquitous(true, asset("Guide.epub", "mine"), cloud());
+
+    ASSERT_TRUE(moved);
+    EXPECT_FALSE(m_error);
+    EXPECT_EQ(booksInCloud(), (Names{"Guide 1.epub", "Guide.epub"}));
+    EXPECT_EQ(m_folder.read("cloud/Guide.epub"), "competitor");
+    EXPECT_EQ(m_folder.read("cloud/Guide 1.epub"), "mine");
+}
 
 TEST_F(SynchronisedFolder, ABookGoesInUnderItsSanitisedTitle) {
     const auto book = asset("a.epub");

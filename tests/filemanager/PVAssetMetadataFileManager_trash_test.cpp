@@ -179,12 +179,27 @@ TEST_F(TakingAway, RemovingNoRecordLogsThatNoneWasGiven) {
 }
 
 TEST_F(TakingAway, AnAssetThatIsNotDownloadedIsRemovedByItsPlaceholder) {
+    makeFolder(".stfolder");
     m_folder.write("a.epub.nextcloud", " ");
     const auto book = PVAssetMetadata::metadataWithURL_dictionary(m_folder.url("a.epub"), nullptr);
 
     EXPECT_TRUE(m_manager->removeAsset_error(book, &m_error));
 
-    EXPECT_EQ(names(), Names{});
+    EXPECT_EQ(names(), Names{".stfolder"});
+}
+
+TEST_F(TakingAway, NothingNamedLikeAPlaceholderIsRemovedOutsideOfSynchronisedFolders) {
+    m_folder.write("a.epub.nextcloud", " ");
+    m_folder.write("b.epub.nextcloud/kept", "kept");
+    for (const char* name : {"a.epub", "b.epub"}) {
+        const auto book = PVAssetMetadata::metadataWithURL_dictionary(m_folder.url(name), nullptr);
+
+        EXPECT_FALSE(m_manager->removeAsset_error(book, &m_error));
+
+        EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::NoSuchFile, m_folder.url(name)));
+    }
+    EXPECT_EQ(names(), (Names{"a.epub.nextcloud", "b.epub.nextcloud"}));
+    EXPECT_EQ(m_folder.read("b.epub.nextcloud/kept"), "kept");
 }
 
 TEST_F(TakingAway, ARedactedAssetIsMovedAside) {

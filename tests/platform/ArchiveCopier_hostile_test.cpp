@@ -172,6 +172,20 @@ TEST_F(HostileArchives, ALinkPlantedInTheCopyIsNotFollowed) {
     EXPECT_TRUE(std::filesystem::is_empty(m_folder / "outside"));
 }
 
+TEST_F(HostileArchives, NamesThatAskForVeryManyFoldersAreABomb) {
+    std::string folders;
+    for (int depth = 0; depth < 190; ++depth)
+        folders += "f/";
+    ZipBuilder archive;
+    for (int index = 0; index < 600; ++index)
+        archive.stored(std::to_string(index) + "/" + folders + "a", "");
+
+    EXPECT_EQ(expand(archive), EBADMSG);
+
+    EXPECT_EQ(m_callbacks.fatal, std::vector<int>{EBADMSG});
+    EXPECT_EQ(namesAround(), Names{"source"});
+}
+
 TEST_F(HostileArchives, EntriesThatShareTheirBytesAreABomb) {
     const std::string zeros(1 << 20, '\0');
     ZipBuilder archive;

@@ -5,8 +5,11 @@
 #include <unistd.h>
 
 #include <atomic>
+#include <chrono>
 #include <filesystem>
+#include <fstream>
 #include <latch>
+#include <string>
 #include <thread>
 
 #include <gtest/gtest.h>
@@ -119,6 +122,19 @@ TEST_F(Coordination, ThreadsTakeTurnsAlsoThroughALinkedFolder) {
     EXPECT_EQ(collisions, 0);
 }
 
+/// Until a lock of this host has somebody who waits for it.
+void awaitBlockedLock() {
+    for (int tries = 0; tries < 1000; ++tries) {
+        std::ifstream locks("/proc/locks");
+        for (std::string line; std::getline(locks, line);) {
+            if (line.find("-> OFDLCK") != std::string::npos)
+                return;
+        }
+        std::this_thread::sleep_for(std::chrono::milliseconds(5));
+    }
+    ADD_FAILURE() << "nobody waits";
+}
+
 TEST_F(Coordination, AWaiterIsHandedThePlaceToWhichTheItemMoved) {
     const URL book = URL::fileURLWithPath(m_folder.write("a.epub", "1"));
     const URL moved = m_folder.url("b.epub");
@@ -132,12 +148,28 @@ TEST_F(Coordination, AWaiterIsHandedThePlaceToWhichTheItemMoved) {
 
     m_coordinator->coordinateWriting(book, WritingIntent::ForMoving, nullptr, [&](const auto&) {
         isHeld.count_down();
+        awaitBlockedLock();
         fs::rename(book.path(), moved.path());
         m_coordinator->itemDidMove(book, moved);
     });
     waiter.join();
 
     EXPECT_EQ(handed, moved);
+}
+
+TEST_F(Coordination, WhoeverComesAfterTheMoveIsHandedThePlaceThatItAsksFor) {
+    const URL book = URL::fileURLWithPath(m_folder.write("a.epub", "1"));
+    const URL moved = m_folder.url("b.epub");
+    m_coordinator->coordinateWriting(book, WritingIntent::ForMoving, nullptr, [&](const auto&) {
+        fs::rename(book.path(), moved.path());
+        m_coordinator->itemDidMove(book, moved);
+    });
+    std::optional<URL> handed;
+
+    m_coordinator->coordinateWriting(book, WritingIntent::ForReplacing, nullptr,
+                                     [&](const auto& url) { handed = url; });
+
+    EXPECT_EQ(handed, book);
 }
 
 TEST_F(Coordination, AnItemThatStandsAtItsPlaceAgainMakesAnOlderMoveUntrue) {

@@ -152,16 +152,19 @@ TEST_F(PdfPageTest, IsNotDrawnWhereThatTakesTooLong) {
 }
 
 TEST_F(PdfPageTest, IsDrawnOutOfADocumentLongerThanTheHelpersMemory) {
-    // A hole in front of the cross-reference table, where no object stands.
+    // A stream that no page uses stands in front of the cross-reference table, mostly a hole.
     constexpr std::size_t hole = 300 << 20;
     const std::string bytes = PdfBuilder{}.page("", cornerMarks(0, 0, 612, 792)).bytes();
-    const std::size_t table = bytes.rfind("xref", bytes.rfind("startxref") - 1);
-    std::string end = bytes.substr(table, bytes.rfind("startxref") - table);
-    end += "startxref\n" + std::to_string(table + hole) + "\n%%EOF\n";
+    const std::size_t startxref = bytes.rfind("startxref");
+    const std::size_t table = bytes.rfind("xref", startxref - 1);
+    const std::string begin = "99 0 obj\n<</Length " + std::to_string(hole) + ">>\nstream\n";
+    const std::string end = "\nendstream\nendobj\n";
     std::ofstream file(m_folder / "a.pdf", std::ios::binary);
-    file << bytes.substr(0, table);
-    file.seekp(static_cast<std::streamoff>(table + hole));
-    file << end << std::flush;
+    file << bytes.substr(0, table) << begin;
+    file.seekp(static_cast<std::streamoff>(hole), std::ios::cur);
+    file << end << bytes.substr(table, startxref - table) << "startxref\n"
+         << table + begin.size() + hole + end.size() << "\n%%EOF\n"
+         << std::flush;
     const auto document = PdfDocuments::host().open(m_folder.url("a.pdf"));
     ASSERT_TRUE(document);
     const auto page = document->firstPage();

@@ -13,6 +13,7 @@
 #include <cstring>
 #include <limits>
 #include <memory>
+#include <string>
 #include <string_view>
 
 #include "parvel/foundation/URL.h"
@@ -33,6 +34,8 @@ constexpr std::uint64_t kDirectoryBudget = 32ULL << 20;
 constexpr std::size_t kLongestPath = 4095;
 constexpr std::size_t kLongestComponent = 255;
 constexpr int kMostComponents = 200;
+constexpr std::uint64_t kMostFolders = 100'000;
+constexpr std::uint64_t kFolderBytes = 4096;
 constexpr std::size_t kWrittenAtOnce = std::size_t{1} << 20;
 
 std::uint64_t saturatingSum(std::uint64_t left, std::uint64_t right) {
@@ -234,13 +237,27 @@ private:
     const CopierReports& m_reports;
 };
 
+/// The folders that a name asks for beyond those of the entry before it.
+std::uint64_t newFolders(std::string_view before, std::string_view name) {
+    const auto* const parting =
+        std::mismatch(name.begin(), name.end(), before.begin(), before.end()).first;
+    return static_cast<std::uint64_t>(std::count(parting, name.end(), '/'));
+}
+
 /// Entries that share their bytes make a small archive expand without end: together they must fit
-/// into the file. What they give must fit on the disk.
+/// into the file. So do long names, by the folders that they ask for. What is made must fit on the
+/// disk.
 int checkClaims(const OpenArchive& source, const std::string& destination) {
     std::uint64_t stored = 0;
     std::uint64_t content = 0;
+    std::uint64_t folders = 0;
+    std::string before;
     const std::uint64_t count = source.archive->entryCount();
     for (std::uint64_t index = 0; index < count; ++index) {
+        if (const char* name = source.archive->name(index)) {
+            folders += newFolders(before, name);
+            before = name;
+        }
         ZipEntry entry;
         if (!source.archive->describe(index, entry))
             continue;
@@ -249,8 +266,9 @@ int checkClaims(const OpenArchive& source, const std::string& destination) {
         if (checkContent(entry) == 0)
             content = saturatingSum(content, entry.size);
     }
-    if (stored > source.size)
+    if (stored > source.size || folders > kMostFolders)
         return EBADMSG;
+    content = saturatingSum(content, folders * kFolderBytes);
     struct statvfs room {};
     const bool isKnown = ::statvfs(parentFolderOf(destination).c_str(), &room) == 0 &&
                          room.f_frsize > 0 && room.f_blocks > 0;

@@ -23,7 +23,7 @@ public:
         : m_destination(std::move(destination)), m_callback(callback) {}
 
     int copyFile(int from, const struct stat& status) {
-        const host::FileDescriptor to(host::retried([&] {
+        host::FileDescriptor to(host::retried([&] {
             return ::open(m_destination.c_str(),
                           O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0666);
         }));
@@ -33,7 +33,9 @@ public:
             return error;
         if (const int error = copyAttributes(from, to.get()))
             return error;
-        return sync(to.get());
+        if (const int error = sync(to.get()))
+            return error;
+        return to.close();
     }
 
     /// The folder alone.

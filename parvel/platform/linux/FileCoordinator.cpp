@@ -18,6 +18,7 @@
 #include "parvel/platform/Service.h"
 #include "parvel/platform/linux/FileDescriptor.h"
 #include "parvel/platform/linux/Paths.h"
+#include "parvel/platform/linux/SystemCall.h"
 
 namespace parvel {
 
@@ -107,19 +108,26 @@ bool writeNote(int lock, const std::string& note) {
            ::pwrite(lock, note.data(), note.size(), 0) == static_cast<ssize_t>(note.size());
 }
 
+/// Takes the lock, and tells whether somebody else had to be waited for. False with errno set on a
+/// failure.
+bool takeLock(int file, bool& hasWaited) {
+    struct flock request {};
+    request.l_type = F_WRLCK;
+    request.l_whence = SEEK_SET;
+    if (::fcntl(file, F_OFD_SETLK, &request) == 0)
+        return true;
+    if (errno != EAGAIN && errno != EACCES && errno != EINTR)
+        return false;
+    hasWaited = true;
+    return host::retried([&] { return ::fcntl(file, F_OFD_SETLKW, &request); }) == 0;
+}
+
 /// The opened and locked lock file; closed with errno set on a failure.
-FileDescriptor lockFile(const std::string& path) {
+FileDescriptor lockFile(const std::string& path, bool& hasWaited) {
     for (;;) {
         FileDescriptor file(::open(path.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600));
-        if (!file)
+        if (!file || !takeLock(file.get(), hasWaited))
             return {};
-        struct flock request {};
-        request.l_type = F_WRLCK;
-        request.l_whence = SEEK_SET;
-        while (::fcntl(file.get(), F_OFD_SETLKW, &request) != 0) {
-            if (errno != EINTR)
-                return {};
-        }
         struct stat locked {};
         struct stat named {};
         if (::fstat(file.get(), &locked) != 0)
@@ -143,10 +151,11 @@ public:
             accessor(placeToUse(url, {}));
             return true;
         }
-        const FileDescriptor lock = lockFile(path);
+        bool hasWaited = false;
+        const FileDescriptor lock = lockFile(path, hasWaited);
         if (!lock)
             return fail(error, makeServiceError(errno, url));
-        hold(path, lock.get(), url, accessor);
+        hold(path, lock.get(), url, hasWaited, accessor);
         return true;
     }
 
@@ -160,7 +169,8 @@ public:
 private:
     /// Marks the item as held by this thread while the accessor runs. The lock file goes with it,
     /// unless there is a note in it.
-    static void hold(const std::string& path, int lock, const URL& url, const Accessor& accessor) {
+    static void hold(const std::string& path, int lock, const URL& url, bool hasWaited,
+                     const Accessor& accessor) {
         struct Holding {
             Holding(const std::string& lockPath, int descriptor, bool hasNote) {
                 t_held.push_back({lockPath, descriptor, hasNote});
@@ -172,11 +182,13 @@ private:
             }
         };
         std::string note = readNote(lock);
-        // An item that stands at its place again makes an older move's note untrue.
-        if (!note.empty() && host::itemStandsAt(url.path()) && ::ftruncate(lock, 0) == 0)
+        // Only who waited for the move means the item that was moved; whoever comes later means the
+        // name that it asks for, and an item that stands there again is another one.
+        const bool isMeant = hasWaited && !host::itemStandsAt(url.path());
+        if (!note.empty() && !isMeant && ::ftruncate(lock, 0) == 0)
             note.clear();
         const Holding holding(path, lock, !note.empty());
-        accessor(placeToUse(url, note));
+        accessor(placeToUse(url, isMeant ? note : std::string()));
     }
 
     static std::optional<URL> placeToUse(const URL& url, const std::string& note) {

@@ -90,7 +90,8 @@ public:
         int failure = m_items->remove(item.path());
         // What stands for an item that is not on this device goes without a download.
         if (failure == ENOENT) {
-            if (const auto placeholder = cloud().placeholderFile(item))
+            const auto placeholder = cloud().placeholderFile(item);
+            if (placeholder && cloud().lieBelowOneRoot(item, *placeholder))
                 failure = m_items->remove(placeholder->path());
         }
         return failure == 0 || fail(error, makeServiceError(failure, item));

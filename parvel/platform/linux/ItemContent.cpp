@@ -84,6 +84,8 @@ std::optional<std::vector<std::string>> userAttributeNames(int file) {
     const ssize_t size = ::flistxattr(file, nullptr, 0);
     if (size < 0)
         return std::nullopt;
+    if (size == 0)
+        return std::vector<std::string>();  // a call without room would tell the size again
     std::string list(static_cast<std::size_t>(size), '\0');
     const ssize_t length = ::flistxattr(file, list.data(), list.size());
     if (length < 0)
@@ -115,7 +117,9 @@ int copyAttribute(int from, int to, const std::string& name, int flags) {
     if (size < 0)
         return errno == ENODATA ? 0 : errno;
     std::string value(static_cast<std::size_t>(size), '\0');
-    const ssize_t length = ::fgetxattr(from, name.c_str(), value.data(), value.size());
+    // A call without room would tell the size again.
+    const ssize_t length =
+        size == 0 ? 0 : ::fgetxattr(from, name.c_str(), value.data(), value.size());
     if (length < 0)
         return errno == ENODATA ? 0 : errno;
     if (::fsetxattr(to, name.c_str(), value.data(), static_cast<std::size_t>(length), flags) == 0)

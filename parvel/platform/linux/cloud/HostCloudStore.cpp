@@ -1,6 +1,7 @@
 #include "parvel/platform/CloudStore.h"
 
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <string>
@@ -181,7 +182,9 @@ bool HostCloudStore::downloadingStatus(const URL& url, std::optional<Downloading
 
 std::optional<URL> HostCloudStore::placeholderFile(const URL& url) {
     const std::string path = placeholderPath(url.path());
-    if (!url.isFileURL() || isThere(url.path()) || !isThere(path))
+    struct stat status {};
+    if (!url.isFileURL() || isThere(url.path()) || ::lstat(path.c_str(), &status) != 0 ||
+        !S_ISREG(status.st_mode))
         return std::nullopt;
     return URL::fileURLWithPath(path);
 }

@@ -34,7 +34,7 @@ constexpr std::uint64_t kDirectoryBudget = 32ULL << 20;
 constexpr std::size_t kLongestPath = 4095;
 constexpr std::size_t kLongestComponent = 255;
 constexpr int kMostComponents = 200;
-constexpr std::uint64_t kMostFolders = 100'000;
+constexpr std::uint64_t kMostNewFolders = 100'000;
 constexpr std::uint64_t kFolderBytes = 4096;
 constexpr std::size_t kWrittenAtOnce = std::size_t{1} << 20;
 
@@ -266,7 +266,7 @@ int checkClaims(const OpenArchive& source, const std::string& destination) {
         if (checkContent(entry) == 0)
             content = saturatingSum(content, entry.size);
     }
-    if (stored > source.size || folders > kMostFolders)
+    if (stored > source.size || folders > kMostNewFolders)
         return EBADMSG;
     content = saturatingSum(content, folders * kFolderBytes);
     struct statvfs room {};

@@ -59,6 +59,18 @@ TEST_F(FolderGuard, LetsPackagesFilesAndLinksGo) {
     EXPECT_EQ(m_folder.read("books/b.epub"), "1");
 }
 
+TEST_F(FolderGuard, KeepsWhatALinkInItsPlaceWouldLeadTo) {
+    m_folder.write("library/a.epub", "1");
+    std::filesystem::create_symlink("library/a.epub", m_folder / "a.epub");
+
+    EXPECT_FALSE(m_guard.replaceItem(m_folder.url("library/a.epub"), m_folder.url("a.epub"),
+                                     ReplaceOptions::Default, nullptr, &m_error));
+    EXPECT_EQ(m_error, makePOSIXError(EINVAL, m_folder.url("library/a.epub")));
+
+    EXPECT_EQ(m_folder.read("library/a.epub"), "1");
+    EXPECT_TRUE(std::filesystem::is_symlink(m_folder / "a.epub"));
+}
+
 TEST_F(FolderGuard, PassesOtherErrorsOn) {
     EXPECT_FALSE(remove("absent"));
 

@@ -127,13 +127,14 @@ std::optional<HiddenItem> HiddenItem::linkTo(const std::string& file, int& error
 
 std::optional<HiddenItem> HiddenItem::bring(const std::string& folder, const std::string& parent,
                                             int& error) {
+    errno = 0;
     FileDescriptor lock = lockedItem(folder);
     struct stat status {};
     std::string path = hiddenPathIn(parent);
     if (!lock || ::fstat(lock.get(), &status) != 0 ||
         ::fchmod(lock.get(), (status.st_mode & ALLPERMS) | S_IRWXU) != 0 ||
         ::rename(folder.c_str(), path.c_str()) != 0) {
-        error = errno;
+        error = errno != 0 ? errno : EBUSY;  // the folder was taken away before it was locked
         return std::nullopt;
     }
     HiddenItem brought(std::move(path), std::move(lock));

@@ -201,7 +201,7 @@ def main():
         print(f"{number} skipped: {reason}")
     print(f"{passed} passed, {failed} failed" +
           (f", {sum(skipped.values())} skipped" if skipped else ""))
-    return 1 if failed or not passed else 0
+    return 1 if failed or not (passed or skipped) else 0
 
 
 if __name__ == "__main__":

@@ -119,6 +119,13 @@ void EditCommand::edit(PVAssetMetadataFileManager& manager, const AssetPtr& asse
     const Dictionary updates = updatesFor(asset);
     std::optional<StagingPlace> place = StagingPlace{};
     const bool isExpanded = m_inflates && asset->isCompressedBookWithError() == true;
+    // A book is expanded from the place that its record names, over what has that name beside it.
+    const bool isElsewhere = updates.find(key::sourcePath) || updates.find(key::path);
+    if (isExpanded && isElsewhere && !m_changes.isForced()) {
+        refuse(result, "the edit changes the place that the book would be expanded from",
+               "change it in an edit without --inflate, or give --force");
+        return;
+    }
     if (isExpanded)
         place = m_staging.placeFor(*asset->url(), asset->url()->deletingLastPathComponent(),
                                    m_changes.isForced(), result);

@@ -4,6 +4,7 @@
 
 #include "parvel/foundation/PVCasts.h"
 #include "parvel/foundation/ValueReadings.h"
+#include "parvel/metadata/AssetURL.h"
 #include "parvel/platform/Localiser.h"
 #include "parvel/platform/Service.h"
 #include "parvel/platform/TextRules.h"
@@ -27,10 +28,6 @@ String withExtension(String stem, std::string_view extension) {
 bool isOneComponent(const String& name) {
     return !name.empty() && name != "." && name != ".." &&
            name.find_first_of(std::string_view("/\0", 2)) == String::npos;
-}
-
-std::optional<URL> urlOf(const AssetPtr& asset) {
-    return asset ? asset->url() : std::nullopt;
 }
 
 std::optional<String> lastComponentOf(const AssetPtr& asset) {

@@ -2,15 +2,13 @@
 
 #include <optional>
 
-#include "parvel/foundation/URL.h"
 #include "parvel/foundation/Value.h"
 #include "parvel/metadata/PVAssetMetadata.h"
 
 namespace parvel {
 
-/// What names and places a record gives to the file manager. A null record gives none.
+/// What names a record gives to the file manager. A null record gives none.
 
-[[nodiscard]] std::optional<URL> urlOf(const AssetPtr& asset);
 [[nodiscard]] std::optional<String> lastComponentOf(const AssetPtr& asset);
 
 /// Whether text can be the name of an item in a folder: not empty, `.` or `..`, no slash, no NUL.

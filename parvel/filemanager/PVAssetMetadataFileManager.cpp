@@ -2,6 +2,7 @@
 
 #include <utility>
 
+#include "parvel/metadata/AssetURL.h"
 #include "parvel/platform/Service.h"
 #include "parvel/xattr/AttributeDictionary.h"
 
@@ -54,7 +55,7 @@ std::optional<Date> PVAssetMetadataFileManager::metadataDateFromString(std::stri
 
 std::optional<Dictionary> PVAssetMetadataFileManager::extendedAttributesForAsset_error(
     const AssetPtr& asset, ErrorOut error) const {
-    const std::optional<URL> url = asset ? asset->url() : std::nullopt;
+    const auto url = urlOf(asset);
     if (!url)
         return fail(error, makeMissingURLError());
     // Deliberate: a failed read's error stays inside.

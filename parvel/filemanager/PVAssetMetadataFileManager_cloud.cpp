@@ -5,6 +5,7 @@
 #include "parvel/filemanager/PVAssetMetadataFileManager.h"
 #include "parvel/foundation/PVCasts.h"
 #include "parvel/foundation/PVParvelLog.h"
+#include "parvel/metadata/AssetURL.h"
 #include "parvel/metadata/PVMutableAssetMetadata.h"
 
 namespace parvel {

@@ -1,9 +1,9 @@
 #include <unordered_set>
 
-#include "parvel/filemanager/AssetNames.h"
 #include "parvel/filemanager/PVAssetMetadataFileManager.h"
 #include "parvel/foundation/PVParvelLog.h"
 #include "parvel/inspection/PVAssetMetadataInspector.h"
+#include "parvel/metadata/AssetURL.h"
 #include "parvel/platform/ResourceQueries.h"
 #include "parvel/platform/Service.h"
 

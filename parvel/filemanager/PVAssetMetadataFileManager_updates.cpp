@@ -11,6 +11,7 @@
 #include "parvel/foundation/PVCasts.h"
 #include "parvel/foundation/PVParvelLog.h"
 #include "parvel/iotasks/PVInstallAssetMetadataIOTask.h"
+#include "parvel/metadata/AssetURL.h"
 #include "parvel/metadata/PVMutableAssetMetadata.h"
 
 namespace parvel {
@@ -31,8 +32,8 @@ PVAssetMetadataFileManager::updateAsset_withUpdates_temporaryDirectory_inflateIf
     const AssetPtr renamed = _renameExistingPDFMetadata_toDisplayName_error(
         asset, name ? std::optional(*name) : std::nullopt, slot.out());
     if (!renamed) {
-        PVParvelLog().error("updateMetadata: Failed rename: %@ error: %@",
-                            asset ? asset->url() : std::nullopt, slot.value());
+        PVParvelLog().error("updateMetadata: Failed rename: %@ error: %@", urlOf(asset),
+                            slot.value());
         return nullptr;
     }
 
@@ -104,7 +105,7 @@ AssetPtr PVAssetMetadataFileManager::inflateAsset_temporaryDirectory_error(
     const auto isCompressed = asset ? asset->isCompressedBookWithError(slot.out()) : std::nullopt;
     if (!isCompressed) {
         PVParvelLog().error("inflateMetadata: failed to get compressed status: %@ error: %@",
-                            asset ? asset->url() : std::nullopt, slot.value());
+                            urlOf(asset), slot.value());
         return nullptr;
     }
     if (!*isCompressed)

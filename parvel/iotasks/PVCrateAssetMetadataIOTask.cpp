@@ -9,6 +9,7 @@
 #include "parvel/foundation/PVCasts.h"
 #include "parvel/foundation/PVParvelLog.h"
 #include "parvel/iotasks/PlacedCopy.h"
+#include "parvel/metadata/AssetURL.h"
 #include "parvel/metadata/PVMutableAssetMetadata.h"
 #include "parvel/platform/ArchiveCopier.h"
 #include "parvel/platform/ResourceQueries.h"
@@ -95,7 +96,7 @@ AssetPtr PVCrateAssetMetadataIOTask::executeWithTargetDirectory_error(
 
 AssetPtr PVCrateAssetMetadataIOTask::copyInto(const std::optional<URL>& directory, ErrorOut error) {
     const AssetPtr& asset = sourceMetadata();
-    const std::optional<URL> url = asset ? asset->url() : std::nullopt;
+    const std::optional<URL> url = urlOf(asset);
     const std::optional<URL> source = asset ? asset->sourceURL() : std::nullopt;
     const std::optional<bool> isDirectory =
         source ? Service<ResourceQueries>::current().isDirectory(*source, error) : std::nullopt;

@@ -10,6 +10,7 @@
 
 #include "parvel/filemanager/PVAssetMetadataFileManager.h"
 #include "parvel/foundation/PVParvelLog.h"
+#include "parvel/metadata/AssetURL.h"
 #include "parvel/metadata/PVMutableAssetMetadata.h"
 #include "parvel/platform/ResourceQueries.h"
 #include "parvel/platform/Service.h"
@@ -17,10 +18,6 @@
 namespace parvel {
 
 namespace {
-
-std::optional<URL> recordURL(const AssetPtr& asset) {
-    return asset ? asset->url() : std::nullopt;
-}
 
 /// Whether the URL's last component names an item in a folder, and not that folder or one above it.
 bool hasOwnName(const URL& url) {
@@ -69,8 +66,8 @@ AssetPtr PVInstallAssetMetadataIOTask::executeWithTargetDirectory_error(
                                                     stagingDirectory, slot.out())
                                               : sourceMetadata();
     if (!staged) {
-        PVParvelLog().error("Failed copy. source: %@ target: %@ error: %@",
-                            recordURL(sourceMetadata()), directory, slot.value());
+        PVParvelLog().error("Failed copy. source: %@ target: %@ error: %@", urlOf(sourceMetadata()),
+                            directory, slot.value());
         return nullptr;
     }
 
@@ -98,7 +95,7 @@ std::optional<URL> PVInstallAssetMetadataIOTask::_subtaskTargetDirectoryWithInst
                        installDirectory.has_value(), m_temporaryDirectory.has_value());
     const std::optional<URL>& staging =
         m_temporaryDirectory ? m_temporaryDirectory : installDirectory;
-    const std::optional<URL> source = recordURL(sourceMetadata());
+    const std::optional<URL> source = urlOf(sourceMetadata());
     // Deliberate: such a source has no candidate; clearing it would delete the directory itself.
     if (source && !hasOwnName(*source))
         return std::nullopt;
@@ -148,7 +145,7 @@ AssetPtr PVInstallAssetMetadataIOTask::place(const AssetPtr& asset,
 // Deliberate: without a copy this deletes the source.
 void PVInstallAssetMetadataIOTask::cleanUp(const AssetPtr& asset,
                                            const std::optional<Error>& moveError) {
-    const std::optional<URL> url = recordURL(asset);
+    const std::optional<URL> url = urlOf(asset);
     PVParvelLog().error("Failed move -- Cleaning Up: %@ error: %@", url, moveError);
     std::optional<Error> removalError;
     if (url && manager()->fileManager()->removeItem(*url, &removalError))

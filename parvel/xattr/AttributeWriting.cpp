@@ -7,6 +7,7 @@
 #include "parvel/foundation/PVCasts.h"
 #include "parvel/foundation/PVParvelLog.h"
 #include "parvel/foundation/ValueReadings.h"
+#include "parvel/metadata/AssetURL.h"
 #include "parvel/platform/DirectoryEnumerator.h"
 #include "parvel/platform/ResourceQueries.h"
 #include "parvel/platform/Service.h"
@@ -20,10 +21,6 @@ namespace {
 
 constexpr unsigned kOwnerReadWrite = 0600;
 constexpr const char* kExplicitText = "1";
-
-std::optional<URL> urlOfAsset(const AssetPtr& asset) {
-    return asset ? asset->url() : std::nullopt;
-}
 
 const String* storedText(const Dictionary& attributes, std::string_view name) {
     return PVDynamicCast(classOf<String>, attributes.find(name));
@@ -67,7 +64,7 @@ std::uint64_t fixPermissionsOfPackage(const URL& url) {
 }  // namespace
 
 bool setAttributesForAsset(const AssetPtr& asset, ErrorOut error) {
-    const auto url = urlOfAsset(asset);
+    const auto url = urlOf(asset);
     if (!url)
         return fail(error, makeMissingURLError());
 
@@ -93,7 +90,7 @@ bool setAttributesForAsset(const AssetPtr& asset, ErrorOut error) {
 }
 
 bool updateAttributesForAsset(const AssetPtr& asset, ErrorOut error) {
-    const auto url = urlOfAsset(asset);
+    const auto url = urlOf(asset);
     if (!url)
         return fail(error, makeMissingURLError());
 

@@ -97,9 +97,10 @@ public:
                                                                const URL& directory,
                                                                ErrorOut error = nullptr);
     /// Puts a zipped book's package folder, expanded in the temporary directory, in the place of
-    /// the zip file; any other asset comes back as it is. None where the item can't be looked at,
-    /// without an error. Without a temporary directory the zip file itself is in the way and is
-    /// deleted before it is read: always give one. Deliberate.
+    /// the zip file; any other asset comes back as it is. A record with another source URL has the
+    /// book there expanded, under that one's name, and keeps its zip file. Deliberate. None where
+    /// the item can't be looked at, without an error. Without a temporary directory the zip file
+    /// itself is in the way and is deleted before it is read: always give one. Deliberate.
     AssetPtr inflateAsset_temporaryDirectory_error(const AssetPtr& asset,
                                                    const std::optional<URL>& temporaryDirectory,
                                                    ErrorOut error = nullptr);
@@ -119,6 +120,8 @@ public:
     /// Puts the updates' cover in a package's cover file, which is moved aside first; a null marker
     /// removes it and brings back the first one. A record of a kind without such a file is only
     /// given the cover. The record comes back unchanged without a new cover; none for an empty one.
+    /// A cover that can't be moved aside, as where a first one is kept already, and a first one
+    /// that can't be brought back leave their error beside the record. Deliberate.
     AssetPtr _updateImageCoverDataForMetadta_updates_error(const AssetPtr& asset,
                                                            const AssetPtr& updates,
                                                            ErrorOut error = nullptr);

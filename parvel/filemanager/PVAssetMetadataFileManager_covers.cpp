@@ -50,6 +50,7 @@ AssetPtr restoreOriginalCover(FileSystemService& fileManager, const PVAssetMetad
     if (!fileManager.removeItem(files.artwork, error))
         return nullptr;
 
+    // Deliberate: goes on without an original, whose error passes out beside the record.
     ErrorSlot restoring(error);
     if (fileManager.moveItem(files.backup, files.artwork, restoring.out())) {
         PVParvelLog().debug("ReplaceCover: Restored existing URL -- Success");
@@ -70,14 +71,14 @@ AssetPtr replaceCover(FileSystemService& fileManager, const PVAssetMetadata& ass
     const auto present = coverFileOf(asset);
     const Value replaced = present ? Value(*present) : Value();
     // Deliberate: a backup that is there already fails the move, so that the first original is
-    // kept. What is passed over stays out of the caller's error.
-    std::optional<Error> asideError;
-    if (fileManager.moveItem(files.artwork, files.backup, &asideError)) {
+    // kept; its error passes out beside the record.
+    ErrorSlot aside(error);
+    if (fileManager.moveItem(files.artwork, files.backup, aside.out())) {
         PVParvelLog().info("ReplaceCover: Moved aside original book cover");
     } else {
         PVParvelLog().error(
             "ReplaceCover: Failed to move aside the original BazaarArtwork: %@ error: %@",
-            files.artwork, asideError);
+            files.artwork, aside.value());
     }
 
     if (!Service<FileWriter>::current().writeFile(files.artwork, cover, error)) {

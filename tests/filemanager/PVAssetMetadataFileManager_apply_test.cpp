@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include "parvel/xattr/PNMetadataXattr.h"
+#include "tests/support/ForwardingXattrStore.h"
 #include "tests/support/ManagedFolder.h"
 #include "tests/support/RecordedLog.h"
 #include "tests/support/Records.h"
@@ -34,6 +35,14 @@ protected:
     }
 
     TemporaryDirectory m_locks;
+};
+
+/// A file system that keeps no attributes.
+class UnwritableXattrStore : public ForwardingXattrStore {
+public:
+    int set(const std::string&, const std::string&, std::span<const std::byte>) override {
+        return ENOTSUP;
+    }
 };
 
 TEST_F(ApplyingUpdates, ANewBookGoesIntoTheDirectoryUnderItsID) {
@@ -158,7 +167,86 @@ TEST_F(ApplyingUpdates, WithoutAnUpdateThereIsNone) {
     const auto existing = book("library/77.epub", "old", {});
 
     EXPECT_FALSE(apply(nullptr, existing));
+    EXPECT_FALSE(apply(nullptr, nullptr));
     EXPECT_EQ(m_folder.read("library/77.epub"), "old");
+}
+
+TEST_F(ApplyingUpdates, AnUpdateThatCanNotBeStampedIsMovedWithTheErrorBesideItsRecord) {
+    const UnwritableXattrStore noAttributes;
+    const auto update = newVersion();
+
+    const AssetPtr applied = apply(update, nullptr);
+
+    ASSERT_TRUE(applied);
+    EXPECT_EQ(names("library"), Names{"77.epub"});
+    EXPECT_TRUE(applied->_hasAllocatedSize());
+    EXPECT_EQ(m_error, makePOSIXError(ENOTSUP, m_folder.url("new.epub")));
+}
+
+TEST_F(ApplyingUpdates, AnUpdateThatIsMissingFailsAtTheMove) {
+    const Dictionary identity{{"itemId", "77"}};
+    const auto missing =
+        PVAssetMetadata::metadataWithURL_dictionary(m_folder.url("missing.epub"), &identity);
+
+    EXPECT_FALSE(apply(missing, nullptr));
+
+    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::NoSuchFile, m_folder.url("missing.epub")));
+    EXPECT_EQ(names("library"), Names{});
+}
+
+TEST_F(ApplyingUpdates, AnUpdateWithoutURLHasNoNameToMoveTo) {
+    const auto existing = book("library/77.epub", "old", {{"itemId", "77"}, {"genre", "Crime"}});
+
+    EXPECT_FALSE(apply(recordOver({{"itemId", "77"}}), nullptr));
+    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::Corrupt, std::nullopt));
+
+    m_error.reset();
+    const AssetPtr applied = apply(recordOver({{"itemId", "77"}, {"genre", "Other"}}), existing);
+    ASSERT_TRUE(applied);
+    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::Corrupt, std::nullopt));
+    EXPECT_EQ(valueOf(applied->genre()), Value("Crime"));
+    EXPECT_EQ(m_folder.read("library/77.epub"), "old");
+}
+
+TEST_F(ApplyingUpdates, ABookWithoutIDHasNoNameToMoveTo) {
+    RecordedLog log;
+
+    EXPECT_FALSE(apply(book("new.epub", "new", {}), nullptr));
+
+    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::Corrupt, std::nullopt));
+    EXPECT_EQ(log.lines().back(), "error Failed to rename imported book");
+    EXPECT_EQ(m_folder.read("new.epub"), "new");
+    EXPECT_EQ(names("library"), Names{});
+}
+
+TEST_F(ApplyingUpdates, AFailedReplacementInSynchronisedStorageGivesTheExistingRecord) {
+    makeFolder("cloud/.stfolder");
+    const auto existing = book("cloud/Old.epub", "old", {{"itemId", "77"}, {"itemName", "Old"}});
+    existing->setHasPendingUpdates(true);
+    const auto update = newVersion();
+    refuseAll();
+
+    const AssetPtr applied = apply(update, existing);
+
+    ASSERT_TRUE(applied);
+    EXPECT_EQ(m_error, makePOSIXError(EIO, m_folder.url("new.epub")));
+    EXPECT_EQ(applied->title(), "Old");
+    EXPECT_EQ(applied->url(), m_folder.url("cloud/Old.epub"));
+    EXPECT_FALSE(applied->hasPendingUpdates());
+    EXPECT_EQ(applied->generationCount(), existing->generationCount() + 1);
+    EXPECT_EQ(m_folder.read("cloud/Old.epub"), "old");
+    EXPECT_EQ(m_folder.read("new.epub"), "new");
+}
+
+TEST_F(ApplyingUpdates, WithoutAPlaceForTheErrorAFailureIsTheSame) {
+    const auto existing = book("library/77.epub", "old", {{"itemId", "77"}});
+    const auto update = newVersion();
+    refuseAll();
+
+    EXPECT_FALSE(m_manager->applyUpdate_onExistingAsset_targetDirectory_error(
+        update, nullptr, m_folder.url("library")));
+    EXPECT_TRUE(m_manager->applyUpdate_onExistingAsset_targetDirectory_error(
+        update, existing, m_folder.url("library")));
 }
 
 }  // namespace

@@ -108,9 +108,43 @@ TEST_F(ReplacingCovers, AFirstCoverReplacesTheNullMarker) {
                      "default ReplaceCover: Wrote new cover image -- Done"}));
 }
 
-TEST_F(ReplacingCovers, WhatIsPassedOverStaysOutOfTheCallersError) {
+TEST_F(ReplacingCovers, TheErrorOfAFailedMoveAsideIsPassedOutBesideTheRecord) {
     ASSERT_TRUE(update(book(), bytesValue("new")));
-    EXPECT_FALSE(m_error);
+    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::NoSuchFile, coverURL()));
+}
+
+TEST_F(ReplacingCovers, ACoverThatCanNotBeMovedAsideIsReplacedAndTheErrorTells) {
+    const AssetPtr asset = bookWithCover("old");
+    refuse(Act::Move, "BazaarArtwork");
+
+    const AssetPtr updated = update(asset, bytesValue("new"));
+
+    ASSERT_TRUE(updated);
+    EXPECT_EQ(m_error, makePOSIXError(EIO, coverURL()));
+    EXPECT_EQ(valueOf(updated->coverImageDataReplaced()), bytesValue("old"));
+    EXPECT_EQ(coverFile(), "new");
+    EXPECT_EQ(names("a.epub"), Names{"BazaarArtwork"});
+}
+
+TEST_F(ReplacingCovers, AFailedWritesErrorTakesThePlaceOfTheMovesAside) {
+    const AssetPtr asset = book();
+    const RefusingFileWriter writer;
+
+    EXPECT_FALSE(update(asset, bytesValue("new")));
+
+    EXPECT_EQ(m_error, makePOSIXError(EIO, coverURL()));
+}
+
+TEST_F(ReplacingCovers, WithoutAPlaceForTheErrorTheMovesAsideIsLoggedAllTheSame) {
+    const AssetPtr asset = book();
+    RecordedLog log;
+
+    EXPECT_TRUE(m_manager->_updateImageCoverDataForMetadta_updates_error(
+        asset, recordOver({{"PVCoverImageData", bytesValue("new")}})));
+
+    ASSERT_EQ(log.lines().size(), 3U);
+    EXPECT_TRUE(log.lines()[1].ends_with(
+        " error: " + logText(makeFileError(PVFileErrorCode::NoSuchFile, coverURL()))));
 }
 
 TEST_F(ReplacingCovers, ASecondCoverKeepsTheFirstOriginal) {
@@ -129,6 +163,7 @@ TEST_F(ReplacingCovers, ASecondCoverKeepsTheFirstOriginal) {
               "error ReplaceCover: Failed to move aside the original BazaarArtwork: " +
                   coverURL().absoluteString() +
                   " error: " + logText(makeFileError(PVFileErrorCode::FileExists, backupURL())));
+    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::FileExists, backupURL()));
 }
 
 TEST_F(ReplacingCovers, AnEmptyCoverIsNone) {
@@ -171,6 +206,7 @@ TEST_F(ReplacingCovers, RemovingTheCoverRestoresTheFirstOriginal) {
     AssetPtr asset = bookWithCover("first");
     ASSERT_TRUE(asset = update(asset, bytesValue("second")));
     ASSERT_TRUE(asset = update(asset, bytesValue("third")));
+    m_error.reset();
     RecordedLog log;
 
     const AssetPtr updated = update(asset, Value());

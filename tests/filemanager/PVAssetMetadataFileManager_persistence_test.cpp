@@ -248,6 +248,31 @@ TEST_F(PersistingMetadata, AStoreFileThatIsALinkIsReplacedAndItsTargetLeftAlone)
     EXPECT_EQ(storeFile(), Value(*asset->bazaarMetadataRepresentation()));
 }
 
+TEST_F(PersistingMetadata, TheBackupOfAStoreFileThatIsALinkIsThatLink) {
+    const auto asset = book();
+    m_folder.write("outside", "outside");
+    std::filesystem::create_symlink("../outside", m_folder / "a.epub/BazaarMetadata.plist");
+
+    m_manager->persistMetadata(asset);
+
+    EXPECT_EQ(std::filesystem::read_symlink(m_folder / "a.epub/BazaarMetadata-original.plist"),
+              "../outside");
+}
+
+TEST_F(PersistingMetadata, ABackupThatIsADanglingLinkIsKeptToo) {
+    const auto asset = book();
+    m_folder.write("a.epub/BazaarMetadata.plist", "original");
+    std::filesystem::create_symlink("missing", m_folder / "a.epub/BazaarMetadata-original.plist");
+    RecordedLog log;
+
+    m_manager->persistMetadata(asset);
+
+    EXPECT_EQ(log.lines()[1], "error Failed to backup BazaarMetadata.plist");
+    EXPECT_FALSE(std::filesystem::exists(m_folder / "a.epub/missing"));
+    EXPECT_EQ(std::filesystem::read_symlink(m_folder / "a.epub/BazaarMetadata-original.plist"),
+              "missing");
+}
+
 TEST_F(PersistingMetadata, ARewrittenStoreFileKeepsItsMode) {
     const auto asset = book();
     m_folder.write("a.epub/BazaarMetadata.plist", "original");

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include <fstream>
+
 #include "tests/support/ManagedFolder.h"
 #include "tests/support/RecordedLog.h"
 #include "tests/support/Records.h"
@@ -164,6 +166,28 @@ TEST_F(RenamingPDFs, AFailedMoveLeavesThePDFAndItsErrorStands) {
     EXPECT_EQ(names(), Names{"a.pdf"});
 }
 
+/// Takes the new name between the test and the move.
+class CompetingRenameService : public ForwardingFileSystemService {
+public:
+    CompetingRenameService() : ForwardingFileSystemService(FileSystemService::makeDefault()) {}
+    bool moveItem(const URL& source, const URL& destination, ErrorOut error) override {
+        std::ofstream(destination.path()) << "competitor";
+        return ForwardingFileSystemService::moveItem(source, destination, error);
+    }
+};
+
+TEST_F(RenamingPDFs, ACompetitorThatTookTheNameIsAFailedMoveAndIsNotOverwritten) {
+    const auto pdf = asset("a.pdf", "mine");
+    m_manager->setFileManager(std::make_shared<CompetingRenameService>());
+    RecordedLog log;
+
+    EXPECT_FALSE(rename(pdf, "b"));
+    expectError(makeFileError(PVFileErrorCode::FileExists, m_folder.url("b.pdf")));
+    EXPECT_EQ(log.lines(), Lines{"error PDFRename: failed to rename -- Fail"});
+    EXPECT_EQ(m_folder.read("a.pdf"), "mine");
+    EXPECT_EQ(m_folder.read("b.pdf"), "competitor");
+}
+
 TEST_F(RenamingPDFs, ANameThatIsTooLongIsAFailedMove) {
     const auto pdf = asset("a.pdf");
 
@@ -181,6 +205,26 @@ TEST_F(RenamingPDFs, NormalisingRenamesAPDFAfterItsOwnDisplayName) {
     ASSERT_TRUE(renamed);
     EXPECT_EQ(renamed->url(), m_folder.url("My Guide.pdf"));
     EXPECT_EQ(names(), Names{"My Guide.pdf"});
+}
+
+TEST_F(RenamingPDFs, NormalisingPassesTheRenamesErrorOut) {
+    const auto pdf = asset("a.pdf");
+    pdf->setDisplayName("b");
+    asset("b.pdf", "other");
+    RecordedLog log;
+
+    EXPECT_FALSE(m_manager->normalizeNamingForAsset_error(pdf, &m_error));
+    expectError(makeFileError(PVFileErrorCode::FileExists, m_folder.url("b.pdf")));
+    EXPECT_EQ(log.lines(), Lines{"error PDFRename: File exists -- Fail"});
+    EXPECT_EQ(names(), (Names{"a.pdf", "b.pdf"}));
+}
+
+TEST_F(RenamingPDFs, NormalisingAPDFOfThatNameGivesItBack) {
+    const auto pdf = asset("a.pdf");
+    pdf->setDisplayName("a");
+
+    EXPECT_EQ(m_manager->normalizeNamingForAsset_error(pdf, &m_error), pdf);
+    EXPECT_FALSE(m_error);
 }
 
 TEST_F(RenamingPDFs, NormalisingLeavesOtherKindsAndOddDisplayNamesAlone) {

@@ -115,6 +115,58 @@ TEST_F(UpdatingAssets, AnExpandedBookTakesAllUpdates) {
     EXPECT_EQ(attribute("library/a.epub", PNMetadataXattrGenre), Value("Crime"));
 }
 
+TEST_F(UpdatingAssets, ARemovedCoverBringsTheFirstOneBack) {
+    const AssetPtr book = expandedBook();
+    ASSERT_TRUE(book);
+    m_folder.write("library/a.epub/BazaarArtwork", "second");
+    m_folder.write("library/a.epub/BazaarArtwork-original", "first");
+
+    const AssetPtr updated = update(book, {{"PVCoverImageData", Value()}});
+
+    ASSERT_TRUE(updated);
+    EXPECT_EQ(m_folder.read("library/a.epub/BazaarArtwork"), "first");
+    EXPECT_FALSE(std::filesystem::exists(m_folder / "library/a.epub/BazaarArtwork-original"));
+    EXPECT_EQ(valueOf(updated->coverImageData()), Value(Data::copyOf("first")));
+    EXPECT_EQ(storedInStoreFile("PVCoverImageData"), std::nullopt);
+    EXPECT_FALSE(m_error);
+}
+
+TEST_F(UpdatingAssets, ARemovedCoverThatHadNoFileFailsTheUpdateBeforeItsStoreFile) {
+    const AssetPtr book = expandedBook();
+    ASSERT_TRUE(book);
+    RecordedLog log;
+
+    EXPECT_FALSE(update(book, {{"itemName", "New"}, {"PVCoverImageData", Value()}}));
+
+    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::NoSuchFile,
+                                     m_folder.url("library/a.epub/BazaarArtwork")));
+    EXPECT_EQ(ofUpdate(log),
+              Lines{"error updateMetadata: Update image cover failed -- Bailing Out"});
+    EXPECT_EQ(storedInStoreFile("itemName"), std::nullopt);
+}
+
+TEST_F(UpdatingAssets, WithoutInflationARemovedCoverIsTheNullMarkerAndNoFileIsTouched) {
+    const AssetPtr book = expandedBook();
+    ASSERT_TRUE(book);
+    m_folder.write("library/a.epub/BazaarArtwork", "second");
+
+    const AssetPtr updated = update(book, {{"PVCoverImageData", Value()}}, /*inflate=*/false);
+
+    ASSERT_TRUE(updated);
+    EXPECT_EQ(valueOf(updated->coverImageData()), Value());
+    EXPECT_EQ(m_folder.read("library/a.epub/BazaarArtwork"), "second");
+}
+
+TEST_F(UpdatingAssets, TheErrorOfACoverThatWasPassedOverStandsBesideTheRecord) {
+    const AssetPtr updated =
+        update(expandedBook(), {{"PVCoverImageData", Data::copyOf("first cover")}});
+
+    ASSERT_TRUE(updated);
+    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::NoSuchFile,
+                                     m_folder.url("library/a.epub/BazaarArtwork")));
+    EXPECT_TRUE(storedInStoreFile("itemName"));
+}
+
 TEST_F(UpdatingAssets, TheStepsComeInTheirOrder) {
     const AssetPtr book = expandedBook();
     ASSERT_TRUE(book);
@@ -436,6 +488,37 @@ TEST_F(UpdatingAssets, InflatingReplacesTheZipFileByItsPackage) {
     EXPECT_EQ(log.lines().front(),
               "default inflateMetadata: start {asset: 1, temporaryDirectory: 1");
     EXPECT_FALSE(m_error);
+}
+
+TEST_F(UpdatingAssets, InflatingExpandsTheBookOfTheSourceURLUnderItsOwnName) {
+    const AssetPtr book = zippedBook();
+    ASSERT_TRUE(book);
+    const std::string zip = m_folder.read("library/a.epub");
+    const URL imported = EpubBuilder{}.file("imported", "x").zip(m_folder / "imported.epub");
+    const AssetPtr elsewhere =
+        book->copyWithUpdates([&](PVMutableAssetMetadata& copy) { copy.setSourceURL(imported); });
+
+    const AssetPtr inflated = inflate(elsewhere);
+
+    ASSERT_TRUE(inflated);
+    EXPECT_EQ(inflated->url(), m_folder.url("library/imported.epub"));
+    EXPECT_EQ(names("library"), (Names{"a.epub", "imported.epub"}));
+    EXPECT_EQ(m_folder.read("library/a.epub"), zip);
+    EXPECT_EQ(m_folder.read("library/imported.epub/imported"), "x");
+    EXPECT_TRUE(std::filesystem::is_regular_file(m_folder / "imported.epub"));
+}
+
+TEST_F(UpdatingAssets, InflatingABookWhoseSourceIsGoneLeavesIt) {
+    const AssetPtr book = zippedBook();
+    ASSERT_TRUE(book);
+    const std::string zip = m_folder.read("library/a.epub");
+    const AssetPtr elsewhere = book->copyWithUpdates(
+        [&](PVMutableAssetMetadata& copy) { copy.setSourceURL(m_folder.url("gone.epub")); });
+
+    EXPECT_FALSE(inflate(elsewhere));
+
+    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::NoSuchFile, m_folder.url("gone.epub")));
+    EXPECT_EQ(m_folder.read("library/a.epub"), zip);
 }
 
 TEST_F(UpdatingAssets, InflatingAnythingElseGivesItBack) {

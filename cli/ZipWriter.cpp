@@ -113,13 +113,13 @@ int ZipWriter::complete(Entry entry) {
 
 int ZipWriter::addStored(std::string_view name, std::string_view bytes) {
     Entry entry;
-    entry.size = entry.packedSize = bytes.size();
-    entry.checksum = static_cast<std::uint32_t>(
-        crc32_z(0, reinterpret_cast<const Bytef*>(bytes.data()), bytes.size()));
     if (const int error = begin(entry, name))
         return error;
     if (const int error = write(bytes))
         return error;
+    entry.size = entry.packedSize = bytes.size();
+    entry.checksum = static_cast<std::uint32_t>(
+        crc32_z(0, reinterpret_cast<const Bytef*>(bytes.data()), bytes.size()));
     return complete(std::move(entry));
 }
 

@@ -8,7 +8,8 @@
 namespace parvel::cli {
 
 /// Writes a zip archive into an open, empty file: without extra fields, comments and dates, so that
-/// the same entries in the same order give the same bytes. At most 65,535 entries and 4 GiB.
+/// the same entries in the same order give the same bytes. At most 65,534 entries and not quite 4
+/// GiB, as far as archives go without the format's extensions.
 class ZipWriter {
 public:
     explicit ZipWriter(int file) : m_file(file) {}

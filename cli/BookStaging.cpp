@@ -24,6 +24,11 @@ void BookStaging::begin() {
 std::optional<StagingPlace> BookStaging::placeFor(const URL& book, const URL& folder, bool isForced,
                                                   Result& result) const {
     StagingPlace place;
+    const URL stage = m_directory.value_or(folder);
+    if (!isForced && liesWithin(stage, book)) {
+        refuse(result, stage.path() + " lies in the book itself", "choose a folder elsewhere");
+        return std::nullopt;
+    }
     if (!m_isDirect && !m_directory) {
         place.fresh = StagingDirectory::makeIn(folder, &result.error);
         if (!place.fresh) {
@@ -84,6 +89,17 @@ std::optional<URL> placeInFolder(const AssetPtr& asset, const URL& folder, bool 
     if (!stem)
         return std::nullopt;
     return folder.appendingPathComponent(*stem + "." + std::string(url->pathExtension()));
+}
+
+bool liesWithin(const URL& item, const URL& folder) {
+    namespace fs = std::filesystem;
+    std::error_code unknown;
+    for (fs::path path = fs::weakly_canonical(item.path(), unknown);; path = path.parent_path()) {
+        if (fs::equivalent(path, folder.path(), unknown))
+            return true;
+        if (path == path.parent_path())
+            return false;
+    }
 }
 
 bool isSamePlace(const URL& url, const URL& other) {

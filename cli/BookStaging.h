@@ -56,6 +56,9 @@ void refuse(Result& result, std::string reason, std::string advice);
 [[nodiscard]] std::optional<URL> placeInFolder(const AssetPtr& asset, const URL& folder,
                                                bool takesAssetID);
 
+/// Whether the item is the folder, or lies somewhere below it; links count as what they lead to.
+[[nodiscard]] bool liesWithin(const URL& item, const URL& folder);
+
 /// Whether both are one item on the disk, or the same place where nothing stands.
 [[nodiscard]] bool isSamePlace(const URL& url, const URL& other);
 

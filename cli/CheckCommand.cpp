@@ -14,15 +14,18 @@
 #include "cli/Output.h"
 #include "cli/OutputOptions.h"
 #include "cli/PathSource.h"
+#include "cli/Progress.h"
 #include "cli/PropertyListText.h"
 #include "cli/Reconciliation.h"
 #include "cli/RecordFile.h"
 #include "cli/TerminalText.h"
-#include "parvel/inspection/PVAssetMetadataInspector.h"
 #include "parvel/metadata/PVMutableAssetMetadata.h"
 
 namespace parvel::cli {
 namespace {
+
+constexpr std::string_view kSmallLettersAdvice =
+    "give it a name that ends in small letters, with \"parvel move --to\"";
 
 /// What a check found.
 struct Findings {
@@ -41,7 +44,8 @@ public:
 private:
     [[nodiscard]] std::vector<AssetPtr> readRecords() const;
     [[nodiscard]] std::vector<URL> findURLs(std::vector<std::string> operands);
-    void reportUninspected(const std::vector<URL>& urls, const std::optional<Error>& error);
+    void findMissing(PVAssetMetadataFileManager& manager, const std::vector<URL>& urls,
+                     const std::vector<AssetPtr>& records, Findings& findings);
     void reportFailure(const Result& result);
     [[nodiscard]] std::string textOf(const Findings& findings) const;
 
@@ -51,6 +55,9 @@ private:
     DryRun m_dryRun;
     PathOptions m_paths;
     OutputOptions m_output;
+    ProgressOption m_progress;
+
+    Progress::Form m_form = Progress::Form::Auto;
 };
 
 void CheckCommand::declare(CommandLine& line) {
@@ -60,6 +67,7 @@ void CheckCommand::declare(CommandLine& line) {
                 "inspect prints them (JSON, lines of JSON or a property list)",
                 m_records);
     line.flag("--exit-code", "end with status 4 where anything is found", m_hasExitCode);
+    m_progress.declare(line);
     m_dryRun.declare(line);
     m_paths.declareSources(line);
     m_output.declare(line);
@@ -103,7 +111,7 @@ bool isLeftOut(Result& result) {
     if (!stored || *stored == url || !standsAt(*stored) || isSamePlace(*stored, url))
         return false;
     refuse(result, "the library would take " + stored->path() + " for it",
-           "give it a name that ends in small letters, with \"parvel move --to\"");
+           std::string(kSmallLettersAdvice));
     return true;
 }
 
@@ -133,23 +141,28 @@ void CheckCommand::reportFailure(const Result& result) {
     writeToStandardError(failureLine("check", result));
 }
 
-/// The library leaves out what it can't inspect; here each is looked at once more for the reason.
-void CheckCommand::reportUninspected(const std::vector<URL>& urls,
-                                     const std::optional<Error>& error) {
-    for (const URL& url : urls) {
+/// Asset by asset, so that an interrupt ends it after each; what was found so far is told.
+void CheckCommand::findMissing(PVAssetMetadataFileManager& manager, const std::vector<URL>& urls,
+                               const std::vector<AssetPtr>& records, Findings& findings) {
+    const std::vector<URL> unnamed = unnamedURLs(urls, records);
+    Progress progress(m_form, {});
+    for (std::size_t index = 0; index < unnamed.size() && !interrupted(); ++index) {
+        const URL& url = unnamed[index];
         CallLog log;
         Result result = resultForPath(url.path());
-        // A record this time means that the asset came only now; the next check finds it.
-        if (PVAssetMetadataInspector::metadataForAssetAtURL_error(url, &result.error))
-            continue;
+        const auto missing =
+            manager.assetsForURLs_missingFromAssets_error({url}, {}, &result.error);
+        // Of an asset that can't be inspected there is no record; one whose attributes can't be
+        // written has an error beside it.
         result.reason = log.reason();
-        reportFailure(result);
+        if (!missing.empty() && missing.front()->url() != url)
+            result.advice = kSmallLettersAdvice;
+        if (missing.empty() || result.error)
+            reportFailure(result);
+        findings.missing.insert(findings.missing.end(), missing.begin(), missing.end());
+        progress.report(static_cast<double>(index + 1) / static_cast<double>(unnamed.size()),
+                        url.path());
     }
-    if (!error || !urls.empty())
-        return;
-    Result result = resultForPath(error->url() ? error->url()->path() : std::string());
-    result.error = error;
-    reportFailure(result);
 }
 
 std::string pathOf(const AssetPtr& asset) {
@@ -212,16 +225,13 @@ std::string CheckCommand::textOf(const Findings& findings) const {
 int CheckCommand::run(std::vector<std::string> operands) {
     m_output.applyLog();
     m_dryRun.begin();
+    m_form = m_progress.form();
     const std::vector<AssetPtr> records = readRecords();
     const auto manager = m_dryRun.makeManager();
     Findings findings;
     findings.orphans = manager->orphanAssetsInAssets_error(records);
     const std::vector<URL> urls = findURLs(std::move(operands));
-    if (!interrupted()) {
-        std::optional<Error> error;
-        findings.missing = manager->assetsForURLs_missingFromAssets_error(urls, records, &error);
-        reportUninspected(uninspectedURLs(urls, records, findings.missing), error);
-    }
+    findMissing(*manager, urls, records, findings);
     findings.moved = movedAssets(findings.orphans, findings.missing);
 
     Output output(STDOUT_FILENO);

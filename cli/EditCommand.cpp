@@ -2,6 +2,7 @@
 #include "cli/BookStaging.h"
 #include "cli/Command.h"
 #include "cli/FileContents.h"
+#include "cli/Progress.h"
 #include "cli/PropertyValue.h"
 #include "cli/RecordFile.h"
 #include "parvel/foundation/ValueReadings.h"
@@ -42,10 +43,12 @@ private:
     bool m_restoresCover = false;
     bool m_inflates = false;
     BookStaging m_staging;
+    ProgressOption m_progress;
     AssetChanges m_changes{Uninspectable::Fails};
 
     std::vector<PropertyValue> m_values;
     Dictionary m_updates;
+    Progress::Form m_form = Progress::Form::Auto;
 };
 
 void EditCommand::declare(CommandLine& line) {
@@ -66,6 +69,7 @@ void EditCommand::declare(CommandLine& line) {
               "is expanded in its place first",
               m_inflates);
     m_staging.declare(line);
+    m_progress.declare(line);
     m_changes.declareForce(line, "do it even where that loses something");
     m_changes.declare(line);
 }
@@ -73,6 +77,7 @@ void EditCommand::declare(CommandLine& line) {
 int EditCommand::run(std::vector<std::string> operands) {
     m_changes.begin();
     m_staging.begin();
+    m_form = m_progress.form();
     readUpdates();
     return m_changes.run("edit", std::move(operands),
                          [this](PVAssetMetadataFileManager& manager, const AssetPtr& asset,
@@ -141,9 +146,14 @@ void EditCommand::edit(PVAssetMetadataFileManager& manager, const AssetPtr& asse
                                    m_changes.isForced(), result);
     if (!place)
         return;
-    const AssetPtr edited =
-        manager.updateAsset_withUpdates_temporaryDirectory_inflateIfNeeded_error(
+    AssetPtr edited;
+    {
+        BusyProgress progress(m_form, result.path);
+        edited = manager.updateAsset_withUpdates_temporaryDirectory_inflateIfNeeded_error(
             asset, &updates, place->directory, m_inflates, &result.error);
+        if (edited)
+            progress.finish();
+    }
     setRecord(result, edited, PVAssetMetadataFlavorFull);
     if (edited && !m_restoresCover && isCoverLeftInPlace(*edited, result.error))
         result.error.reset();

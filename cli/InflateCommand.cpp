@@ -1,6 +1,7 @@
 #include "cli/AssetChanges.h"
 #include "cli/BookStaging.h"
 #include "cli/Command.h"
+#include "cli/Progress.h"
 
 namespace parvel::cli {
 namespace {
@@ -14,12 +15,16 @@ private:
     void inflate(PVAssetMetadataFileManager& manager, const AssetPtr& asset, Result& result) const;
 
     BookStaging m_staging;
+    ProgressOption m_progress;
     AssetChanges m_changes{Uninspectable::Fails};
+
+    Progress::Form m_form = Progress::Form::Auto;
 };
 
 void InflateCommand::declare(CommandLine& line) {
     line.group("How it is done");
     m_staging.declare(line);
+    m_progress.declare(line);
     m_changes.declareForce(line, "do it even where that loses a book");
     m_changes.declare(line);
 }
@@ -27,6 +32,7 @@ void InflateCommand::declare(CommandLine& line) {
 int InflateCommand::run(std::vector<std::string> operands) {
     m_changes.begin();
     m_staging.begin();
+    m_form = m_progress.form();
     return m_changes.run("inflate", std::move(operands),
                          [this](PVAssetMetadataFileManager& manager, const AssetPtr& asset,
                                 Result& result) { inflate(manager, asset, result); });
@@ -43,8 +49,14 @@ void InflateCommand::inflate(PVAssetMetadataFileManager& manager, const AssetPtr
                                    m_changes.isForced(), result);
     if (!place)
         return;
-    const AssetPtr inflated =
-        manager.inflateAsset_temporaryDirectory_error(asset, place->directory, &result.error);
+    AssetPtr inflated;
+    {
+        BusyProgress progress(m_form, result.path);
+        inflated =
+            manager.inflateAsset_temporaryDirectory_error(asset, place->directory, &result.error);
+        if (inflated)
+            progress.finish();
+    }
     setRecord(result, inflated, PVAssetMetadataFlavorFull);
     if (!inflated)
         result.nothing = "not expanded";

@@ -12,6 +12,7 @@
 #include "cli/BookStaging.h"
 #include "cli/Command.h"
 #include "cli/Interrupt.h"
+#include "cli/Progress.h"
 #include "cli/TransferAdvice.h"
 #include "cli/ZipWriter.h"
 #include "parvel/metadata/PVMutableAssetMetadata.h"
@@ -104,8 +105,19 @@ int copyAttributes(const std::string& from, int to) {
     return 0;
 }
 
+/// What the members take, as far as that can be seen before they are read.
+std::uint64_t sizeOf(const fs::path& package, const std::vector<std::string>& members) {
+    std::uint64_t size = 0;
+    for (const std::string& member : members) {
+        std::error_code unknown;
+        const std::uint64_t bytes = fs::file_size(package / member, unknown);
+        size += unknown ? 0 : bytes;
+    }
+    return size;
+}
+
 /// Writes the archive of the package into an empty file.
-Failure writeArchive(const fs::path& package, int file) {
+Failure writeArchive(const fs::path& package, int file, Progress& progress) {
     Failure failure;
     const std::string mimetype = mimetypeOf(package, failure);
     const std::vector<std::string> members = membersOf(package, failure);
@@ -114,12 +126,17 @@ Failure writeArchive(const fs::path& package, int file) {
     ZipWriter archive(file);
     if (const int error = archive.addStored(kMimetype, mimetype))
         return {error, package.string()};
+    const auto size = static_cast<double>(sizeOf(package, members));
+    const auto goOn = [&](std::uint64_t bytesRead) {
+        progress.report(std::min(static_cast<double>(bytesRead) / size, 1.0));
+        return !interrupted();
+    };
     for (const std::string& member : members) {
         const std::string path = (package / member).string();
         const OpenFile source(path, O_RDONLY);
         int error = interrupted() ? ECANCELED : source.error();
         if (error == 0)
-            error = archive.addDeflated(member, source.get());
+            error = archive.addDeflated(member, source.get(), goOn);
         if (error != 0)
             return {error, path};
     }
@@ -131,16 +148,6 @@ Failure writeArchive(const fs::path& package, int file) {
     return {error, package.string()};
 }
 
-bool liesWithin(URL folder, const URL& package) {
-    while (!isSamePlace(folder, package)) {
-        const URL above = folder.deletingLastPathComponent();
-        if (above == folder)
-            return false;
-        folder = above;
-    }
-    return true;
-}
-
 class PackCommand : public Command {
 public:
     void declare(CommandLine& line) override;
@@ -150,17 +157,22 @@ private:
     void pack(PVAssetMetadataFileManager& manager, const AssetPtr& asset, Result& result) const;
 
     std::optional<std::string> m_file;
+    ProgressOption m_progress;
     AssetChanges m_changes;
+
+    Progress::Form m_form = Progress::Form::Auto;
 };
 
 void PackCommand::declare(CommandLine& line) {
     line.group("Where to");
     line.option("-o,--output", "FILE", "the zipped book to make; nothing may stand there", m_file);
+    m_progress.declare(line);
     m_changes.declare(line);
 }
 
 int PackCommand::run(std::vector<std::string> operands) {
     m_changes.begin();
+    m_form = m_progress.form();
     if (!m_file)
         throw UsageError("say where to: -o FILE");
     if (!m_changes.hasOnePath(operands))
@@ -203,8 +215,15 @@ void PackCommand::pack(PVAssetMetadataFileManager& manager, const AssetPtr& asse
     const bool isRehearsal = m_changes.isDryRun();
     const OpenFile file(isRehearsal ? fs::temp_directory_path(unknown).string() : staged.path(),
                         O_RDWR | (isRehearsal ? O_TMPFILE : O_CREAT | O_EXCL));
-    const Failure failure =
-        file.get() < 0 ? Failure{errno, staged.path()} : writeArchive(package.path(), file.get());
+    Failure failure{errno, staged.path()};
+    if (file.get() >= 0) {
+        Progress progress(m_form, result.path);
+        failure = writeArchive(package.path(), file.get(), progress);
+    }
+    if (failure.errnoValue == ECANCELED) {
+        result.error = makeCancelledError(package);
+        return;
+    }
     if (failure.errnoValue != 0) {
         result.error = makePOSIXError(failure.errnoValue, URL::fileURLWithPath(failure.path));
         result.advice = failure.path + " can't be packed";

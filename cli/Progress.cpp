@@ -3,13 +3,15 @@
 #include <algorithm>
 #include <array>
 #include <cmath>
+#include <filesystem>
+#include <system_error>
 
 #include <unistd.h>
 
 #include "cli/JsonWriter.h"
 #include "cli/Output.h"
+#include "cli/Result.h"
 #include "cli/TerminalText.h"
-#include "parvel/foundation/URL.h"
 
 namespace parvel::cli {
 namespace {
@@ -18,7 +20,12 @@ using namespace std::chrono_literals;
 
 /// Shorter work needs no bar.
 constexpr auto kShortWork = 500ms;
+/// Before that a speed is a guess.
+constexpr auto kMeasurable = 1s;
+constexpr auto kStep = 100ms;
 constexpr int kBarWidth = 30;
+constexpr int kMovingWidth = 6;
+constexpr double kLongestLeft = 100 * 3600;
 constexpr std::string_view kClearLine = "\r\x1b[K";
 
 struct FormName {
@@ -33,6 +40,49 @@ constexpr std::array kForms{
     FormName{"json", Progress::Form::Json},
 };
 
+/// The bytes of a file or of all files in a folder; as far as they can be seen.
+std::uint64_t sizeOfItem(const std::string& path) {
+    namespace fs = std::filesystem;
+    std::error_code unknown;
+    if (fs::is_regular_file(path, unknown))
+        return fs::file_size(path, unknown);
+    std::uint64_t size = 0;
+    fs::recursive_directory_iterator entries(path, unknown);
+    for (; !unknown && entries != fs::recursive_directory_iterator(); entries.increment(unknown)) {
+        std::error_code gone;
+        const std::uint64_t bytes = entries->is_regular_file(gone) ? entries->file_size(gone) : 0;
+        size += gone ? 0 : bytes;
+    }
+    return size;
+}
+
+/// "1:05", "2:00:00".
+std::string clockText(double seconds) {
+    const auto whole = static_cast<int>(std::clamp(seconds, 0.0, kLongestLeft));
+    const auto twoDigits = [](int number) {
+        return (number < 10 ? "0" : "") + std::to_string(number);
+    };
+    const int minutes = whole / 60;
+    const std::string end = ":" + twoDigits(whole % 60);
+    if (minutes < 60)
+        return std::to_string(minutes) + end;
+    return std::to_string(minutes / 60) + ":" + twoDigits(minutes % 60) + end;
+}
+
+/// "12.3 MB/s"
+std::string speedText(double bytesPerSecond) {
+    const auto tenths = static_cast<std::uint64_t>(std::clamp(bytesPerSecond / 1e5, 0.0, 1e9));
+    return std::to_string(tenths / 10) + "." + std::to_string(tenths % 10) + " MB/s";
+}
+
+/// A bar that is full from one place to another.
+std::string barText(int from, int to) {
+    std::string bar(kBarWidth, ' ');
+    for (int at = from; at < to; ++at)
+        bar[static_cast<std::size_t>(at)] = '#';
+    return "[" + bar + "]";
+}
+
 }  // namespace
 
 Progress::Progress(Form form, std::string_view path) : m_form(form), m_path(path) {
@@ -41,15 +91,46 @@ Progress::Progress(Form form, std::string_view path) : m_form(form), m_path(path
 }
 
 Progress::~Progress() {
-    if (m_drawn)
+    if (m_hasDrawn)
         writeToStandardError(kClearLine);
+}
+
+std::chrono::duration<double> Progress::elapsed() const {
+    return std::chrono::steady_clock::now() - m_begin;
+}
+
+bool Progress::isTooEarly() const {
+    return m_form == Form::Auto && elapsed() < kShortWork;
 }
 
 void Progress::report(double share) {
     if (m_form == Form::Json)
         printLine(share);
-    else if (m_form != Form::Never)
-        drawBar(share);
+    if (m_form == Form::Json || m_form == Form::Never || isTooEarly())
+        return;
+    const double known = std::isfinite(share) ? std::clamp(share, 0.0, 1.0) : 1.0;
+    const int percentage = static_cast<int>(known * 100);
+    if (m_percentage == percentage)
+        return;
+    m_percentage = percentage;
+    draw(barText(0, percentage * kBarWidth / 100),
+         std::to_string(percentage) + " %" + speedAndTimeLeft(known));
+}
+
+void Progress::report(double share, std::string_view path) {
+    m_path = path;
+    m_size = 0;  // that of the whole work is not known
+    report(share);
+}
+
+void Progress::reportTime() {
+    if (m_form == Form::Json || m_form == Form::Never || isTooEarly())
+        return;
+    const double seconds = elapsed().count();
+    const int way = kBarWidth - kMovingWidth;
+    const int step = static_cast<int>(std::fmod(seconds * 10, 2 * way));
+    const int from = step < way ? step : 2 * way - step;
+    draw(barText(from, from + kMovingWidth), clockText(seconds));
 }
 
 void Progress::printLine(double share) const {
@@ -60,25 +141,64 @@ void Progress::printLine(double share) const {
     writeToStandardError(line + "}\n");
 }
 
-void Progress::drawBar(double share) {
-    if (m_form == Form::Auto && std::chrono::steady_clock::now() - m_begin < kShortWork)
+std::string Progress::speedAndTimeLeft(double share) {
+    const double seconds = elapsed().count();
+    if (elapsed() < kMeasurable || share <= 0 || share >= 1)
+        return {};
+    if (!m_size)
+        m_size = sizeOfItem(urlOfPath(m_path).path());
+    const std::string left = " " + clockText(seconds * (1 - share) / share) + " left";
+    return *m_size == 0 ? left
+                        : " " + speedText(static_cast<double>(*m_size) * share / seconds) + left;
+}
+
+void Progress::draw(std::string_view bar, std::string_view words) {
+    m_hasDrawn = true;
+    const std::string left = std::string(bar) + " " + std::string(words) + " ";
+    const std::size_t width = std::max(terminalWidth(STDERR_FILENO), left.size() + 1);
+    const std::string name = safeText(lastComponentOfPath(m_path));
+    // A line that is full would go on in the next one, and stay there.
+    writeToStandardError(std::string(kClearLine) + left +
+                         std::string(cutText(name, width - left.size() - 1)));
+}
+
+BusyProgress::BusyProgress(Progress::Form form, std::string_view path) : m_progress(form, path) {
+    if (m_progress.form() == Progress::Form::Json)
+        m_progress.report(0);
+    if (m_progress.form() != Progress::Form::Auto && m_progress.form() != Progress::Form::Always)
         return;
-    const int percentage =
-        std::isfinite(share) ? static_cast<int>(std::clamp(share, 0.0, 1.0) * 100) : 100;
-    if (m_drawn == percentage)
-        return;
-    m_drawn = percentage;
-    const int filled = percentage * kBarWidth / 100;
-    std::string line(kClearLine);
-    line += "[" + std::string(static_cast<std::size_t>(filled), '#') +
-            std::string(static_cast<std::size_t>(kBarWidth - filled), ' ') + "] ";
-    line += std::to_string(percentage) + " % " + safeText(lastComponentOfPath(m_path));
-    writeToStandardError(line);
+    try {
+        m_thread = std::thread([this] { drawUntilEnd(); });
+    } catch (const std::system_error&) {
+        return;  // the system has no more threads; the work does without a bar
+    }
+}
+
+BusyProgress::~BusyProgress() {
+    {
+        const std::lock_guard lock(m_mutex);
+        m_hasEnded = true;
+    }
+    m_end.notify_one();
+    if (m_thread.joinable())
+        m_thread.join();
+}
+
+void BusyProgress::drawUntilEnd() {
+    std::unique_lock lock(m_mutex);
+    do {
+        m_progress.reportTime();
+    } while (!m_end.wait_for(lock, kStep, [this] { return m_hasEnded; }));
+}
+
+void BusyProgress::finish() {
+    if (m_progress.form() == Progress::Form::Json)
+        m_progress.report(1);
 }
 
 void ProgressOption::declare(CommandLine& line) {
     line.option("--progress", "WHEN",
-                "show on standard error how far a copy has come: auto\n"
+                "show on standard error how far the work has come: auto\n"
                 "(at a terminal, where it takes long), always, never or\n"
                 "json",
                 m_name);

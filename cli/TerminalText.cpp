@@ -115,6 +115,27 @@ std::size_t columns(std::string_view text) {
     return count;
 }
 
+std::string_view cutText(std::string_view text, std::size_t width) {
+    std::size_t used = 0;
+    std::size_t offset = 0;
+    while (offset < text.size()) {
+        const std::size_t length = characterAt(text, offset).value_or(Character{'?', 1}).length;
+        used += columns(text.substr(offset, length));
+        if (used > width)
+            break;
+        offset += length;
+    }
+    return text.substr(0, offset);
+}
+
+std::size_t terminalWidth(int descriptor) {
+    winsize size{};
+    std::size_t width = columnsFromEnvironment();
+    if (width == 0 && isatty(descriptor) == 1 && ioctl(descriptor, TIOCGWINSZ, &size) == 0)
+        width = size.ws_col;
+    return width == 0 ? Terminal().width : width;
+}
+
 std::vector<std::string> wrapped(std::string_view text, std::size_t width) {
     static constexpr std::string_view space = " \t\r\n\f\v";
     std::vector<std::string> lines;
@@ -149,12 +170,7 @@ void appendField(std::string_view label, std::string_view text, std::size_t labe
 Terminal Terminal::ofStandardOutput() {
     Terminal terminal;
     const bool isTerminal = isatty(STDOUT_FILENO) == 1;
-    winsize size{};
-    if (const std::size_t width = columnsFromEnvironment(); width > 0)
-        terminal.width = width;
-    else if (isTerminal && ioctl(STDOUT_FILENO, TIOCGWINSZ, &size) == 0 && size.ws_col > 0)
-        terminal.width = size.ws_col;
-    terminal.width = std::clamp<std::size_t>(terminal.width, 40, 120);
+    terminal.width = std::clamp<std::size_t>(terminalWidth(STDOUT_FILENO), 40, 120);
     const char* noColor = std::getenv("NO_COLOR");
     terminal.hasStyles = isTerminal && !(noColor && *noColor);
     return terminal;

@@ -15,6 +15,12 @@ std::string safeText(std::string_view text);
 /// How many columns the text takes; wide characters take two and combining ones none.
 std::size_t columns(std::string_view text);
 
+/// The beginning of the text that takes at most `width` columns; all of it where it does.
+std::string_view cutText(std::string_view text, std::size_t width);
+
+/// How wide the terminal behind the descriptor is, or COLUMNS says; 80 where nobody does.
+std::size_t terminalWidth(int descriptor);
+
 /// The words of the text in lines of at most `width` columns, where a word is not longer by itself.
 /// White space, line breaks too, only separates words.
 std::vector<std::string> wrapped(std::string_view text, std::size_t width);

@@ -123,17 +123,18 @@ int ZipWriter::addStored(std::string_view name, std::string_view bytes) {
     return complete(std::move(entry));
 }
 
-int ZipWriter::addDeflated(std::string_view name, int source) {
+int ZipWriter::addDeflated(std::string_view name, int source,
+                           const std::function<bool(std::uint64_t)>& goOn) {
     Entry entry;
     entry.method = kDeflated;
     if (const int error = begin(entry, name))
         return error;
-    if (const int error = deflate(source, entry))
+    if (const int error = deflate(source, entry, goOn))
         return error;
     return complete(std::move(entry));
 }
 
-int ZipWriter::deflate(int source, Entry& entry) {
+int ZipWriter::deflate(int source, Entry& entry, const std::function<bool(std::uint64_t)>& goOn) {
     z_stream stream{};
     if (deflateInit2(&stream, Z_DEFAULT_COMPRESSION, Z_DEFLATED, -MAX_WBITS, MAX_MEM_LEVEL,
                      Z_DEFAULT_STRATEGY) != Z_OK)
@@ -165,6 +166,9 @@ int ZipWriter::deflate(int source, Entry& entry) {
             if (const int error = write({reinterpret_cast<const char*>(out->data()), made}))
                 return error;
         } while (stream.avail_out == 0);
+        m_bytesRead += static_cast<std::uint64_t>(count);
+        if (count > 0 && !goOn(m_bytesRead))
+            return ECANCELED;
     }
     return 0;
 }

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -18,8 +19,10 @@ public:
     // would be too large.
 
     int addStored(std::string_view name, std::string_view bytes);
-    /// What the descriptor has from where it stands to its end.
-    int addDeflated(std::string_view name, int source);
+    /// What the descriptor has from where it stands to its end. Told after each piece how many
+    /// bytes of all such sources have been read, the caller says whether to go on: ECANCELED.
+    int addDeflated(std::string_view name, int source,
+                    const std::function<bool(std::uint64_t bytesRead)>& goOn);
     /// Writes the directory. The archive is complete, and not yet synced.
     int finish();
 
@@ -36,10 +39,11 @@ private:
     int begin(Entry& entry, std::string_view name);
     int complete(Entry entry);
     int write(std::string_view bytes);
-    int deflate(int source, Entry& entry);
+    int deflate(int source, Entry& entry, const std::function<bool(std::uint64_t)>& goOn);
 
     int m_file;
     std::uint64_t m_offset = 0;
+    std::uint64_t m_bytesRead = 0;
     std::vector<Entry> m_entries;
 };
 

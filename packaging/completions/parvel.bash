@@ -8,7 +8,7 @@ _parvel_options() {
                 --json --jsonl --plist --log --help -h'
             ;;
         check)
-            echo '--records --exit-code --dry-run --files-from --null -0
+            echo '--records --exit-code --progress --dry-run --files-from --null -0
                 --json --jsonl --plist --log --help -h'
             ;;
         cloud)
@@ -17,12 +17,12 @@ _parvel_options() {
             ;;
         cover) echo '--output -o --size --best --json --jsonl --plist --log --help -h' ;;
         edit)
-            echo '--set --updates --cover --restore-cover --inflate --temporary --direct --force --record --dry-run
+            echo '--set --updates --cover --restore-cover --inflate --temporary --direct --progress --force --record --dry-run
                 --files-from --null -0 --recursive -r
                 --json --jsonl --plist --log --help -h'
             ;;
         inflate)
-            echo '--temporary --direct --force --record --dry-run
+            echo '--temporary --direct --progress --force --record --dry-run
                 --files-from --null -0 --recursive -r
                 --json --jsonl --plist --log --help -h'
             ;;
@@ -41,7 +41,7 @@ _parvel_options() {
                 --json --jsonl --plist --log --help -h'
             ;;
         pack)
-            echo '--output -o --record --dry-run --files-from --null -0 --recursive -r
+            echo '--output -o --progress --record --dry-run --files-from --null -0 --recursive -r
                 --json --jsonl --plist --log --help -h'
             ;;
         redact)
@@ -61,7 +61,7 @@ _parvel_options() {
                 --json --jsonl --plist --log --help -h'
             ;;
         update)
-            echo '--into --existing --force --record --dry-run
+            echo '--into --existing --progress --force --record --dry-run
                 --files-from --null -0 --recursive -r
                 --json --jsonl --plist --log --help -h'
             ;;

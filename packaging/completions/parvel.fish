@@ -108,11 +108,14 @@ complete -c parvel -n '__fish_seen_subcommand_from install' -l rename -d 'Count 
 complete -c parvel -n '__fish_seen_subcommand_from install' -l asset-id-name -d 'Name a book after its identity'
 complete -c parvel -n '__fish_seen_subcommand_from install' -l cloud -d 'Into synchronised storage'
 complete -c parvel -n '__fish_seen_subcommand_from install' -l updating -r -d 'The asset that it is a new version of'
-complete -c parvel -n '__fish_seen_subcommand_from install' -l progress -x -a 'auto always never json' -d 'Show how far a copy has come'
 
 complete -c parvel -n '__fish_seen_subcommand_from update' -l into -r -d 'The folder'
 complete -c parvel -n '__fish_seen_subcommand_from update' -l existing -r -d 'The asset that it is a new version of'
 complete -c parvel -n '__fish_seen_subcommand_from update' -l force -d 'Replace another asset, too'
+
+for command in check edit inflate install pack update
+    complete -c parvel -n "__fish_seen_subcommand_from $command" -l progress -x -a 'auto always never json' -d 'Show how far the work has come'
+end
 
 for command in edit inflate install
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l temporary -r -d 'Have a book made there first'

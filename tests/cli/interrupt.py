@@ -3,10 +3,12 @@
 
 usage: interrupt.py SIGNAL WORDS...        after its first result; "a.epub" goes in, then nothing more
        interrupt.py --twice SIGNAL WORDS...  while it waits for somebody to read its results
+       interrupt.py --midway SIGNAL WORDS... while it waits for somebody to read its progress
 
 SIGNAL is INT or TERM. Prints what came out and the exit status.
 """
 
+import fcntl
 import signal
 import subprocess
 import sys
@@ -29,13 +31,31 @@ def state_of(command):
         return file.read().rsplit(")", 1)[1].split()[0]
 
 
+def wait_until_idle(command):
+    """Until it does nothing but wait, which it does for as long as nobody reads."""
+    idle = 0
+    while idle < 20:
+        time.sleep(0.01)
+        idle = idle + 1 if state_of(command) == "S" else 0
+
+
+def midway(name, words):
+    command = subprocess.Popen(words, stdin=subprocess.DEVNULL, stdout=subprocess.PIPE,
+                               stderr=subprocess.PIPE, text=True)
+    fcntl.fcntl(command.stderr, fcntl.F_SETPIPE_SZ, 4096)
+    command.stderr.read(1)
+    wait_until_idle(command)
+    command.send_signal(signal.Signals["SIG" + name])
+    out, err = command.communicate()
+    print(out, end="")
+    print(*[line for line in err.split("\n") if line.startswith("parvel: ")], sep="\n")
+    print("status", command.wait())
+
+
 def twice(name, words):
     command = subprocess.Popen(words, stdin=subprocess.DEVNULL, stdout=subprocess.PIPE)
     command.stdout.read(1)
-    idle = 0
-    while idle < 20:  # until it does nothing but wait, which it does for as long as nobody reads
-        time.sleep(0.01)
-        idle = idle + 1 if state_of(command) == "S" else 0
+    wait_until_idle(command)
     command.send_signal(signal.Signals["SIG" + name])
     time.sleep(0.2)
     print("after the first:", "runs" if command.poll() is None else "has ended")
@@ -49,5 +69,7 @@ if __name__ == "__main__":
         signal.signal(signal.Signals[name], signal.SIG_DFL)
     if sys.argv[1] == "--twice":
         twice(sys.argv[2], sys.argv[3:])
+    elif sys.argv[1] == "--midway":
+        midway(sys.argv[2], sys.argv[3:])
     else:
         once(sys.argv[1], sys.argv[2:])

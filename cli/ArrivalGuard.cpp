@@ -9,6 +9,10 @@ void ArrivalGuard::noteMove(const URL& source, const URL& destination) {
     m_arrivals.insert(destination.standardized().path());
 }
 
+bool ArrivalGuard::hasBrought(const URL& url) {
+    return m_arrivals.contains(url.standardized().path()) && itemExistsAtPath(url.path());
+}
+
 bool ArrivalGuard::moveItem(const URL& source, const URL& destination, ErrorOut error) {
     if (!ForwardingFileSystemService::moveItem(source, destination, error))
         return false;
@@ -18,7 +22,7 @@ bool ArrivalGuard::moveItem(const URL& source, const URL& destination, ErrorOut 
 
 bool ArrivalGuard::replaceItem(const URL& existing, const URL& replacement, ReplaceOptions options,
                                std::optional<URL>* resulting, ErrorOut error) {
-    if (m_arrivals.contains(existing.standardized().path()) && itemExistsAtPath(existing.path()))
+    if (hasBrought(existing))
         return fail(error, makePOSIXError(EALREADY, existing));
     if (!ForwardingFileSystemService::replaceItem(existing, replacement, options, resulting, error))
         return false;

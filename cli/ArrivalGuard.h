@@ -20,6 +20,9 @@ public:
     bool setUbiquitous(bool ubiquitous, const URL& item, const URL& destination,
                        ErrorOut error) override;
 
+    /// Whether the run has brought what stands there.
+    [[nodiscard]] bool hasBrought(const URL& url);
+
 private:
     void noteMove(const URL& source, const URL& destination);
 

@@ -1,6 +1,7 @@
 #include "cli/AssetChanges.h"
 
-#include "cli/ArrivalGuard.h"
+#include <cerrno>
+
 #include "cli/Batch.h"
 #include "cli/FolderGuard.h"
 
@@ -20,13 +21,22 @@ void AssetChanges::declareForce(CommandLine& line, std::string_view help) {
 }
 
 bool AssetChanges::hasOnePath(const std::vector<std::string>& operands) const {
-    return operands.size() == 1 && !m_paths.filesFrom && !m_paths.recursive;
+    return operands.size() == 1 && !hasSearchedPaths();
 }
 
 void AssetChanges::begin() {
     m_output.applyLog();
     m_record.read();
     m_dryRun.begin();
+}
+
+bool AssetChanges::mayReplace(const URL& existing, const URL& replacement, Result& result) const {
+    if (!m_isGuarded || m_isForced)
+        return true;
+    result.error = objectionToReplacing(existing, replacement);
+    if (!result.error && m_arrivals && m_arrivals->hasBrought(existing))
+        result.error = makePOSIXError(EALREADY, existing);
+    return !result.error;
 }
 
 int AssetChanges::run(std::string_view command, std::vector<std::string> operands,
@@ -51,8 +61,10 @@ int AssetChanges::runOnPaths(std::string_view command, std::vector<std::string> 
     const auto manager = m_dryRun.makeManager();
     if (m_isGuarded && !m_isForced)
         manager->setFileManager(std::make_shared<FolderGuard>(manager->fileManager()));
-    if (m_isGuarded && !m_isForced && m_paths.target)
-        manager->setFileManager(std::make_shared<ArrivalGuard>(manager->fileManager()));
+    if (m_isGuarded && !m_isForced && m_paths.target) {
+        m_arrivals = std::make_shared<ArrivalGuard>(manager->fileManager());
+        manager->setFileManager(m_arrivals);
+    }
     return runOverPaths(options, source, [&](const std::string& path) {
         Result result = resultForPath(path);
         result.nothing = "nothing was done";

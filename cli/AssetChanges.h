@@ -1,10 +1,12 @@
 #pragma once
 
 #include <functional>
+#include <memory>
 #include <string>
 #include <string_view>
 #include <vector>
 
+#include "cli/ArrivalGuard.h"
 #include "cli/AssetRecord.h"
 #include "cli/DryRun.h"
 #include "cli/OutputOptions.h"
@@ -37,12 +39,19 @@ public:
     void setTarget(const URL& folder) { m_paths.target = folder; }
     /// Whether there is but one PATH among the operands, and no other source of PATHs.
     [[nodiscard]] bool hasOnePath(const std::vector<std::string>& operands) const;
+    /// Whether PATHs are looked for elsewhere than among the operands alone.
+    [[nodiscard]] bool hasSearchedPaths() const { return m_paths.filesFrom || m_paths.recursive; }
     /// Reads and begins what was asked for. Throws UsageError.
     void begin();
     int run(std::string_view command, std::vector<std::string> operands, const ChangeWork& work);
     /// The same without the records of the PATHs.
     int runOnPaths(std::string_view command, std::vector<std::string> operands,
                    const PathChange& work);
+
+    /// Whether the guards let the item take the place of what stands there. Where they don't, the
+    /// result has their error before anything is touched: some operations write attributes first.
+    [[nodiscard]] bool mayReplace(const URL& existing, const URL& replacement,
+                                  Result& result) const;
 
     [[nodiscard]] AssetPtr recordOf(Result& result) const { return m_record.forResult(result); }
     [[nodiscard]] const OutputOptions& output() const { return m_output; }
@@ -52,6 +61,7 @@ private:
     DryRun m_dryRun;
     bool m_isGuarded = false;
     bool m_isForced = false;
+    std::shared_ptr<ArrivalGuard> m_arrivals;  ///< null where nothing is guarded
     OutputOptions m_output;
     PathOptions m_paths;
 };

@@ -1,10 +1,35 @@
 #include "cli/AssetChanges.h"
+#include "cli/BookStaging.h"
 #include "cli/Command.h"
+#include "cli/ServiceInPlace.h"
 #include "cli/TransferAdvice.h"
 #include "parvel/platform/CloudReport.h"
 
 namespace parvel::cli {
 namespace {
+
+/// Keeps what came of a replacement, which the library keeps to itself.
+class ReplacementWitness : public ForwardingFileSystemService {
+public:
+    using ForwardingFileSystemService::ForwardingFileSystemService;
+
+    bool replaceItem(const URL& existing, const URL& replacement, ReplaceOptions options,
+                     std::optional<URL>* resulting, ErrorOut error) override {
+        m_error.reset();
+        m_hasReplaced = ForwardingFileSystemService::replaceItem(existing, replacement, options,
+                                                                 resulting, &m_error);
+        if (!m_hasReplaced)
+            assign(error, m_error);
+        return m_hasReplaced;
+    }
+
+    [[nodiscard]] bool hasReplaced() const { return m_hasReplaced; }
+    [[nodiscard]] const std::optional<Error>& error() const { return m_error; }
+
+private:
+    bool m_hasReplaced = false;
+    std::optional<Error> m_error;
+};
 
 /// `cloud add`, `take`, `replace` and `status`.
 class CloudCommand : public Command {
@@ -16,6 +41,8 @@ private:
     void checkOptions(std::string_view action) const;
     void transfer(bool isInto, PVAssetMetadataFileManager& manager, const AssetPtr& asset,
                   Result& result) const;
+    void replaceInto(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
+                     Result& result) const;
 
     std::optional<std::string> m_into;
     std::optional<URL> m_target;
@@ -94,20 +121,41 @@ void tellStatus(Result& result) {
 
 void CloudCommand::transfer(bool isInto, PVAssetMetadataFileManager& manager, const AssetPtr& asset,
                             Result& result) const {
-    const AssetPtr moved = manager.setUbiquitous_asset_intoDirectory_replace_error(
-        isInto, asset, *m_target, m_replaces, &result.error);
-    setRecord(result, moved, PVAssetMetadataFlavorFull);
     if (m_replaces) {
-        // The library reports no outcome; the disk tells.
-        result.needsRecord = false;
-        const bool isGone = !manager.fileManager()->itemExistsAtPath(urlOfPath(result.path).path());
-        result.outcome =
-            isGone ? "moved into " + m_target->path() : "still where it was; nothing tells why";
-    } else if (moved && moved->url()) {
-        result.outcome = "moved to " + moved->url()->path();
-    } else {
-        result.advice = adviceForTransfer(result, urlOfPath(result.path), "move that away first");
+        replaceInto(manager, asset, result);
+        return;
     }
+    const AssetPtr moved = manager.setUbiquitous_asset_intoDirectory_replace_error(
+        isInto, asset, *m_target, /*replace=*/false, &result.error);
+    setRecord(result, moved, PVAssetMetadataFlavorFull);
+    if (moved && moved->url())
+        result.outcome = "moved to " + moved->url()->path();
+    else
+        result.advice = adviceForTransfer(result, urlOfPath(result.path), "move that away first");
+}
+
+/// The library reports no outcome; the disk tells whether, and the service why not.
+void CloudCommand::replaceInto(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
+                               Result& result) const {
+    const auto witness = std::make_shared<ReplacementWitness>(manager.fileManager());
+    {
+        const ServiceInPlace inPlace(manager, witness);
+        manager.setUbiquitous_asset_intoDirectory_replace_error(
+            /*ubiquitous=*/true, asset, *m_target, /*replace=*/true, &result.error);
+    }
+    result.needsRecord = !witness->hasReplaced();
+    if (witness->hasReplaced()) {
+        result.outcome = "moved into " + m_target->path();
+        return;
+    }
+    result.nothing = "still where it was";
+    Result failed = result;
+    failed.error = standsAt(*m_target)
+                       ? witness->error()
+                       : makeFileError(PVFileErrorCode::NoSuchFile,
+                                       placeInFolder(asset, *m_target, /*takesAssetID=*/false));
+    result.reason = failed.error ? failed.error->message() : "nothing tells why";
+    result.advice = adviceForTransfer(failed, urlOfPath(result.path), "move that away first");
 }
 
 /// --record, where it is given, is the record of the new version.
@@ -119,9 +167,9 @@ void replace(PVAssetMetadataFileManager& manager, const AssetPtr& newVersion, Re
     setRecord(result, replaced, PVAssetMetadataFlavorFull);
     if (replaced && replaced->url())
         result.outcome = "replaced by " + replaced->url()->path();
-    else
-        result.advice = adviceForTransfer(
-            result, newVersion->url().value_or(urlOfPath(result.path)), "move that away first");
+    else if (const auto url = newVersion->url())
+        result.advice = adviceForReplacement(result, *url, urlOfPath(result.path),
+                                             !manager.fileManager()->itemExistsAtPath(url->path()));
 }
 
 int CloudCommand::run(std::vector<std::string> operands) {

@@ -23,12 +23,18 @@ bool isLinkTo(const URL& url, const URL& item) {
            std::filesystem::equivalent(url.path(), item.path(), unknown);
 }
 
+std::optional<Error> objectionToReplacing(const URL& existing, const URL& replacement) {
+    if (isFolderAlone(existing))
+        return makePOSIXError(EISDIR, existing);
+    if (isLinkTo(replacement, existing))
+        return makePOSIXError(EINVAL, existing);
+    return std::nullopt;
+}
+
 bool FolderGuard::replaceItem(const URL& existing, const URL& replacement, ReplaceOptions options,
                               std::optional<URL>* resulting, ErrorOut error) {
-    if (isFolderAlone(existing))
-        return fail(error, makePOSIXError(EISDIR, existing));
-    if (isLinkTo(replacement, existing))
-        return fail(error, makePOSIXError(EINVAL, existing));
+    if (std::optional<Error> objection = objectionToReplacing(existing, replacement))
+        return fail(error, std::move(*objection));
     return ForwardingFileSystemService::replaceItem(existing, replacement, options, resulting,
                                                     error);
 }

@@ -16,6 +16,10 @@ public:
     bool removeItem(const URL& item, ErrorOut error) override;
 };
 
+/// Why the guard does not let the replacement take the item's place; none where it does.
+[[nodiscard]] std::optional<Error> objectionToReplacing(const URL& existing,
+                                                        const URL& replacement);
+
 /// Whether the URL is a link that leads to the item, which is none.
 [[nodiscard]] bool isLinkTo(const URL& url, const URL& item);
 

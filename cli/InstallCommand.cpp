@@ -3,6 +3,7 @@
 #include "cli/Command.h"
 #include "cli/Interrupt.h"
 #include "cli/Progress.h"
+#include "cli/ServiceInPlace.h"
 #include "cli/TransferAdvice.h"
 #include "parvel/iotasks/PVInstallAssetMetadataIOTask.h"
 
@@ -25,22 +26,6 @@ private:
     URL m_source;
 };
 
-/// Another file-system service for a manager, while it lives.
-class GuardedManager {
-public:
-    GuardedManager(PVAssetMetadataFileManager& manager, std::shared_ptr<FileSystemService> guard)
-        : m_manager(manager), m_service(manager.fileManager()) {
-        manager.setFileManager(std::move(guard));
-    }
-    ~GuardedManager() { m_manager.setFileManager(m_service); }
-    GuardedManager(const GuardedManager&) = delete;
-    GuardedManager& operator=(const GuardedManager&) = delete;
-
-private:
-    PVAssetMetadataFileManager& m_manager;
-    std::shared_ptr<FileSystemService> m_service;
-};
-
 class InstallCommand : public Command {
 public:
     void declare(CommandLine& line) override;
@@ -52,6 +37,7 @@ private:
                                  Result& result) const;
     [[nodiscard]] std::optional<URL> takenPlace(PVAssetMetadataFileManager& manager,
                                                 const AssetPtr& asset) const;
+    [[nodiscard]] std::optional<URL> replacedPlace(const AssetPtr& asset) const;
     [[nodiscard]] std::optional<URL> placeOfOldName(PVAssetMetadataFileManager& manager) const;
 
     std::optional<std::string> m_into;
@@ -120,6 +106,16 @@ std::optional<URL> InstallCommand::takenPlace(PVAssetMetadataFileManager& manage
     return isTaken ? place : std::nullopt;
 }
 
+/// Where a moved asset would go over what stands there.
+std::optional<URL> InstallCommand::replacedPlace(const AssetPtr& asset) const {
+    if (!m_replaces)
+        return std::nullopt;
+    const auto old = m_updating ? m_updating->url() : std::nullopt;
+    if (old)
+        return m_goesToCloud ? old : m_folder.appendingPathComponent(old->lastPathComponent());
+    return m_goesToCloud ? std::nullopt : placeInFolder(asset, m_folder, m_takesAssetID);
+}
+
 /// What stands under the updated asset's name in a folder that it does not lie in.
 std::optional<URL> InstallCommand::placeOfOldName(PVAssetMetadataFileManager& manager) const {
     const bool takesOldName = m_updating && m_replaces && !m_goesToCloud;
@@ -145,6 +141,12 @@ bool InstallCommand::isRefused(PVAssetMetadataFileManager& manager, const AssetP
         return false;
     if (isRefusedForCapitals(asset, result))
         return true;
+    const std::optional<URL> replaced = replacedPlace(asset);
+    if (replaced && manager.fileManager()->itemExistsAtPath(replaced->path()) &&
+        !m_changes.mayReplace(*replaced, *asset->url(), result)) {
+        result.advice = adviceForTransfer(result, *asset->url(), {});
+        return true;
+    }
     const std::optional<URL> taken = takenPlace(manager, asset);
     if (taken)
         refuse(result, taken->path() + " is taken, and the library would delete the book then",
@@ -155,13 +157,14 @@ bool InstallCommand::isRefused(PVAssetMetadataFileManager& manager, const AssetP
 
 void InstallCommand::install(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
                              Result& result) const {
+    result.nothing = "not installed";
     if (isRefused(manager, asset, result))
         return;
     const std::optional<StagingPlace> place =
         m_staging.placeFor(*asset->url(), m_folder, m_changes.isForced(), result);
     if (!place)
         return;
-    std::optional<GuardedManager> guarded;
+    std::optional<ServiceInPlace> guarded;
     if (!m_changes.isForced())
         guarded.emplace(manager,
                         std::make_shared<SourceGuard>(manager.fileManager(), *asset->url()));
@@ -184,7 +187,6 @@ void InstallCommand::install(PVAssetMetadataFileManager& manager, const AssetPtr
         task->setProgressHandler(nullptr);
     }
     setRecord(result, installed, PVAssetMetadataFlavorFull);
-    result.nothing = "not installed";
     if (installed && installed->url())
         result.outcome = "installed as " + installed->url()->path();
     else

@@ -9,7 +9,8 @@ std::string adviceForFileError(const Result& result, const URL& place, const URL
                                std::string_view ifTaken) {
     switch (static_cast<PVFileErrorCode>(result.error->code())) {
         case PVFileErrorCode::FileExists:
-            return "something stands at " + place.path() + ": " + std::string(ifTaken);
+            return "something stands at " + place.path() + (ifTaken.empty() ? "" : ": ") +
+                   std::string(ifTaken);
         case PVFileErrorCode::NoSuchFile:
             if (place == source)
                 return place == urlOfPath(result.path) ? "" : place.path() + " is not there";
@@ -53,6 +54,17 @@ std::string adviceForTransfer(const Result& result, const URL& source, std::stri
     if (result.error->domain() == PVPOSIXErrorDomain)
         return adviceForPOSIXError(result.error->code(), *place);
     return {};
+}
+
+std::string adviceForReplacement(const Result& result, const URL& newVersion, const URL& existing,
+                                 bool isPlaced) {
+    const bool isTaken =
+        result.error && result.error->url() && result.error->domain() == PVFileErrorDomain &&
+        result.error->code() == static_cast<std::int64_t>(PVFileErrorCode::FileExists);
+    if (!isPlaced || !isTaken)
+        return adviceForTransfer(result, newVersion, "move that away first");
+    return "the new version is in the old one's place, " + existing.path() +
+           ", and keeps that name, since something stands at " + result.error->url()->path();
 }
 
 }  // namespace parvel::cli

@@ -1,4 +1,5 @@
 #include <cstring>
+#include <filesystem>
 
 #include "cli/AssetRecord.h"
 #include "cli/Batch.h"
@@ -30,6 +31,7 @@ private:
     [[nodiscard]] Result dump(const std::string& path);
     [[nodiscard]] Result apply(const std::string& path) const;
     [[nodiscard]] Result resultOf(const std::string& path);
+    [[nodiscard]] std::string keepDump() const;
 
     bool m_write = false;
     std::vector<std::string> m_updates;
@@ -84,13 +86,21 @@ int AttributesCommand::run(std::vector<std::string> operands) {
     PathSource source(std::move(operands), m_paths);
     const int status =
         runOverPaths(options, source, [this](const std::string& path) { return resultOf(path); });
-    const int error =
-        m_dumpFile && !m_dryRun.isAsked() && !interrupted() ? m_kept.write(*m_dumpFile) : 0;
-    if (error == 0)
+    const std::string problem = m_dumpFile && !interrupted() ? keepDump() : std::string();
+    if (problem.empty())
         return status;
-    writeToStandardError(
-        problemLine("attributes", "--dump " + *m_dumpFile + ": " + strerrordesc_np(error)));
+    writeToStandardError(problemLine("attributes", "--dump " + *m_dumpFile + ": " + problem));
     return kFailure;
+}
+
+/// Writes what was read into the file of --dump. Gives what went wrong; empty for nothing.
+std::string AttributesCommand::keepDump() const {
+    std::error_code unknown;
+    const auto size = std::filesystem::file_size(*m_dumpFile, unknown);
+    if (m_kept.isEmpty() && !unknown && size > 0)
+        return "no attributes were read, so it stays as it is";
+    const int error = m_dryRun.isAsked() ? 0 : m_kept.write(*m_dumpFile);
+    return error == 0 ? std::string() : strerrordesc_np(error);
 }
 
 Result AttributesCommand::resultOf(const std::string& path) {
@@ -183,9 +193,12 @@ Result AttributesCommand::apply(const std::string& path) const {
     Result result = resultForPath(path);
     const AssetPtr asset = m_record.forResult(result);
     setRecord(result, asset, PVAssetMetadataFlavorFull);
+    const auto manager = m_dryRun.makeManager();
     const Dictionary* kept = result.assetID ? m_kept.find(*result.assetID) : nullptr;
-    const bool written = kept && m_dryRun.makeManager()->_writeExtendedAttributes_url_error(
-                                     *kept, asset->url(), &result.error);
+    const bool written =
+        kept && manager->_writeExtendedAttributes_url_error(*kept, asset->url(), &result.error);
+    if (!kept && !manager->fileManager()->itemExistsAtPath(urlOfPath(path).path()))
+        result.error = makeFileError(PVFileErrorCode::NoSuchFile, urlOfPath(path));
     result.fields.push_back({"written", Number::boolean(written)});
     result.outcome = written ? "has its attributes" : "none are kept for it";
     return result;

@@ -23,29 +23,34 @@ struct Reason {
 
 constexpr std::array kReasons{
     Reason{"Caught exception while trying to get asset metadata: %@",
-           "what the file holds is malformed", 4},
+           "what the file holds is malformed", 5},
     Reason{"Failed to create containerXML document",
-           "the container document (META-INF/container.xml) is missing or damaged", 4},
+           "the container document (META-INF/container.xml) is missing or damaged", 5},
     Reason{"Failed to get opf path",
-           "the container document is damaged, or names no package document", 4},
+           "the container document is damaged, or names no package document", 5},
     Reason{"Failed to get opf url",
-           "the container document is damaged, or names no package document", 4},
-    Reason{"Failed to extract opf data", "the package document is missing or damaged", 4},
-    Reason{"Failed to make zipArchive", "the file is no zip archive, or a damaged one", 4},
-    Reason{"Failed to create opf document", "the package document is damaged", 4},
-    Reason{"Failed to find metadata element.", "the package document has no metadata", 4},
-    Reason{"Failed to read PDF contents", "the file could not be read", 4},
-    Reason{"Failed to create PDF document", "the file is no PDF document, or a damaged one", 4},
-    Reason{"Failed to determine if url is directory", "the file could not be looked at", 4},
-    Reason{"Exception while parsing Bazaar Metadta", "the store metadata file is malformed", 4},
-    Reason{"BazaarMetadata: fail", "the file is no property list", 4},
-    Reason{"Failed to get opf data. url: %@ error: %@", "the package document can't be read", 3},
+           "the container document is damaged, or names no package document", 5},
+    Reason{"Failed to extract opf data", "the package document is missing or damaged", 5},
+    Reason{"Failed to make zipArchive", "the file is no zip archive, or a damaged one", 5},
+    Reason{"Failed to create opf document", "the package document is damaged", 5},
+    Reason{"Failed to find metadata element.", "the package document has no metadata", 5},
+    Reason{"Failed to read PDF contents", "the file could not be read", 5},
+    Reason{"Failed to create PDF document", "the file is no PDF document, or a damaged one", 5},
+    Reason{"Failed to determine if url is directory", "the file could not be looked at", 5},
+    Reason{"Exception while parsing Bazaar Metadta", "the store metadata file is malformed", 5},
+    Reason{"BazaarMetadata: fail", "the file is no property list", 5},
+    Reason{"Failed to get opf data. url: %@ error: %@", "the package document can't be read", 4},
     Reason{"Failed to get opf data", "the book has no container document (META-INF/container.xml)",
-           2},
+           3},
 };
 
+/// What any other line is worth: that of a failed step more than one on the way there.
+constexpr int kStepRank = 1;
+constexpr int kFailureRank = 2;
+
 /// Lines that say only that something failed, or that nothing did.
-constexpr std::array<std::string_view, 6> kUntelling{
+constexpr std::array<std::string_view, 7> kUntelling{
+    "MissingAsset: Failed to inspect url: %@",
     "Parsed Metadata: %@",
     "Failed to get metadata: %@ url error: %@",
     "Failed to create aggregated metadata",
@@ -53,6 +58,13 @@ constexpr std::array<std::string_view, 6> kUntelling{
     "Failed to get element from xpath: %@",
     "xAttrs: Using promised URL",
 };
+
+/// Whether a line that has no words of its own may be a reason as it stands. What only begins is
+/// none.
+bool isTelling(const LogLine& line) {
+    return line.level >= LogLevel::Default && line.text.find(": start {") == line.text.npos &&
+           std::find(kUntelling.begin(), kUntelling.end(), line.text) == kUntelling.end();
+}
 
 LogLevel s_printed = LogLevel::Off;
 
@@ -104,12 +116,10 @@ void CallLog::write(const LogLine& line) {
         }
         return;
     }
-    const bool tells =
-        line.level >= LogLevel::Default && m_rank == 0 &&
-        std::find(kUntelling.begin(), kUntelling.end(), line.text) == kUntelling.end();
-    if (tells) {
+    const int rank = line.level >= LogLevel::Error ? kFailureRank : kStepRank;
+    if (rank > m_rank && isTelling(line)) {
         m_reason = line.message();
-        m_rank = 1;
+        m_rank = rank;
     }
 }
 

@@ -18,6 +18,7 @@ public:
     /// Gives the errno value of a step that failed, else 0.
     [[nodiscard]] int write(const std::string& file) const;
 
+    [[nodiscard]] bool isEmpty() const { return m_attributes.empty(); }
     /// Callable from many threads.
     void add(const String& assetID, Dictionary attributes);
     /// Null where none are kept for the asset.

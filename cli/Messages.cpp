@@ -57,20 +57,23 @@ bool reasonTellsMore(const Result& result) {
            !result.error->userInfo().contains(PVLocalizedFailureReasonErrorKey);
 }
 
+std::string withoutFullStop(std::string words) {
+    if (words.ends_with('.'))
+        words.pop_back();
+    return words;
+}
+
 }  // namespace
 
 std::string failureLine(std::string_view command, const Result& result) {
     std::string line = "parvel: " + std::string(command) + ": " + safeText(result.path) + ": ";
     if (!result.error) {
         line += result.nothing;
-        line += (result.reason.empty() ? "" : ": ") + safeText(result.reason);
+        line += (result.reason.empty() ? "" : ": ") + safeText(withoutFullStop(result.reason));
         return line + (result.advice.empty() ? "" : "; ") + safeText(result.advice) + "\n";
     }
     const Error& error = *result.error;
-    std::string words = reasonTellsMore(result) ? result.reason : error.message();
-    if (words.ends_with('.'))
-        words.pop_back();
-    line += safeText(words);
+    line += safeText(withoutFullStop(reasonTellsMore(result) ? result.reason : error.message()));
     line += " (" + safeText(error.domain()) + " " + std::to_string(error.code()) + ")";
     const std::string advice =
         result.advice.empty() ? std::string(adviceFor(result)) : safeText(result.advice);

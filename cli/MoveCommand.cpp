@@ -72,7 +72,10 @@ void MoveCommand::move(PVAssetMetadataFileManager& manager, const AssetPtr& asse
                   .moveAsset_toDirectory_replaceExisting_renameIfCollision_useAssetIDFileName_error(
                       asset, *m_target, m_replaces, m_renames, m_takesAssetID, &result.error);
     setRecord(result, moved, PVAssetMetadataFlavorFull);
-    if (moved == asset)
+    const bool isItsOwnPlace = moved == asset;
+    if (isItsOwnPlace && !manager.fileManager()->itemExistsAtPath(urlOfPath(result.path).path()))
+        result.error = makeFileError(PVFileErrorCode::NoSuchFile, urlOfPath(result.path));
+    else if (isItsOwnPlace)
         result.outcome = "is there already";
     else if (moved && moved->url())
         result.outcome = "moved to " + moved->url()->path();

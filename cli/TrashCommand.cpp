@@ -59,7 +59,7 @@ int TrashCommand::run(std::vector<std::string> operands) {
 }
 
 int TrashCommand::list(const std::vector<std::string>& operands) const {
-    if (!operands.empty())
+    if (!operands.empty() || m_changes.hasSearchedPaths())
         throw UsageError("--list takes no PATH");
     ResultPrinter printer("trash", m_changes.output().form(), makeOutcomeFormat);
     for (const TrashedItem& item : trashedItems()) {

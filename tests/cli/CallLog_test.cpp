@@ -46,6 +46,23 @@ TEST(CallLog, TakesALineWithoutWordsOfOurOwnAsItIs) {
     EXPECT_EQ(log.reason(), "Failed to generate PDF ID");
 }
 
+TEST(CallLog, PrefersAFailureToTheStepsBeforeIt) {
+    CallLog log;
+
+    PVParvelLog().info("Rename: Move without replacement");
+    PVParvelLog().error("Failed to generate %@", std::string_view("PDF ID"));
+
+    EXPECT_EQ(log.reason(), "Failed to generate PDF ID");
+}
+
+TEST(CallLog, TakesNoBeginningForAReason) {
+    CallLog log;
+
+    PVParvelLog().info("OrphanAssets: start {assets: %ld}", 3);
+
+    EXPECT_EQ(log.reason(), "");
+}
+
 TEST(CallLog, PrefersKnownWordsToALineAsItIs) {
     CallLog log;
 

@@ -14,16 +14,6 @@ namespace {
 
 constexpr std::size_t kLargestCover = std::size_t{64} << 20;
 
-/// Whether the error is that no cover was moved aside, since a first one is kept already or there
-/// was none: a new cover was asked for, and is there.
-bool isCoverLeftInPlace(const PVAssetMetadata& edited, const std::optional<Error>& error) {
-    const auto artwork = edited.bazaarArtworkURL();
-    const auto backup = edited.bazaarArtworkBackupURL();
-    return error && artwork && backup &&
-           (error == makeFileError(PVFileErrorCode::FileExists, *backup) ||
-            error == makeFileError(PVFileErrorCode::NoSuchFile, *artwork));
-}
-
 class EditCommand : public Command {
 public:
     void declare(CommandLine& line) override;
@@ -155,8 +145,6 @@ void EditCommand::edit(PVAssetMetadataFileManager& manager, const AssetPtr& asse
             progress.finish();
     }
     setRecord(result, edited, PVAssetMetadataFlavorFull);
-    if (edited && !m_restoresCover && isCoverLeftInPlace(*edited, result.error))
-        result.error.reset();
     if (edited)
         result.outcome = outcomeOf(manager, asset, edited);
     else

@@ -120,8 +120,8 @@ public:
     /// Puts the updates' cover in a package's cover file, which is moved aside first; a null marker
     /// removes it and brings back the first one. A record of a kind without such a file is only
     /// given the cover. The record comes back unchanged without a new cover; none for an empty one.
-    /// A cover that can't be moved aside, as where a first one is kept already, and a first one
-    /// that can't be brought back leave their error beside the record. Deliberate.
+    /// A first one that can't be brought back leaves its error beside the record; a cover that
+    /// can't be moved aside, as where a first one is kept already, does not. Deliberate.
     AssetPtr _updateImageCoverDataForMetadta_updates_error(const AssetPtr& asset,
                                                            const AssetPtr& updates,
                                                            ErrorOut error = nullptr);

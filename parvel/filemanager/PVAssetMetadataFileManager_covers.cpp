@@ -50,7 +50,8 @@ AssetPtr restoreOriginalCover(FileSystemService& fileManager, const PVAssetMetad
     if (!fileManager.removeItem(files.artwork, error))
         return nullptr;
 
-    // Deliberate: goes on without an original, whose error passes out beside the record.
+    // Deliberate: goes on without an original, which is what was asked for: the error of it passes
+    // out beside the record.
     ErrorSlot restoring(error);
     if (fileManager.moveItem(files.backup, files.artwork, restoring.out())) {
         PVParvelLog().debug("ReplaceCover: Restored existing URL -- Success");
@@ -71,14 +72,14 @@ AssetPtr replaceCover(FileSystemService& fileManager, const PVAssetMetadata& ass
     const auto present = coverFileOf(asset);
     const Value replaced = present ? Value(*present) : Value();
     // Deliberate: a backup that is there already fails the move, so that the first original is
-    // kept; its error passes out beside the record.
-    ErrorSlot aside(error);
-    if (fileManager.moveItem(files.artwork, files.backup, aside.out())) {
+    // kept. What is passed over stays out of the caller's error: the new cover is there.
+    std::optional<Error> asideError;
+    if (fileManager.moveItem(files.artwork, files.backup, &asideError)) {
         PVParvelLog().info("ReplaceCover: Moved aside original book cover");
     } else {
         PVParvelLog().error(
             "ReplaceCover: Failed to move aside the original BazaarArtwork: %@ error: %@",
-            files.artwork, aside.value());
+            files.artwork, asideError);
     }
 
     if (!Service<FileWriter>::current().writeFile(files.artwork, cover, error)) {

@@ -108,25 +108,25 @@ TEST_F(ReplacingCovers, AFirstCoverReplacesTheNullMarker) {
                      "default ReplaceCover: Wrote new cover image -- Done"}));
 }
 
-TEST_F(ReplacingCovers, TheErrorOfAFailedMoveAsideIsPassedOutBesideTheRecord) {
+TEST_F(ReplacingCovers, WhatIsPassedOverStaysOutOfTheCallersError) {
     ASSERT_TRUE(update(book(), bytesValue("new")));
-    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::NoSuchFile, coverURL()));
+    EXPECT_FALSE(m_error);
 }
 
-TEST_F(ReplacingCovers, ACoverThatCanNotBeMovedAsideIsReplacedAndTheErrorTells) {
+TEST_F(ReplacingCovers, ACoverThatCanNotBeMovedAsideIsReplacedAllTheSame) {
     const AssetPtr asset = bookWithCover("old");
     refuse(Act::Move, "BazaarArtwork");
 
     const AssetPtr updated = update(asset, bytesValue("new"));
 
     ASSERT_TRUE(updated);
-    EXPECT_EQ(m_error, makePOSIXError(EIO, coverURL()));
+    EXPECT_FALSE(m_error);
     EXPECT_EQ(valueOf(updated->coverImageDataReplaced()), bytesValue("old"));
     EXPECT_EQ(coverFile(), "new");
     EXPECT_EQ(names("a.epub"), Names{"BazaarArtwork"});
 }
 
-TEST_F(ReplacingCovers, AFailedWritesErrorTakesThePlaceOfTheMovesAside) {
+TEST_F(ReplacingCovers, AFailedWritesErrorIsPassedOut) {
     const AssetPtr asset = book();
     const RefusingFileWriter writer;
 
@@ -163,7 +163,7 @@ TEST_F(ReplacingCovers, ASecondCoverKeepsTheFirstOriginal) {
               "error ReplaceCover: Failed to move aside the original BazaarArtwork: " +
                   coverURL().absoluteString() +
                   " error: " + logText(makeFileError(PVFileErrorCode::FileExists, backupURL())));
-    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::FileExists, backupURL()));
+    EXPECT_FALSE(m_error);
 }
 
 TEST_F(ReplacingCovers, AnEmptyCoverIsNone) {
@@ -206,7 +206,6 @@ TEST_F(ReplacingCovers, RemovingTheCoverRestoresTheFirstOriginal) {
     AssetPtr asset = bookWithCover("first");
     ASSERT_TRUE(asset = update(asset, bytesValue("second")));
     ASSERT_TRUE(asset = update(asset, bytesValue("third")));
-    m_error.reset();
     RecordedLog log;
 
     const AssetPtr updated = update(asset, Value());

@@ -28,6 +28,10 @@ std::size_t lengthOf(const xmlEntity* entity) {
     return entity && entity->length > 0 ? static_cast<std::size_t>(entity->length) : 0;
 }
 
+bool holdsReference(const xmlChar* begin, const xmlChar* end) {
+    return std::memchr(begin, '&', static_cast<std::size_t>(end - begin)) != nullptr;
+}
+
 const xmlNode* nextInTree(const xmlNode* node, const void* top) {
     if (node->type == XML_ELEMENT_NODE && node->children)
         return node->children;
@@ -92,6 +96,15 @@ struct GuardedXmlParse::Callbacks {
         return *static_cast<GuardedXmlParse*>(static_cast<xmlParserCtxt*>(context)->_private);
     }
     static bool inEntity(void* context) { return context != guard(context).parser(); }
+
+    /// Once the encoding is known, a document that needs no decoding lies in the parser's buffer
+    /// as far as it goes. Without this the parser would ask for more at nearly every token.
+    static void startDocument(void* context) {
+        xmlSAX2StartDocument(context);
+        xmlParserInputBuffer* buffer = guard(context).parser()->input->buf;
+        if (guard(context).m_isWhole && buffer && !buffer->encoder)
+            buffer->readcallback = nullptr;
+    }
 
     static void startElement(void* context, const xmlChar* name, const xmlChar* prefix,
                              const xmlChar* namespaceName, int namespaceCount,
@@ -190,7 +203,7 @@ struct GuardedXmlParse::Callbacks {
     static xmlSAXHandler handler() {
         xmlSAXHandler sax{};
         sax.initialized = XML_SAX2_MAGIC;
-        sax.startDocument = xmlSAX2StartDocument;
+        sax.startDocument = startDocument;
         sax.endDocument = xmlSAX2EndDocument;
         sax.internalSubset = xmlSAX2InternalSubset;
         sax.entityDecl = xmlSAX2EntityDecl;
@@ -220,7 +233,8 @@ bool GuardedXmlParse::run(const Data& bytes, int options) {
     options |= XML_PARSE_NONET | XML_PARSE_NOERROR | XML_PARSE_NOWARNING | XML_PARSE_COMPACT;
     m_ranges = bytes.ranges();
     xmlDoc* document = nullptr;
-    if (m_ranges.size() == 1 && bytes.size() <= kSmallDocument) {
+    m_isWhole = m_ranges.size() == 1 && bytes.size() <= kSmallDocument;
+    if (m_isWhole) {
         const auto* text = reinterpret_cast<const char*>(m_ranges[0].data());
         document = xmlCtxtReadMemory(parser(), text, static_cast<int>(bytes.size()), nullptr,
                                      nullptr, options);
@@ -288,10 +302,12 @@ std::span<const xmlChar*> GuardedXmlParse::replacingReferences(
     for (std::size_t slot = 0; slot < attributes.size(); slot += 5) {
         const xmlChar* begin = attributes[slot + 3];
         const xmlChar* end = attributes[slot + 4];
-        if (std::find(begin, end, '&') == end)
+        if (!holdsReference(begin, end))
             continue;
-        if (m_attributes.empty())
+        if (m_attributes.empty()) {
             m_attributes.assign(attributes.begin(), attributes.end());
+            m_values.reserve(attributes.size() / 5);  // so that none moves
+        }
         const std::string& value = m_values.emplace_back(replacingReferences(begin, end));
         if (m_stopped)
             return {};  // the parser has freed the values

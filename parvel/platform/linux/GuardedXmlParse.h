@@ -1,7 +1,6 @@
 #pragma once
 
 #include <cstddef>
-#include <deque>
 #include <exception>
 #include <memory>
 #include <span>
@@ -98,7 +97,8 @@ private:
     std::size_t m_parameterEntityBytes = 0;
     /// Of the tag being reported, where a value of it held references.
     std::vector<const xmlChar*> m_attributes;
-    std::deque<std::string> m_values;
+    std::vector<std::string> m_values;
+    bool m_isWhole = false;  ///< whether the parser gets the document in one piece
     bool m_stopped = false;
     std::exception_ptr m_thrown;
 };

@@ -11,7 +11,7 @@ namespace parvel {
 namespace {
 
 constexpr std::size_t kMaximumSteps = 16;
-constexpr std::size_t kMaximumPredicates = 4;
+constexpr std::size_t kUsualSteps = 4;
 
 bool isNameStart(char c) {
     return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || c == '_';
@@ -46,11 +46,12 @@ public:
     std::optional<LocationPath> read() {
         LocationPath path;
         path.m_isAbsolute = m_scanner.take("/");
+        path.m_steps.reserve(kUsualSteps);
         do {
             std::optional<Step> step = readStep();
             if (!step || path.m_steps.size() == kMaximumSteps)
                 return std::nullopt;
-            path.m_steps.push_back(std::move(*step));
+            path.m_steps.push_back(*step);
         } while (!path.m_steps.back().isAttribute && m_scanner.take("/"));
         if (!m_scanner.atEnd())
             return std::nullopt;
@@ -72,7 +73,7 @@ private:
                 return std::nullopt;
         }
         while (m_scanner.take("[")) {
-            if (step.isAttribute || !readPredicate(step.predicates))
+            if (step.isAttribute || !readPredicate(step))
                 return std::nullopt;
         }
         return step;
@@ -84,8 +85,10 @@ private:
         return binding == m_bindings.rend() ? std::string_view() : binding->second;
     }
 
-    bool readPredicate(std::vector<Predicate>& predicates) {
-        Predicate predicate;
+    bool readPredicate(Step& step) {
+        if (step.predicateCount == maximumPredicates)
+            return false;
+        Predicate& predicate = step.predicates[step.predicateCount++];
         if (m_scanner.take("@")) {
             predicate.attribute = m_scanner.takeName();
             if (!isPlainName(predicate.attribute) || !m_scanner.take("=") ||
@@ -98,8 +101,7 @@ private:
             if (error != std::errc() || predicate.position == 0)
                 return false;
         }
-        predicates.push_back(predicate);
-        return predicates.size() <= kMaximumPredicates && m_scanner.take("]");
+        return m_scanner.take("]");
     }
 
     XPathScanner m_scanner;
@@ -119,7 +121,7 @@ public:
         const std::vector<XmlElementTree::Element>& elements = m_tree.elements();
         std::uint32_t child = parent ? m_tree.indexOf(*parent) + 1 : 0;
         const auto end = parent ? parent->end : static_cast<std::uint32_t>(elements.size());
-        std::array<std::uint32_t, kMaximumPredicates> counts{};
+        std::array<std::uint32_t, maximumPredicates> counts{};
         for (; child < end; child = elements[child].end) {
             const XmlElementTree::Element& element = elements[child];
             if (!hasName(element, step) || !passes(element, step, counts))
@@ -142,7 +144,7 @@ private:
     /// A position counts the elements that passed the predicates before it.
     bool passes(const XmlElementTree::Element& element, const Step& step,
                 std::span<std::uint32_t> counts) const {
-        for (std::size_t index = 0; index < step.predicates.size(); ++index) {
+        for (std::size_t index = 0; index < step.predicateCount; ++index) {
             const Predicate& predicate = step.predicates[index];
             if (predicate.position != 0) {
                 if (++counts[index] != predicate.position)

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <array>
+#include <cstddef>
 #include <cstdint>
 #include <optional>
 #include <string_view>
@@ -27,6 +29,7 @@ public:
                                       const XmlElementTree::Element* context) const;
 
 private:
+    static constexpr std::size_t maximumPredicates = 4;
     struct Predicate {
         std::uint32_t position = 0;  ///< from 1; 0 for a test of an attribute
         std::string_view attribute;
@@ -36,7 +39,8 @@ private:
         bool isAttribute = false;
         std::string_view namespaceName;
         std::string_view name;
-        std::vector<Predicate> predicates;
+        std::array<Predicate, maximumPredicates> predicates;
+        std::size_t predicateCount = 0;
     };
     class Search;
     class Reader;

@@ -59,6 +59,7 @@ bool searchesText(std::string_view expression) {
 
 XPathText splitPrologue(std::string_view text) {
     XPathText result;
+    result.bindings.reserve(2);
     XPathScanner scanner(text);
     std::string_view rest = text;
     while (scanner.take("declare namespace ")) {

@@ -1,7 +1,6 @@
 #pragma once
 
 #include <cstddef>
-#include <string>
 #include <string_view>
 #include <utility>
 #include <vector>
@@ -13,7 +12,7 @@ namespace parvel {
 struct XPathText {
     std::string_view prologue;
     std::vector<std::pair<std::string_view, std::string_view>> bindings;  ///< prefix and name
-    std::string expression;
+    std::string_view expression;
 };
 
 [[nodiscard]] XPathText splitPrologue(std::string_view text);

@@ -1,6 +1,6 @@
 #pragma once
 
-#include <algorithm>
+#include <cstddef>
 #include <string_view>
 
 namespace parvel {
@@ -23,8 +23,12 @@ public:
         return true;
     }
     /// Any characters of names, the colon of a qualified one too.
-    std::string_view takeName() { return takeWhile(isNameCharacter); }
-    std::string_view takeNumber() { return takeWhile(isDigit); }
+    std::string_view takeName() {
+        return takeWhile([](char c) { return isNameCharacter(c); });
+    }
+    std::string_view takeNumber() {
+        return takeWhile([](char c) { return isDigit(c); });
+    }
     /// A quoted text; its content, or nothing taken.
     bool takeLiteral(std::string_view& content) {
         skipSpace();
@@ -49,10 +53,13 @@ private:
         while (!m_rest.empty() && isSpace(m_rest[0]))
             m_rest.remove_prefix(1);
     }
-    std::string_view takeWhile(bool (*accepts)(char)) {
+    template <class Accepts>
+    std::string_view takeWhile(Accepts accepts) {
         skipSpace();
-        const auto end = std::find_if_not(m_rest.begin(), m_rest.end(), accepts);
-        const std::string_view taken(m_rest.begin(), end);
+        std::size_t length = 0;
+        while (length < m_rest.size() && accepts(m_rest[length]))
+            ++length;
+        const std::string_view taken = m_rest.substr(0, length);
         m_rest.remove_prefix(taken.size());
         return taken;
     }

@@ -38,7 +38,7 @@ XPathTree::Result XPathTree::evaluate(const xmlNode* context, const XPathText& t
     Object result;
     if (prepare(text)) {
         m_context->node = mutableNode(context);
-        result.reset(xmlXPathEval(xmlText(text.expression), m_context.get()));
+        result.reset(xmlXPathEval(xmlText(std::string(text.expression)), m_context.get()));
     }
     if (!result || result->type != XPATH_NODESET)
         return {};

@@ -7,6 +7,9 @@
 namespace parvel {
 namespace {
 
+constexpr std::size_t kLargestForeseen = 16 << 10;
+constexpr std::size_t kUsualDepth = 16;
+
 template <class T>
 const T* itemOf(const std::vector<T>& items, const void* pointer) {
     const T* item = static_cast<const T*>(pointer);
@@ -19,7 +22,15 @@ const T* itemOf(const std::vector<T>& items, const void* pointer) {
 
 class XmlElementTree::Parse : private GuardedXmlParse {
 public:
-    explicit Parse(const Data& bytes) : m_bytes(bytes), m_budget(bytes.size()) {}
+    explicit Parse(const Data& bytes) : m_bytes(bytes), m_budget(bytes.size()) {
+        // About what a package document holds, so that the lists of most need not grow.
+        const std::size_t size = std::min(bytes.size(), kLargestForeseen);
+        m_tree.m_elements.reserve(size / 64);
+        m_tree.m_attributes.reserve(size / 32);
+        m_tree.m_values.reserve(size / 2);
+        m_tree.m_text.reserve(size / 2);
+        m_open.reserve(kUsualDepth);
+    }
 
     std::optional<XmlElementTree> run() {
         if (!GuardedXmlParse::run(m_bytes, 0))

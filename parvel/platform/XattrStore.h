@@ -1,7 +1,6 @@
 #pragma once
 
 #include <cstddef>
-#include <optional>
 #include <span>
 #include <string>
 #include <vector>
@@ -15,9 +14,9 @@ class XattrStore {
 public:
     virtual ~XattrStore() = default;
 
-    /// The name under which an attribute is kept with its file when that is copied or synchronised;
-    /// none, with errno set, where it can't be made.
-    [[nodiscard]] virtual std::optional<std::string> decorated(const std::string& name) = 0;
+    /// Makes the name into that under which an attribute is kept with its file when that is copied
+    /// or synchronised; false, with errno set, where that can't be made.
+    [[nodiscard]] virtual bool decorate(std::string& name) = 0;
 
     /// The value's size in bytes. ENODATA when there is no such attribute.
     [[nodiscard]] virtual int size(const std::string& path, const std::string& name,
@@ -31,8 +30,8 @@ public:
     /// ENODATA when there is no such attribute.
     [[nodiscard]] virtual int remove(const std::string& path, const std::string& name) = 0;
     /// The names that stand there, as the other operations take them; in one or two calls to the
-    /// host. No read permission is needed where there are any, so one who wants to know whether a
-    /// missing name could have been read asks for it.
+    /// host. No read permission is needed, and where no attributes are kept the list is empty, so
+    /// one who wants to know whether a missing name could have been read asks for it.
     [[nodiscard]] virtual int list(const std::string& path, std::vector<std::string>& names) = 0;
 
     static XattrStore& host();

@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <array>
+#include <cerrno>
+#include <cstddef>
 #include <string>
 #include <vector>
 
@@ -9,6 +11,7 @@
 #include "parvel/platform/CloudStore.h"
 #include "parvel/platform/Service.h"
 #include "parvel/platform/XattrStore.h"
+#include "parvel/xattr/AttributeText.h"
 #include "parvel/xattr/ExtendedAttributes.h"
 #include "parvel/xattr/PNMetadataXattr.h"
 
@@ -24,25 +27,45 @@ constexpr std::array readNames = {
     PNMetadataXattrRating,
 };
 
-/// Which attributes stand on a file, so that those which do not need not be asked for one by one.
-class StandingNames {
+/// Reads the attributes of one file in few calls to the host: those that the file's list does not
+/// name need not be asked for, and a value of the usual length is read without asking for its size.
+class AttributeReader {
 public:
-    explicit StandingNames(const URL& url) : m_store(Service<XattrStore>::current()) {
-        m_isKnown = url.isFileURL() && m_store.list(url.path(), m_names) == 0;
+    explicit AttributeReader(const URL& carrier)
+        : m_carrier(carrier), m_store(Service<XattrStore>::current()) {
+        m_isListed = carrier.isFileURL() && m_store.list(carrier.path(), m_listed) == 0;
     }
 
     /// Whether asking for the attribute could give anything but its absence.
-    [[nodiscard]] bool mayHold(std::string_view name) const {
-        if (!m_isKnown)
-            return true;
-        const std::optional<std::string> decorated = m_store.decorated(std::string(name));
-        return !decorated || std::find(m_names.begin(), m_names.end(), *decorated) != m_names.end();
+    [[nodiscard]] bool mayHold(std::string_view name) {
+        m_name = name;
+        return !m_isListed || !m_store.decorate(m_name) ||
+               std::find(m_listed.begin(), m_listed.end(), m_name) != m_listed.end();
+    }
+
+    /// False when the attribute can't be read; no text when there is none.
+    [[nodiscard]] bool read(std::string_view name, std::optional<String>& text) {
+        std::array<std::byte, usualLength> value;
+        std::size_t length = 0;
+        m_name = name;
+        const int errnoValue = m_carrier.isFileURL() && m_store.decorate(m_name)
+                                   ? m_store.get(m_carrier.path(), m_name, value, length)
+                                   : EINVAL;
+        if (errnoValue != 0 && errnoValue != ENODATA)
+            return pvamfm_extendedAttributeString_forKey_error(m_carrier, &text, name);
+        if (errnoValue == 0)
+            text = attributeText({reinterpret_cast<const char*>(value.data()), length});
+        return true;
     }
 
 private:
+    static constexpr std::size_t usualLength = 512;
+
+    const URL& m_carrier;
     XattrStore& m_store;
-    std::vector<std::string> m_names;
-    bool m_isKnown;
+    std::vector<std::string> m_listed;
+    bool m_isListed;
+    std::string m_name;  ///< as the store takes it
 };
 
 }  // namespace
@@ -53,14 +76,15 @@ std::optional<Dictionary> attributeDictionaryAtURL(const URL& url) {
         PVParvelLog().info("xAttrs: Using promised URL");
     const URL& carrier = placeholder ? *placeholder : url;
 
-    const StandingNames standing(carrier);
-    // The first name is asked for in any case: the list can be had of a file that can't be read.
+    AttributeReader reader(carrier);
+    // The first name is asked for in any case: the list can be had of a file that can't be read,
+    // and an empty one where no attributes are kept.
     Dictionary attributes;
     for (const std::string_view name : readNames) {
-        if (name != readNames.front() && !standing.mayHold(name))
+        if (name != readNames.front() && !reader.mayHold(name))
             continue;
         std::optional<String> text;
-        if (!pvamfm_extendedAttributeString_forKey_error(carrier, &text, name))
+        if (!reader.read(name, text))
             return std::nullopt;
         if (text)
             attributes.set(name, std::move(*text));

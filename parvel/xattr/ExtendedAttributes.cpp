@@ -7,8 +7,8 @@
 #include <vector>
 
 #include "parvel/platform/Service.h"
-#include "parvel/platform/TextRules.h"
 #include "parvel/platform/XattrStore.h"
+#include "parvel/xattr/AttributeText.h"
 
 namespace parvel {
 
@@ -32,13 +32,13 @@ bool pvamfm_setExtendedAttributeData_forKey_error(const URL& url, const Data* da
         return errnoValue == 0 || fail(error, makePOSIXError(errnoValue, url));
     }
 
-    const std::optional<std::string> name = store.decorated(std::string(key));
-    if (!name)
+    std::string name(key);
+    if (!store.decorate(name))
         return fail(error, makePOSIXError(errno, url));
 
     std::vector<std::uint8_t> storage;
     const int errnoValue =
-        store.set(fileSystemPath(url), *name, std::as_bytes(data->contiguous(storage)));
+        store.set(fileSystemPath(url), name, std::as_bytes(data->contiguous(storage)));
     return errnoValue == 0 || fail(error, makePOSIXError(errnoValue, url));
 }
 
@@ -54,13 +54,13 @@ bool pvamfm_setExtendedAttributeString_forKey_error(const URL& url,
 bool pvamfm_extendedAttributeData_forKey_error(const URL& url, std::optional<Data>* data,
                                                std::string_view key, ErrorOut error) {
     XattrStore& store = Service<XattrStore>::current();
-    const std::optional<std::string> name = store.decorated(std::string(key));
-    if (!name)
+    std::string name(key);
+    if (!store.decorate(name))
         return fail(error, makePOSIXError(errno, url));
 
     const std::string path = fileSystemPath(url);
     std::size_t size = 0;
-    int errnoValue = store.size(path, *name, size);
+    int errnoValue = store.size(path, name, size);
     if (errnoValue == ENODATA)
         return true;
     // Deliberate: the one error without the URL.
@@ -75,7 +75,7 @@ bool pvamfm_extendedAttributeData_forKey_error(const URL& url, std::optional<Dat
     auto buffer = std::make_unique<std::uint8_t[]>(size);
     std::size_t length = 0;
     errnoValue =
-        store.get(path, *name, std::as_writable_bytes(std::span(buffer.get(), size)), length);
+        store.get(path, name, std::as_writable_bytes(std::span(buffer.get(), size)), length);
     if (errnoValue == ENODATA)
         return true;
     if (errnoValue != 0)
@@ -96,11 +96,7 @@ bool pvamfm_extendedAttributeString_forKey_error(const URL& url, std::optional<S
         return isRead;
 
     std::vector<std::uint8_t> storage;
-    const std::string_view text = data->text(storage);
-    if (isValidUTF8(text))
-        string->emplace(text.substr(0, text.find('\0')));
-    else
-        string->reset();
+    *string = attributeText(data->text(storage));
     return true;
 }
 

@@ -333,6 +333,9 @@ TEST_F(InspectorOverAttributes, AnEmptyIdentityInTheAttributesIsNone) {
 class UnreadableXattrStore : public ForwardingXattrStore {
 public:
     int size(const std::string&, const std::string&, std::size_t&) override { return EIO; }
+    int get(const std::string&, const std::string&, std::span<std::byte>, std::size_t&) override {
+        return EIO;
+    }
     int list(const std::string&, std::vector<std::string>&) override { return EIO; }
 };
 

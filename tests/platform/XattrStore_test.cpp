@@ -140,24 +140,27 @@ TEST_F(XattrStoreTest, ListsMoreNamesThanOneCallTakes) {
     EXPECT_THAT(m_names, SizeIs(20));
 }
 
-TEST_F(XattrStoreTest, AnEmptyListOfAnUnreadableFileSystemIsAFailure) {
+TEST_F(XattrStoreTest, ListsNothingWhereNoAttributesAreKept) {
     std::size_t size = 0;
-    const int errnoValue = m_store.size("/proc/self/status", "title", size);
-    ASSERT_NE(errnoValue, 0);
-    ASSERT_NE(errnoValue, ENODATA);
+    if (m_store.size("/proc/self/status", "title", size) != ENOTSUP)
+        GTEST_SKIP() << "/proc answers otherwise here";
 
-    EXPECT_EQ(m_store.list("/proc/self/status", m_names), errnoValue);
+    EXPECT_EQ(m_store.list("/proc/self/status", m_names), 0);
+    EXPECT_TRUE(m_names.empty());
 }
 
 TEST_F(XattrStoreTest, DecorationKeepsTheName) {
-    EXPECT_EQ(m_store.decorated("com.kestrel.Folium.title"), "com.kestrel.Folium.title");
+    std::string name = "com.kestrel.Folium.title";
+
+    EXPECT_TRUE(m_store.decorate(name));
+    EXPECT_EQ(name, "com.kestrel.Folium.title");
 }
 
 TEST_F(XattrStoreTest, ANameWithANULCannotBeMade) {
-    const std::string name("a\0b", 3);
+    std::string name("a\0b", 3);
 
     errno = 0;
-    EXPECT_EQ(m_store.decorated(name), std::nullopt);
+    EXPECT_FALSE(m_store.decorate(name));
     EXPECT_EQ(errno, EINVAL);
     EXPECT_EQ(set(name, "x"), EINVAL);
     EXPECT_EQ(m_store.remove(m_path, name), EINVAL);

@@ -9,9 +9,7 @@ namespace parvel::testing {
 /// it lives.
 class ForwardingXattrStore : public XattrStore {
 public:
-    std::optional<std::string> decorated(const std::string& name) override {
-        return host().decorated(name);
-    }
+    bool decorate(std::string& name) override { return host().decorate(name); }
     int size(const std::string& path, const std::string& name, std::size_t& size) override {
         return host().size(path, name, size);
     }

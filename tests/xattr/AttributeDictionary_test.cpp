@@ -24,8 +24,12 @@ constexpr std::string_view dictionaryNames[] = {
 class WatchedStore : public ForwardingXattrStore {
 public:
     int size(const std::string& path, const std::string& name, std::size_t& size) override {
-        m_asked.push_back(name);
         return name == m_refused ? EIO : ForwardingXattrStore::size(path, name, size);
+    }
+    int get(const std::string& path, const std::string& name, std::span<std::byte> buffer,
+            std::size_t& length) override {
+        m_asked.push_back(name);
+        return name == m_refused ? EIO : ForwardingXattrStore::get(path, name, buffer, length);
     }
     int list(const std::string& path, std::vector<std::string>& names) override {
         return m_listFails ? EIO : ForwardingXattrStore::list(path, names);
@@ -67,6 +71,24 @@ TEST_F(AttributeDictionary, KeepsAnEmptyValue) {
     setStored(url, PNMetadataXattrGenre, "");
 
     EXPECT_EQ(attributeDictionaryAtURL(url), (Dictionary{{String(PNMetadataXattrGenre), ""}}));
+}
+
+TEST_F(AttributeDictionary, HoldsAValueOfAnyLength) {
+    const URL url = file();
+    for (const std::size_t length : {511, 512, 513, 2000}) {
+        const std::string value(length, 'x');
+        setStored(url, PNMetadataXattrComments, value);
+
+        EXPECT_EQ(attributeDictionaryAtURL(url),
+                  (Dictionary{{String(PNMetadataXattrComments), value}}));
+    }
+}
+
+TEST_F(AttributeDictionary, EndsAValueAtItsFirstNUL) {
+    const URL url = file();
+    setStored(url, PNMetadataXattrGenre, std::string_view("Novel\0la", 8));
+
+    EXPECT_EQ(attributeDictionaryAtURL(url), (Dictionary{{String(PNMetadataXattrGenre), "Novel"}}));
 }
 
 TEST_F(AttributeDictionary, LeavesOutAValueThatIsNoUTF8) {

@@ -291,7 +291,10 @@ TEST_F(ExtendedAttributes, AFailedReadAfterTheSizeFailsEvenWithoutAPlaceForTheBy
 /// A host that keeps an attribute under another name so that it travels with its file.
 class DecoratingStore : public ForwardingXattrStore {
 public:
-    std::optional<std::string> decorated(const std::string& name) override { return name + "#S"; }
+    bool decorate(std::string& name) override {
+        name += "#S";
+        return true;
+    }
 };
 
 TEST_F(ExtendedAttributes, ReadsAndWritesUseTheDecoratedNameAndRemovalThePlainOne) {
@@ -313,9 +316,9 @@ TEST_F(ExtendedAttributes, ReadsAndWritesUseTheDecoratedNameAndRemovalThePlainOn
 /// A host that can't make the decorated name.
 class UndecoratingStore : public ForwardingXattrStore {
 public:
-    std::optional<std::string> decorated(const std::string&) override {
+    bool decorate(std::string&) override {
         errno = ENOMEM;
-        return std::nullopt;
+        return false;
     }
 };
 

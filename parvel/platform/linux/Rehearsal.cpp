@@ -49,9 +49,7 @@ public:
     explicit RehearsedAttributes(std::shared_ptr<RehearsedDisk> disk)
         : m_disk(std::move(disk)), m_store(Service<XattrStore>::current()) {}
 
-    std::optional<std::string> decorated(const std::string& name) override {
-        return m_store.decorated(name);
-    }
+    bool decorate(std::string& name) override { return m_store.decorate(name); }
 
     int size(const std::string& path, const std::string& name, std::size_t& size) override {
         const auto attributes = m_disk->attributesAt(path);

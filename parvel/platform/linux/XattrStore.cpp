@@ -21,6 +21,9 @@ constexpr std::size_t longestList = 65536;
 /// A list of this length takes one call: our own names and a few others fit.
 constexpr std::size_t usualList = 1024;
 
+/// Our own names and a few others.
+constexpr std::size_t usualNames = 16;
+
 /// A name as the kernel takes it.
 class HostName {
 public:
@@ -49,6 +52,7 @@ private:
 /// Cuts the kernel's list at its NULs and keeps the names of our namespace.
 std::vector<std::string> userNames(std::string_view list) {
     std::vector<std::string> names;
+    names.reserve(usualNames);
     while (!list.empty()) {
         const std::string_view name = list.substr(0, list.find('\0'));
         if (name.starts_with(userPrefix))
@@ -60,11 +64,11 @@ std::vector<std::string> userNames(std::string_view list) {
 
 class HostXattrStore final : public XattrStore {
 public:
-    std::optional<std::string> decorated(const std::string& name) override {
+    bool decorate(std::string& name) override {
         if (name.find('\0') == std::string::npos)
-            return name;
+            return true;
         errno = EINVAL;
-        return std::nullopt;
+        return false;
     }
 
     // The size query passes size 0: any other size with no buffer is EFAULT here.
@@ -108,20 +112,10 @@ public:
             if (length >= 0)
                 names = userNames({longest.data(), static_cast<std::size_t>(length)});
         }
-        if (length < 0)
-            return errno;
-        return names.empty() ? whyEmpty(path) : 0;
+        return length < 0 ? errno : 0;
     }
 
 private:
-    /// An empty list comes also from a file system that keeps no attributes, and for a file that
-    /// can't be read, where every other operation fails.
-    int whyEmpty(const std::string& path) {
-        std::size_t ignored = 0;
-        const int errnoValue = size(path, "parvel", ignored);
-        return errnoValue == ENODATA ? 0 : errnoValue;
-    }
-
     static int read(const std::string& path, const std::string& name, void* buffer,
                     std::size_t capacity, std::size_t& length) {
         const HostName hostName(name);

@@ -36,8 +36,7 @@ std::optional<String> lastComponentOf(const AssetPtr& asset) {
 }
 
 std::optional<String> assetIDFileName(const AssetPtr& asset) {
-    const auto url = urlOf(asset);
-    if (!url)
+    if (!asset)
         return std::nullopt;
     std::optional<String> stem;
     if (int64Reading(asset->storeID()) >= 1)
@@ -46,7 +45,8 @@ std::optional<String> assetIDFileName(const AssetPtr& asset) {
         stem = *generated;
     if (!stem || !isOneComponent(*stem))
         return std::nullopt;
-    return withExtension(*stem, url->pathExtension());
+    const auto url = asset->url();
+    return withExtension(*stem, url ? url->pathExtension() : std::string_view());
 }
 
 std::optional<String> sanitizedFileName(const AssetPtr& asset) {

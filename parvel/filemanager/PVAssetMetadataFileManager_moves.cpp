@@ -63,17 +63,18 @@ AssetPtr PVAssetMetadataFileManager::moveAsset_toURL_replaceExisting_error(
     if (!target)
         return nullptr;
     if (!source)
-        return fail(error, makeMissingURLError());
+        assign(error, makeMissingURLError());
 
     bool isMoved = false;
     if (replaceExisting) {
-        isMoved = m_fileManager->replaceItem(*target, *source, ReplaceOptions::NewMetadataOnly,
-                                             /*resulting=*/nullptr, error);
+        isMoved =
+            source && m_fileManager->replaceItem(*target, *source, ReplaceOptions::NewMetadataOnly,
+                                                 /*resulting=*/nullptr, error);
         PVParvelLog().info(
             "Rename: Replacing possibly existing file. source: %@ target: %@ error: %@", source,
             target, valueOf(error));
     } else {
-        isMoved = m_fileManager->moveItem(*source, *target, error);
+        isMoved = source && m_fileManager->moveItem(*source, *target, error);
         PVParvelLog().info("Rename: Move without replacement. source: %@ target: %@ error: %@",
                            source, target, valueOf(error));
     }
@@ -142,9 +143,13 @@ std::optional<String> PVAssetMetadataFileManager::_sanitizedFilenameForAsset(
 
 AssetPtr PVAssetMetadataFileManager::updateWithKeyAttributesAssetMetadata_error(
     const AssetPtr& asset, ErrorOut error) {
+    if (!asset) {
+        assign(error, std::nullopt);
+        return nullptr;
+    }
     AssetPtr stamped = asset;
     // An insertion date is never absent, so the size alone decides.
-    if (asset && !asset->_hasAllocatedSize()) {
+    if (!asset->_hasAllocatedSize()) {
         std::optional<Error> sizeError;
         const auto url = asset->url();
         const std::uint64_t size =
@@ -155,8 +160,6 @@ AssetPtr PVAssetMetadataFileManager::updateWithKeyAttributesAssetMetadata_error(
         });
         assign(error, sizeError);
     }
-    if (!stamped)
-        return nullptr;
 
     std::optional<Error> attributeError;
     (void)setExtendedAttributesForAsset_error(stamped, &attributeError);

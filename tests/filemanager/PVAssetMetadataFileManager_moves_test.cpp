@@ -1,7 +1,10 @@
 #include <gtest/gtest.h>
 
-#include "tests/support/ManagedFolder.h"
+#include "tests/support/MovedAssets.h"
 #include "tests/support/RecordedLog.h"
+#include "tests/support/RecordingFileSystem.h"
+#include "tests/support/Records.h"
+#include "tests/support/RefusingServices.h"
 
 namespace parvel::testing {
 namespace {
@@ -12,26 +15,20 @@ std::string text(const URL& url) {
     return url.absoluteString();
 }
 
-struct MoveOptions {
-    bool replace = false;
-    bool renameIfCollision = false;
-    bool useAssetIDFileName = false;
-};
-
-class Moves : public ManagedFolder {
+class MovingAssets : public MovedAssets {
 protected:
-    AssetPtr moveTo(const AssetPtr& moved, const std::optional<URL>& target, bool replace = false) {
-        return m_manager->moveAsset_toURL_replaceExisting_error(moved, target, replace, &m_error);
+    std::shared_ptr<RecordingFileSystem> recordCalls() {
+        auto service = std::make_shared<RecordingFileSystem>();
+        m_manager->setFileManager(service);
+        return service;
     }
-    AssetPtr moveInto(const AssetPtr& moved, const URL& directory, MoveOptions options = {}) {
-        return m_manager
-            ->moveAsset_toDirectory_replaceExisting_renameIfCollision_useAssetIDFileName_error(
-                moved, directory, options.replace, options.renameIfCollision,
-                options.useAssetIDFileName, &m_error);
+    void refuseEverything() {
+        m_manager->setFileManager(
+            std::make_shared<RefusingFileSystem>([](auto, const URL&) { return true; }));
     }
 };
 
-TEST_F(Moves, AnAssetMovedToItsOwnPlaceIsTheSameRecordWithoutALogLine) {
+TEST_F(MovingAssets, AnAssetMovedToItsOwnPlaceIsTheSameRecordWithoutALogLine) {
     const auto book = asset("a.epub");
     RecordedLog log;
 
@@ -41,7 +38,7 @@ TEST_F(Moves, AnAssetMovedToItsOwnPlaceIsTheSameRecordWithoutALogLine) {
     EXPECT_EQ(names(), Names{"a.epub"});
 }
 
-TEST_F(Moves, NoTargetGivesNoneAndLeavesTheError) {
+TEST_F(MovingAssets, NoTargetGivesNoneAndLeavesTheError) {
     m_error = makeNoIdentityError();
 
     EXPECT_FALSE(moveTo(asset("a.epub"), std::nullopt));
@@ -50,13 +47,68 @@ TEST_F(Moves, NoTargetGivesNoneAndLeavesTheError) {
     EXPECT_EQ(names(), Names{"a.epub"});
 }
 
-TEST_F(Moves, ARecordWithoutURLNamesNothingToMove) {
-    EXPECT_FALSE(moveTo(nullptr, m_folder.url("a.epub")));
+TEST_F(MovingAssets, AnAssetIsNotReplacedByItself) {
+    const auto service = recordCalls();
+    const auto book = asset("a.epub");
 
-    EXPECT_EQ(m_error, makeMissingURLError());
+    EXPECT_EQ(moveTo(book, m_folder.url("a.epub"), /*replace=*/true), book);
+
+    EXPECT_EQ(service->calls, Lines{});
 }
 
-TEST_F(Moves, AMovedAssetsRecordHasTheNewURLAndTheOldOneItsOwn) {
+TEST_F(MovingAssets, WhatNamesNoItemFailsWithTheSameLogLines) {
+    const URL target = m_folder.url("a.epub");
+    const std::string end =
+        " source: (null) target: " + text(target) + " error: " + logText(makeMissingURLError());
+    for (const AssetPtr& moved : {AssetPtr(), AssetPtr(emptyRecord())}) {
+        m_error.reset();
+        RecordedLog log;
+
+        EXPECT_FALSE(moveTo(moved, target));
+        EXPECT_FALSE(moveTo(moved, target, /*replace=*/true));
+
+        EXPECT_EQ(m_error, makeMissingURLError());
+        EXPECT_EQ(log.lines(), (Lines{"default Rename: Move without replacement." + end,
+                                      "default Rename: Replacing possibly existing file." + end}));
+    }
+}
+
+TEST_F(MovingAssets, TheGivenServiceMakesTheMove) {
+    const auto service = recordCalls();
+
+    EXPECT_TRUE(moveTo(asset("a.epub"), m_folder.url("b.epub")));
+
+    EXPECT_EQ(service->calls,
+              Lines{"move " + (m_folder / "a.epub") + " to " + (m_folder / "b.epub")});
+}
+
+TEST_F(MovingAssets, AReplacementKeepsTheNewItemsMetadataAlone) {
+    const auto service = recordCalls();
+    const auto book = asset("a.epub");
+    m_folder.write("b.epub", "2");
+
+    EXPECT_TRUE(moveTo(book, m_folder.url("b.epub"), /*replace=*/true));
+
+    EXPECT_EQ(service->calls, Lines{"replace " + (m_folder / "b.epub") + " by " +
+                                    (m_folder / "a.epub") + " options 1"});
+}
+
+TEST_F(MovingAssets, ASuccessLeavesTheErrorAndTheLogPrintsWhatStandsThere) {
+    m_error = makeNoIdentityError();
+    const auto book = asset("a.epub");
+    const std::string end = " error: " + logText(makeNoIdentityError());
+    RecordedLog log;
+
+    const AssetPtr moved = moveTo(book, m_folder.url("b.epub"));
+    EXPECT_TRUE(moveTo(moved, m_folder.url("c.epub"), /*replace=*/true));
+
+    EXPECT_EQ(m_error, makeNoIdentityError());
+    ASSERT_EQ(log.lines().size(), 2U);
+    EXPECT_TRUE(log.lines()[0].ends_with(end));
+    EXPECT_TRUE(log.lines()[1].ends_with(end));
+}
+
+TEST_F(MovingAssets, AMovedAssetsRecordHasTheNewURLAndTheOldOneItsOwn) {
     const auto book = asset("a.epub");
     RecordedLog log;
 
@@ -71,7 +123,7 @@ TEST_F(Moves, AMovedAssetsRecordHasTheNewURLAndTheOldOneItsOwn) {
                                  " target: " + text(m_folder.url("b.epub")) + " error: (null)"});
 }
 
-TEST_F(Moves, AFailedMoveGivesThePlatformsErrorAndTheSameLogLine) {
+TEST_F(MovingAssets, AFailedMoveGivesThePlatformsErrorAndTheSameLogLine) {
     const auto book = asset("a.epub", "1");
     m_folder.write("b.epub", "2");
     RecordedLog log;
@@ -87,19 +139,37 @@ TEST_F(Moves, AFailedMoveGivesThePlatformsErrorAndTheSameLogLine) {
               " target: " + text(m_folder.url("b.epub")) + " error: " + logText(*m_error)});
 }
 
-TEST_F(Moves, WithoutAPlaceForTheErrorTheLogPrintsNone) {
-    const auto book = asset("a.epub");
+TEST_F(MovingAssets, AFailedReplacementGivesThePlatformsErrorAndTheSameLogLine) {
+    const auto book = asset("a.epub", "1");
     m_folder.write("b.epub", "2");
+    refuseEverything();
     RecordedLog log;
 
-    EXPECT_FALSE(m_manager->moveAsset_toURL_replaceExisting_error(
-        book, m_folder.url("b.epub"), /*replaceExisting=*/false, nullptr));
+    EXPECT_FALSE(moveTo(book, m_folder.url("b.epub"), /*replace=*/true));
 
-    ASSERT_EQ(log.lines().size(), 1U);
-    EXPECT_TRUE(log.lines()[0].ends_with(" error: (null)"));
+    EXPECT_EQ(m_error, makePOSIXError(EIO, m_folder.url("a.epub")));
+    EXPECT_EQ(m_folder.read("a.epub"), "1");
+    EXPECT_EQ(m_folder.read("b.epub"), "2");
+    EXPECT_EQ(log.lines(), Lines{"default Rename: Replacing possibly existing file. source: " +
+                                 text(m_folder.url("a.epub")) + " target: " +
+                                 text(m_folder.url("b.epub")) + " error: " + logText(*m_error)});
 }
 
-TEST_F(Moves, AReplacingMovePutsTheAssetInTheExistingOnesPlace) {
+TEST_F(MovingAssets, WithoutAPlaceForTheErrorTheLogPrintsNone) {
+    const auto book = asset("a.epub");
+    refuseEverything();
+    for (const bool replace : {false, true}) {
+        RecordedLog log;
+
+        EXPECT_FALSE(m_manager->moveAsset_toURL_replaceExisting_error(book, m_folder.url("b.epub"),
+                                                                      replace, nullptr));
+
+        ASSERT_EQ(log.lines().size(), 1U);
+        EXPECT_TRUE(log.lines()[0].ends_with(" error: (null)"));
+    }
+}
+
+TEST_F(MovingAssets, AReplacingMovePutsTheAssetInTheExistingOnesPlace) {
     const auto book = asset("a.epub", "1");
     m_folder.write("b.epub", "2");
     RecordedLog log;
@@ -114,13 +184,13 @@ TEST_F(Moves, AReplacingMovePutsTheAssetInTheExistingOnesPlace) {
                                  " target: " + text(m_folder.url("b.epub")) + " error: (null)"});
 }
 
-TEST_F(Moves, AReplacingMoveToAFreePlaceSucceeds) {
+TEST_F(MovingAssets, AReplacingMoveToAFreePlaceSucceeds) {
     EXPECT_TRUE(moveTo(asset("a.epub"), m_folder.url("b.epub"), /*replace=*/true));
 
     EXPECT_EQ(names(), Names{"b.epub"});
 }
 
-TEST_F(Moves, ABookMovesIntoADirectoryUnderItsOwnName) {
+TEST_F(MovingAssets, ABookMovesIntoADirectoryUnderItsOwnName) {
     const URL library = makeFolder("library");
     const auto book = asset("a.epub");
     RecordedLog log;
@@ -135,7 +205,7 @@ TEST_F(Moves, ABookMovesIntoADirectoryUnderItsOwnName) {
     EXPECT_TRUE(log.lines()[1].starts_with("default Rename: Move without replacement."));
 }
 
-TEST_F(Moves, ACollidingBookIsNotCountedUp) {
+TEST_F(MovingAssets, ACollidingBookIsNotCountedUp) {
     const URL library = makeFolder("library");
     m_folder.write("library/a.epub", "2");
 
@@ -145,7 +215,35 @@ TEST_F(Moves, ACollidingBookIsNotCountedUp) {
     EXPECT_EQ(names("library"), Names{"a.epub"});
 }
 
-TEST_F(Moves, ABookIsNamedAfterANumericStoreID) {
+TEST_F(MovingAssets, ABookReplacesItsNamesakeIfAsked) {
+    const URL library = makeFolder("library");
+    m_folder.write("library/a.epub", "2");
+
+    EXPECT_TRUE(moveInto(asset("a.epub", "1"), library, {.replace = true}));
+
+    EXPECT_EQ(m_folder.read("library/a.epub"), "1");
+    EXPECT_EQ(names("library"), Names{"a.epub"});
+}
+
+TEST_F(MovingAssets, AnAssetOfNoKnownKindIsMovedLikeABook) {
+    const URL library = makeFolder("library");
+    m_folder.write("library/a.txt", "2");
+
+    EXPECT_FALSE(moveInto(asset("a.txt"), library, {.renameIfCollision = true}));
+
+    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::FileExists, m_folder.url("library/a.txt")));
+}
+
+TEST_F(MovingAssets, ABookMovedIntoItsOwnFolderIsTheSameRecord) {
+    const auto book = asset("library/a.epub");
+    RecordedLog log;
+
+    EXPECT_EQ(moveInto(book, m_folder.url("library"), {.replace = true}), book);
+
+    EXPECT_EQ(log.lines(), Lines{"debug Rename: Start"});
+}
+
+TEST_F(MovingAssets, ABookIsNamedAfterANumericStoreID) {
     const auto book = asset("a.epub");
     const Value storeID("4711");
     book->setStoreID(&storeID);
@@ -155,7 +253,7 @@ TEST_F(Moves, ABookIsNamedAfterANumericStoreID) {
     EXPECT_EQ(names("library"), Names{"4711.epub"});
 }
 
-TEST_F(Moves, AStoreIDStoredAsANumberIsItsDecimalText) {
+TEST_F(MovingAssets, AStoreIDStoredAsANumberIsItsDecimalText) {
     asset("a.epub");
     const Dictionary dictionary{{"path", m_folder / "a.epub"},
                                 {"itemId", Number::signedInteger(4711)}};
@@ -167,7 +265,7 @@ TEST_F(Moves, AStoreIDStoredAsANumberIsItsDecimalText) {
     EXPECT_EQ(names("library"), Names{"4711.epub"});
 }
 
-TEST_F(Moves, ABookWithoutPositiveStoreIDIsNamedAfterItsGeneratedID) {
+TEST_F(MovingAssets, ABookWithoutPositiveStoreIDIsNamedAfterItsGeneratedID) {
     for (const char* storeID : {"0", "no number", "-4"}) {
         const auto book = asset("a.epub");
         const Value value(storeID);
@@ -181,7 +279,64 @@ TEST_F(Moves, ABookWithoutPositiveStoreIDIsNamedAfterItsGeneratedID) {
     }
 }
 
-TEST_F(Moves, ABookWithoutUsableNameFailsWith259AndNoURL) {
+TEST_F(MovingAssets, AStoreIDThatBeginsWithANumberIsTakenWhole) {
+    const auto book = asset("a.epub");
+    const Value storeID("4711-b");
+    book->setStoreID(&storeID);
+    book->setGeneratedID("GENERATED");
+
+    EXPECT_TRUE(moveInto(book, makeFolder("library"), {.useAssetIDFileName = true}));
+
+    EXPECT_EQ(names("library"), Names{"4711-b.epub"});
+}
+
+TEST_F(MovingAssets, AnIDNamesAnItemWithoutExtensionWithNoDot) {
+    const auto book = asset("a");
+    book->setGeneratedID("GENERATED");
+
+    EXPECT_TRUE(moveInto(book, makeFolder("library"), {.useAssetIDFileName = true}));
+
+    EXPECT_EQ(names("library"), Names{"GENERATED"});
+}
+
+TEST_F(MovingAssets, AnIDOfARecordWithoutURLIsANameWithNothingToMove) {
+    const URL library = makeFolder("library");
+    const auto headless = recordOver({{"PVGeneratedItemId", "GENERATED"}});
+    RecordedLog log;
+
+    EXPECT_FALSE(moveInto(headless, library, {.useAssetIDFileName = true}));
+
+    EXPECT_EQ(m_error, makeMissingURLError());
+    ASSERT_EQ(log.lines().size(), 2U);
+    EXPECT_NE(log.lines()[1].find(text(m_folder.url("library/GENERATED"))), std::string::npos);
+}
+
+TEST_F(MovingAssets, WhatNamesNoItemIsABookWithoutName) {
+    for (const AssetPtr& moved : {AssetPtr(), AssetPtr(emptyRecord())}) {
+        m_error.reset();
+        RecordedLog log;
+
+        EXPECT_FALSE(moveInto(moved, m_folder.url("library")));
+
+        EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::Corrupt, std::nullopt));
+        EXPECT_EQ(log.lines(),
+                  (Lines{"debug Rename: Start", "error Failed to rename imported book"}));
+    }
+}
+
+TEST_F(MovingAssets, APDFWithoutURLIsNoneAndLeavesTheError) {
+    const auto guide = emptyRecord();
+    guide->setAssetType(PVAssetTypePDF);
+    m_error = makeNoIdentityError();
+    RecordedLog log;
+
+    EXPECT_FALSE(moveInto(guide, m_folder.url("library"), {.renameIfCollision = true}));
+
+    EXPECT_EQ(m_error, makeNoIdentityError());
+    EXPECT_EQ(log.lines(), Lines{"debug Rename: Start"});
+}
+
+TEST_F(MovingAssets, ABookWithoutUsableNameFailsWith259AndNoURL) {
     const auto book = asset("a.epub");
     const URL library = makeFolder("library");
     RecordedLog log;
@@ -193,7 +348,7 @@ TEST_F(Moves, ABookWithoutUsableNameFailsWith259AndNoURL) {
     EXPECT_EQ(names("library"), Names{});
 }
 
-TEST_F(Moves, AnIDThatIsNoSingleNameIsNoFileName) {
+TEST_F(MovingAssets, AnIDThatIsNoSingleNameIsNoFileName) {
     const URL library = makeFolder("library");
     for (const std::string& id :
          std::vector<std::string>{"", ".", "..", "../out", "a/b", "/etc", std::string("a\0b", 3)}) {
@@ -209,202 +364,13 @@ TEST_F(Moves, AnIDThatIsNoSingleNameIsNoFileName) {
     EXPECT_EQ(names(), (Names{"a.epub", "library"}));
 }
 
-TEST_F(Moves, ACollidingPDFIsCountedUp) {
-    const URL library = makeFolder("library");
-    m_folder.write("library/Guide.pdf", "2");
-    m_folder.write("library/Guide 1.pdf", "2");
-    const auto guide = asset("Guide.pdf");
-    RecordedLog log;
-
-    const AssetPtr moved = moveInto(guide, library, {.renameIfCollision = true});
-
-    ASSERT_TRUE(moved);
-    EXPECT_EQ(moved->url(), m_folder.url("library/Guide 2.pdf"));
-    ASSERT_EQ(log.lines().size(), 4U);
-    EXPECT_EQ(log.lines()[0], "debug Rename: Start");
-    EXPECT_EQ(log.lines()[1],
-              "default Duplicate name encountered during renaming. Appending count to file 1");
-    EXPECT_EQ(log.lines()[2],
-              "default Duplicate name encountered during renaming. Appending count to file 2");
-}
-
-TEST_F(Moves, ACollidingPDFFailsOrReplacesWithoutCounting) {
-    const URL library = makeFolder("library");
-    m_folder.write("library/Guide.pdf", "2");
-
-    EXPECT_FALSE(moveInto(asset("Guide.pdf", "1"), library));
-    EXPECT_EQ(m_error,
-              makeFileError(PVFileErrorCode::FileExists, m_folder.url("library/Guide.pdf")));
-
-    EXPECT_TRUE(moveInto(asset("Guide.pdf", "1"), library, {.replace = true}));
-    EXPECT_EQ(m_folder.read("library/Guide.pdf"), "1");
-    EXPECT_EQ(names("library"), Names{"Guide.pdf"});
-}
-
-TEST_F(Moves, AnAssetIDNameIsForBooksAlone) {
+TEST_F(MovingAssets, AnAssetIDNameIsForBooksAlone) {
     const auto guide = asset("Guide.pdf");
     guide->setGeneratedID("ID");
 
     EXPECT_TRUE(moveInto(guide, makeFolder("library"), {.useAssetIDFileName = true}));
 
     EXPECT_EQ(names("library"), Names{"Guide.pdf"});
-}
-
-/// Says that every name up to a count is taken.
-class CrowdedService : public ForwardingFileSystemService {
-public:
-    explicit CrowdedService(int taken)
-        : ForwardingFileSystemService(FileSystemService::makeDefault()), m_taken(taken) {}
-    bool itemExistsAtPath(const std::string& path) override {
-        lastTested = path;
-        return m_taken-- > 0;
-    }
-    std::string lastTested;
-
-private:
-    int m_taken;
-};
-
-TEST_F(Moves, CountingEndsAt9999WithThatNameTakenOrNot) {
-    const auto service = std::make_shared<CrowdedService>(1 << 20);
-    m_manager->setFileManager(service);
-    const URL library = makeFolder("library");
-
-    const AssetPtr moved = moveInto(asset("Guide.pdf"), library, {.renameIfCollision = true});
-
-    ASSERT_TRUE(moved);
-    EXPECT_EQ(names("library"), Names{"Guide 9999.pdf"});
-}
-
-/// Takes the name between the test and the move, once.
-class CompetingService : public ForwardingFileSystemService {
-public:
-    CompetingService() : ForwardingFileSystemService(FileSystemService::makeDefault()) {}
-    bool moveItem(const URL& source, const URL& destination, ErrorOut error) override {
-        if (!std::exchange(m_hasCompeted, true))
-            std::ofstream(destination.path()) << "competitor";
-        return ForwardingFileSystemService::moveItem(source, destination, error);
-    }
-
-private:
-    bool m_hasCompeted = false;
-};
-
-TEST_F(Moves, ACompetitorThatTookTheNameSendsTheCountOn) {
-    m_manager->setFileManager(std::make_shared<CompetingService>());
-    const URL library = makeFolder("library");
-    RecordedLog log;
-
-    const AssetPtr moved =
-        moveInto(asset("Guide.pdf", "mine"), library, {.renameIfCollision = true});
-
-    ASSERT_TRUE(moved);
-    EXPECT_EQ(m_folder.read("library/Guide.pdf"), "competitor");
-    EXPECT_EQ(m_folder.read("library/Guide 1.pdf"), "mine");
-    ASSERT_EQ(log.lines().size(), 4U);
-    EXPECT_TRUE(log.lines()[1].starts_with("default Rename: Move without replacement."));
-    EXPECT_TRUE(log.lines()[2].starts_with("default Duplicate name"));
-    EXPECT_TRUE(log.lines()[3].starts_with("default Rename: Move without replacement."));
-}
-
-TEST_F(Moves, ATryThatWasMadeAgainLeavesNoErrorBesideTheResult) {
-    m_manager->setFileManager(std::make_shared<CompetingService>());
-    RecordedLog log;
-
-    EXPECT_TRUE(moveInto(asset("Guide.pdf"), makeFolder("library"), {.renameIfCollision = true}));
-
-    EXPECT_FALSE(m_error);
-    EXPECT_FALSE(log.lines()[1].ends_with("error: (null)"));
-    EXPECT_TRUE(log.lines()[3].ends_with("error: (null)"));
-}
-
-TEST_F(Moves, AFreeNameDoesNotChange) {
-    EXPECT_EQ(m_manager->nonCollidingNameForFileName_inDestPath("a.pdf", m_folder.path()), "a.pdf");
-}
-
-TEST_F(Moves, ATakenNameIsCountedToTheFirstThatIsFree) {
-    m_folder.write("a.pdf", "");
-    m_folder.write("a 1.pdf", "");
-
-    EXPECT_EQ(m_manager->nonCollidingNameForFileName_inDestPath("a.pdf", m_folder.path()),
-              "a 2.pdf");
-}
-
-TEST_F(Moves, ATakenNameWithoutExtensionGetsATrailingDot) {
-    m_folder.write("notes", "");
-
-    EXPECT_EQ(m_manager->nonCollidingNameForFileName_inDestPath("notes", m_folder.path()),
-              "notes 1.");
-}
-
-TEST_F(Moves, CountingANameHasNoLimit) {
-    m_manager->setFileManager(std::make_shared<CrowdedService>(12001));
-
-    EXPECT_EQ(m_manager->nonCollidingNameForFileName_inDestPath("a.pdf", m_folder.path()),
-              "a 12001.pdf");
-}
-
-TEST_F(Moves, APlacedAssetGetsSizeInsertionDateAndAttributes) {
-    const auto book = asset("a.epub");
-    book->setGeneratedID("ID");
-    const Date before = Date::now();
-
-    const AssetPtr stamped = m_manager->updateWithKeyAttributesAssetMetadata_error(book, &m_error);
-
-    ASSERT_TRUE(stamped);
-    EXPECT_GT(stamped->allocatedSize(), 0U);
-    EXPECT_GE(stamped->insertionDate().secondsSinceReferenceDate + 1,
-              before.secondsSinceReferenceDate);
-    EXPECT_TRUE(stamped->dictionaryRepresentation()->contains("PVInsertionDate"));
-    EXPECT_FALSE(book->_hasAllocatedSize());
-    EXPECT_FALSE(m_error);
-    const auto attributes = m_manager->extendedAttributesForAsset_error(stamped);
-    ASSERT_TRUE(attributes);
-    EXPECT_EQ(*attributes, (Dictionary{{"com.kestrel.Folium.assetID", "ID"}}));
-}
-
-TEST_F(Moves, AnAssetThatHasItsSizeIsKeptAndItsAttributesWritten) {
-    const auto book = asset("a.epub");
-    book->setGeneratedID("ID");
-    book->setAllocatedSize(0);
-
-    EXPECT_EQ(m_manager->updateWithKeyAttributesAssetMetadata_error(book, &m_error), book);
-
-    EXPECT_EQ(m_manager->extendedAttributesForAsset_error(book)->size(), 1U);
-}
-
-TEST_F(Moves, AStampedRecordComesBackAlsoWhenItsAttributesCouldNotBeWritten) {
-    const auto book = asset("a.epub");
-
-    const AssetPtr stamped = m_manager->updateWithKeyAttributesAssetMetadata_error(book, &m_error);
-
-    ASSERT_TRUE(stamped);
-    EXPECT_TRUE(stamped->_hasAllocatedSize());
-    EXPECT_EQ(m_error, makeNoIdentityError());
-}
-
-TEST_F(Moves, AStaleErrorIsClearedByAStampThatSucceeds) {
-    const auto book = asset("a.epub");
-    book->setGeneratedID("ID");
-    m_error = makeMissingURLError();
-
-    EXPECT_TRUE(m_manager->updateWithKeyAttributesAssetMetadata_error(book, &m_error));
-
-    EXPECT_FALSE(m_error);
-}
-
-TEST_F(Moves, AMissingFileIsStampedWithNoSizeAndSaysWhy) {
-    const auto book =
-        PVAssetMetadata::metadataWithURL_dictionary(m_folder.url("gone.epub"), nullptr);
-    book->setGeneratedID("ID");
-    RecordedLog log;
-
-    const AssetPtr stamped = m_manager->updateWithKeyAttributesAssetMetadata_error(book, &m_error);
-
-    ASSERT_TRUE(stamped);
-    EXPECT_EQ(stamped->allocatedSize(), 0U);
-    EXPECT_EQ(m_error, makePOSIXError(ENOENT, m_folder.url("gone.epub")));
-    EXPECT_EQ(log.lines(), Lines{"error Failed to state file for directory"});
 }
 
 }  // namespace

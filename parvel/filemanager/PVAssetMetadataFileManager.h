@@ -148,7 +148,8 @@ public:
                                                     const AssetPtr& newVersion,
                                                     ErrorOut error = nullptr);
     /// Moves the item to the user's trash and gives it its display name there; a rename that fails
-    /// leaves it under the trash's own name. The record's `trashedURL` is its place.
+    /// leaves it under the trash's own name. So does a display name without extension, of an item
+    /// that has one. Deliberate. The record's `trashedURL` is its place.
     AssetPtr trashAsset_error(const AssetPtr& asset, ErrorOut error = nullptr);
     bool removeAsset_error(const AssetPtr& asset, ErrorOut error = nullptr);
     /// Moves the item aside into the directory; one of that name there fails it. The error is not

@@ -13,14 +13,20 @@ namespace parvel {
 
 namespace {
 
-/// The item's place in the trash under its display name. None where that is no single name, which
-/// is a failed rename: nothing out of a book leads out of the trash or into another item there.
-std::optional<URL> renamedInTrash(const URL& trashed, const String& displayName) {
-    // Deliberate: a missing extension would be joined as a component of its own, so that the rename
-    // fails and the item stays under the name that the trash gave it.
-    if (extensionOfPath(displayName).empty() || !isOneComponent(displayName))
+/// The item's place in the trash under its display name. None, which is a failed rename, where that
+/// is no single name: nothing out of a book leads out of the trash or into another item there.
+std::optional<URL> renamedInTrash(FileSystemService& service, const URL& trashed,
+                                  const String& displayName, std::string_view extension) {
+    if (!isOneComponent(displayName))
         return std::nullopt;
-    return trashed.deletingLastPathComponent().appendingPathComponent(displayName);
+    const URL named = trashed.deletingLastPathComponent().appendingPathComponent(displayName);
+    if (extension.empty() || !extensionOfPath(displayName).empty())
+        return named;
+    // Deliberate: a missing extension is joined as a component of its own. The folder that this
+    // names is not there, so that the move fails and the item keeps the trash's own name.
+    if (service.itemExistsAtPath(named.path()))
+        return std::nullopt;
+    return named.appendingPathComponent(extension);
 }
 
 }  // namespace
@@ -32,13 +38,15 @@ AssetPtr PVAssetMetadataFileManager::trashAsset_error(const AssetPtr& asset, Err
     std::optional<URL> trashed;
     if (!url)
         assign(slot.out(), makeMissingURLError());
-    if (!url || !m_fileManager->trashItem(*url, &trashed, slot.out()) || !trashed) {
+    if (!url || !m_fileManager->trashItem(*url, &trashed, slot.out())) {
         PVParvelLog().error("trashAsset: Fail: %@ error: %@", url, slot.value());
         return nullptr;
     }
 
     if (const String* name = PVDynamicCast(classOf<String>, asset->displayName())) {
-        const auto renamed = renamedInTrash(*trashed, *name);
+        const auto renamed =
+            trashed ? renamedInTrash(*m_fileManager, *trashed, *name, url->pathExtension())
+                    : std::nullopt;
         if (renamed && m_fileManager->moveItem(*trashed, *renamed)) {
             PVParvelLog().debug("trashAsset: renamed asset in trash directory");
             trashed = renamed;

@@ -1,32 +1,42 @@
 #include <gtest/gtest.h>
 
+#include "tests/support/EnvironmentValue.h"
 #include "tests/support/ManagedFolder.h"
 #include "tests/support/RecordedLog.h"
+#include "tests/support/RecordingFileSystem.h"
+#include "tests/support/Records.h"
 
 namespace parvel::testing {
 namespace {
 
 using Lines = std::vector<std::string>;
 
-class TakingAway : public ManagedFolder {
+class Trashing : public ManagedFolder {
 protected:
-    void SetUp() override { setenv("XDG_DATA_HOME", (m_folder / "data").c_str(), 1); }
-    void TearDown() override { unsetenv("XDG_DATA_HOME"); }
-
+    AssetPtr trash(const AssetPtr& asset) { return m_manager->trashAsset_error(asset, &m_error); }
+    /// The place that the record of the trashed asset names.
+    std::optional<URL> placeOfTrashed(const AssetPtr& asset) {
+        const AssetPtr trashed = trash(asset);
+        return trashed ? trashed->trashedURL() : std::nullopt;
+    }
     [[nodiscard]] URL inTrash(const std::string& name) const {
         return m_folder.url("data/Trash/files/" + name);
     }
+
+    EnvironmentValue m_data{"XDG_DATA_HOME", m_folder / "data"};
 };
 
-TEST_F(TakingAway, ATrashedAssetGetsItsDisplayNameInTheTrash) {
+TEST_F(Trashing, ATrashedAssetGetsItsDisplayNameInTheTrash) {
     const auto book = asset("a.epub");
     book->setDisplayName("My Book.epub");
     RecordedLog log;
 
-    const AssetPtr trashed = m_manager->trashAsset_error(book, &m_error);
+    const AssetPtr trashed = trash(book);
 
     ASSERT_TRUE(trashed);
     EXPECT_EQ(trashed->trashedURL(), inTrash("My Book.epub"));
+    EXPECT_EQ(trashed->url(), m_folder.url("a.epub"));
+    EXPECT_FALSE(book->trashedURL());
     EXPECT_EQ(names("data/Trash/files"), Names{"My Book.epub"});
     EXPECT_EQ(names("data/Trash/info"), Names{"My Book.epub.trashinfo"});
     EXPECT_EQ(log.lines(), (Lines{"debug trashAsset: start",
@@ -35,15 +45,12 @@ TEST_F(TakingAway, ATrashedAssetGetsItsDisplayNameInTheTrash) {
     EXPECT_FALSE(m_error);
 }
 
-TEST_F(TakingAway, ADisplayNameWithoutExtensionKeepsTheTrashsOwnName) {
+TEST_F(Trashing, ADisplayNameWithoutExtensionKeepsTheTrashsOwnName) {
     const auto book = asset("a.epub");
     book->setDisplayName("My Book");
     RecordedLog log;
 
-    const AssetPtr trashed = m_manager->trashAsset_error(book, &m_error);
-
-    ASSERT_TRUE(trashed);
-    EXPECT_EQ(trashed->trashedURL(), inTrash("a.epub"));
+    EXPECT_EQ(placeOfTrashed(book), inTrash("a.epub"));
     EXPECT_EQ(names("data/Trash/files"), Names{"a.epub"});
     EXPECT_EQ(log.lines(), (Lines{"debug trashAsset: start",
                                   "error trashAsset: Failed to rename file in trash directory",
@@ -51,38 +58,168 @@ TEST_F(TakingAway, ADisplayNameWithoutExtensionKeepsTheTrashsOwnName) {
     EXPECT_FALSE(m_error);
 }
 
-TEST_F(TakingAway, ADisplayNameThatIsTheTrashsOwnNameIsAFailedRename) {
+TEST_F(Trashing, TheGivenServiceIsAskedForTheTrashAndTheRename) {
+    const auto service = std::make_shared<RecordingFileSystem>();
+    m_manager->setFileManager(service);
+    const auto book = asset("a.epub");
+    book->setDisplayName("My Book.epub");
+
+    EXPECT_TRUE(trash(book));
+
+    EXPECT_EQ(service->calls,
+              (Lines{"trash " + (m_folder / "a.epub"), "move " + inTrash("a.epub").path() + " to " +
+                                                           inTrash("My Book.epub").path()}));
+}
+
+TEST_F(Trashing, AMissingExtensionIsJoinedAsAComponent) {
+    const auto service = std::make_shared<RecordingFileSystem>();
+    m_manager->setFileManager(service);
+    const auto book = asset("a.epub");
+    book->setDisplayName("My Book");
+
+    EXPECT_TRUE(trash(book));
+
+    ASSERT_EQ(service->calls.size(), 3U);
+    EXPECT_EQ(service->calls[2],
+              "move " + inTrash("a.epub").path() + " to " + inTrash("My Book/epub").path());
+}
+
+/// Makes the folder that a move leads into.
+class ObligingService : public ForwardingFileSystemService {
+public:
+    ObligingService() : ForwardingFileSystemService(FileSystemService::makeDefault()) {}
+    bool moveItem(const URL& source, const URL& destination, ErrorOut error) override {
+        std::filesystem::create_directories(destination.deletingLastPathComponent().path());
+        return ForwardingFileSystemService::moveItem(source, destination, error);
+    }
+};
+
+TEST_F(Trashing, ARenameThatAServiceMakesPossibleGivesThePlace) {
+    m_manager->setFileManager(std::make_shared<ObligingService>());
+    const auto book = asset("a.epub");
+    book->setDisplayName("My Book");
+    RecordedLog log;
+
+    EXPECT_EQ(placeOfTrashed(book), inTrash("My Book/epub"));
+    EXPECT_EQ(log.lines()[1], "debug trashAsset: renamed asset in trash directory");
+}
+
+TEST_F(Trashing, AnItemWithoutExtensionTakesAPlainDisplayName) {
+    const auto notes = asset("notes");
+    notes->setDisplayName("My Notes");
+    RecordedLog log;
+
+    EXPECT_EQ(placeOfTrashed(notes), inTrash("My Notes"));
+    EXPECT_EQ(names("data/Trash/files"), Names{"My Notes"});
+    EXPECT_EQ(log.lines()[1], "debug trashAsset: renamed asset in trash directory");
+}
+
+TEST_F(Trashing, AnyExtensionOfTheDisplayNameWillDo) {
+    const auto book = asset("a.epub");
+    book->setDisplayName("Vol. 2");
+
+    EXPECT_EQ(placeOfTrashed(book), inTrash("Vol. 2"));
+}
+
+TEST_F(Trashing, ANameThatIsTakenInTheTrashIsAFailedRename) {
+    m_folder.write("data/Trash/files/My Book.epub", "other");
+    const auto book = asset("a.epub", "mine");
+    book->setDisplayName("My Book.epub");
+    RecordedLog log;
+
+    EXPECT_EQ(placeOfTrashed(book), inTrash("a.epub"));
+    EXPECT_EQ(m_folder.read("data/Trash/files/My Book.epub"), "other");
+    EXPECT_EQ(m_folder.read("data/Trash/files/a.epub"), "mine");
+    EXPECT_EQ(log.lines(), (Lines{"debug trashAsset: start",
+                                  "error trashAsset: Failed to rename file in trash directory",
+                                  "debug trashAsset: Success"}));
+}
+
+TEST_F(Trashing, TheErrorStaysAsItWasWithAndWithoutARename) {
+    m_error = makeNoIdentityError();
+    for (const char* name : {"My Book.epub", "My Book"}) {
+        const auto book = asset("a.epub");
+        book->setDisplayName(name);
+
+        EXPECT_TRUE(trash(book));
+
+        EXPECT_EQ(m_error, makeNoIdentityError());
+    }
+}
+
+TEST_F(Trashing, ADisplayNameThatIsNoTextIsNone) {
+    asset("a.epub");
+    const auto book =
+        recordOver({{"path", m_folder / "a.epub"}, {"PVDisplayName", integerValue(7)}});
+    RecordedLog log;
+
+    EXPECT_EQ(placeOfTrashed(book), inTrash("a.epub"));
+    EXPECT_EQ(log.lines().size(), 2U);
+}
+
+/// Trashes and does not tell where.
+class SilentTrash : public ForwardingFileSystemService {
+public:
+    SilentTrash() : ForwardingFileSystemService(FileSystemService::makeDefault()) {}
+    bool trashItem(const URL& item, std::optional<URL>*, ErrorOut error) override {
+        return ForwardingFileSystemService::trashItem(item, nullptr, error);
+    }
+};
+
+TEST_F(Trashing, AnItemWhosePlaceInTheTrashIsNotToldIsTrashedAllTheSame) {
+    m_manager->setFileManager(std::make_shared<SilentTrash>());
     const auto book = asset("a.epub");
     RecordedLog log;
 
-    const AssetPtr trashed = m_manager->trashAsset_error(book, &m_error);
+    const AssetPtr trashed = trash(book);
 
     ASSERT_TRUE(trashed);
-    EXPECT_EQ(trashed->trashedURL(), inTrash("a.epub"));
+    EXPECT_FALSE(trashed->trashedURL());
+    EXPECT_EQ(log.lines(), (Lines{"debug trashAsset: start",
+                                  "error trashAsset: Failed to rename file in trash directory",
+                                  "debug trashAsset: Success"}));
+}
+
+TEST_F(Trashing, WhatNamesNoItemCanNotBeTrashed) {
+    for (const AssetPtr& missing : {AssetPtr(), AssetPtr(emptyRecord())}) {
+        m_error.reset();
+        RecordedLog log;
+
+        EXPECT_FALSE(trash(missing));
+
+        EXPECT_EQ(m_error, makeMissingURLError());
+        EXPECT_EQ(log.lines(),
+                  (Lines{"debug trashAsset: start",
+                         "error trashAsset: Fail: (null) error: " + logText(*m_error)}));
+    }
+}
+
+TEST_F(Trashing, ADisplayNameThatIsTheTrashsOwnNameIsAFailedRename) {
+    const auto book = asset("a.epub");
+    RecordedLog log;
+
+    EXPECT_EQ(placeOfTrashed(book), inTrash("a.epub"));
     EXPECT_EQ(names("data/Trash/info"), Names{"a.epub.trashinfo"});
     EXPECT_EQ(log.lines()[1], "error trashAsset: Failed to rename file in trash directory");
 }
 
-TEST_F(TakingAway, ARecordWithoutDisplayNameKeepsTheTrashsOwnName) {
+TEST_F(Trashing, ARecordWithoutDisplayNameKeepsTheTrashsOwnName) {
     const auto book = asset("a.epub");
     book->setDisplayName(std::nullopt);
     RecordedLog log;
 
-    const AssetPtr trashed = m_manager->trashAsset_error(book, &m_error);
-
-    ASSERT_TRUE(trashed);
-    EXPECT_EQ(trashed->trashedURL(), inTrash("a.epub"));
+    EXPECT_EQ(placeOfTrashed(book), inTrash("a.epub"));
     EXPECT_EQ(log.lines(), (Lines{"debug trashAsset: start", "debug trashAsset: Success"}));
 }
 
-TEST_F(TakingAway, ADisplayNameThatIsAPathMovesNothingOutOfTheTrash) {
+TEST_F(Trashing, ADisplayNameThatIsAPathMovesNothingOutOfTheTrash) {
     makeFolder("outside");
     for (const char* name : {"../../../outside/x.epub", "/outside/x.epub", "..", ".",
                              "a/../../../../outside/x.epub"}) {
         const auto book = asset("a.epub");
         book->setDisplayName(name);
 
-        const AssetPtr trashed = m_manager->trashAsset_error(book, &m_error);
+        const AssetPtr trashed = trash(book);
 
         ASSERT_TRUE(trashed) << name;
         EXPECT_EQ(trashed->trashedURL()->deletingLastPathComponent(),
@@ -91,33 +228,27 @@ TEST_F(TakingAway, ADisplayNameThatIsAPathMovesNothingOutOfTheTrash) {
     EXPECT_EQ(names("outside"), Names{});
 }
 
-TEST_F(TakingAway, ADisplayNameDoesNotMoveTheAssetIntoAnotherTrashedItem) {
+TEST_F(Trashing, ADisplayNameDoesNotMoveTheAssetIntoAnotherTrashedItem) {
     makeFolder("data/Trash/files/My Book");
     const auto book = asset("a.epub");
     book->setDisplayName("My Book");
 
-    const AssetPtr trashed = m_manager->trashAsset_error(book, &m_error);
-
-    ASSERT_TRUE(trashed);
-    EXPECT_EQ(trashed->trashedURL(), inTrash("a.epub"));
+    EXPECT_EQ(placeOfTrashed(book), inTrash("a.epub"));
     EXPECT_EQ(names("data/Trash/files/My Book"), Names{});
 }
 
-TEST_F(TakingAway, AnEmptyDisplayNameKeepsTheTrashsOwnName) {
+TEST_F(Trashing, AnEmptyDisplayNameKeepsTheTrashsOwnName) {
     const auto book = asset("a.epub");
     book->setDisplayName("");
 
-    const AssetPtr trashed = m_manager->trashAsset_error(book, &m_error);
-
-    ASSERT_TRUE(trashed);
-    EXPECT_EQ(trashed->trashedURL(), inTrash("a.epub"));
+    EXPECT_EQ(placeOfTrashed(book), inTrash("a.epub"));
 }
 
-TEST_F(TakingAway, AMissingAssetCanNotBeTrashed) {
+TEST_F(Trashing, AMissingAssetCanNotBeTrashed) {
     const auto book = PVAssetMetadata::metadataWithURL_dictionary(m_folder.url("a.epub"), nullptr);
     RecordedLog log;
 
-    EXPECT_FALSE(m_manager->trashAsset_error(book, &m_error));
+    EXPECT_FALSE(trash(book));
 
     EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::NoSuchFile, m_folder.url("a.epub")));
     EXPECT_EQ(log.lines(), (Lines{"debug trashAsset: start",
@@ -125,7 +256,7 @@ TEST_F(TakingAway, AMissingAssetCanNotBeTrashed) {
                                       " error: " + logText(*m_error)}));
 }
 
-TEST_F(TakingAway, AFailedTrashingLogsItsErrorAlsoWhereNobodyAsked) {
+TEST_F(Trashing, AFailedTrashingLogsItsErrorAlsoWhereNobodyAsked) {
     const auto book = PVAssetMetadata::metadataWithURL_dictionary(m_folder.url("a.epub"), nullptr);
     RecordedLog log;
 
@@ -134,113 +265,15 @@ TEST_F(TakingAway, AFailedTrashingLogsItsErrorAlsoWhereNobodyAsked) {
     EXPECT_NE(log.lines()[1].find("Code=4"), std::string::npos);
 }
 
-TEST_F(TakingAway, ABookThatIsNotDownloadedIsNotTrashed) {
+TEST_F(Trashing, ABookThatIsNotDownloadedIsNotTrashed) {
     makeFolder(".stfolder");
     m_folder.write("a.epub.nextcloud", " ");
     const auto book = PVAssetMetadata::metadataWithURL_dictionary(m_folder.url("a.epub"), nullptr);
 
-    EXPECT_FALSE(m_manager->trashAsset_error(book, &m_error));
+    EXPECT_FALSE(trash(book));
 
     EXPECT_EQ(m_error, makePOSIXError(ETIMEDOUT, m_folder.url("a.epub")));
     EXPECT_EQ(names(), (Names{".stfolder", "a.epub.nextcloud"}));
-}
-
-TEST_F(TakingAway, ARemovedAssetIsGone) {
-    const auto book = asset("a.epub/OPS/x");
-    const auto package =
-        PVAssetMetadata::metadataWithURL_dictionary(m_folder.url("a.epub"), nullptr);
-    RecordedLog log;
-
-    EXPECT_TRUE(m_manager->removeAsset_error(package, &m_error));
-
-    EXPECT_EQ(names(), Names{});
-    EXPECT_EQ(log.lines(),
-              (Lines{"default removeAsset: start {asset: 1} " + logText(m_folder.url("a.epub")),
-                     "debug removeAsset: Success"}));
-}
-
-TEST_F(TakingAway, RemovingAMissingAssetIsThePlatformsError) {
-    const auto book = PVAssetMetadata::metadataWithURL_dictionary(m_folder.url("a.epub"), nullptr);
-    RecordedLog log;
-
-    EXPECT_FALSE(m_manager->removeAsset_error(book, &m_error));
-
-    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::NoSuchFile, m_folder.url("a.epub")));
-    EXPECT_EQ(log.lines()[1], "error removeAsset: Failed: " + logText(m_folder.url("a.epub")) +
-                                  " error: " + logText(*m_error));
-}
-
-TEST_F(TakingAway, RemovingNoRecordLogsThatNoneWasGiven) {
-    RecordedLog log;
-
-    EXPECT_FALSE(m_manager->removeAsset_error(nullptr, &m_error));
-
-    EXPECT_EQ(log.lines()[0], "default removeAsset: start {asset: 0} (null)");
-}
-
-TEST_F(TakingAway, AnAssetThatIsNotDownloadedIsRemovedByItsPlaceholder) {
-    makeFolder(".stfolder");
-    m_folder.write("a.epub.nextcloud", " ");
-    const auto book = PVAssetMetadata::metadataWithURL_dictionary(m_folder.url("a.epub"), nullptr);
-
-    EXPECT_TRUE(m_manager->removeAsset_error(book, &m_error));
-
-    EXPECT_EQ(names(), Names{".stfolder"});
-}
-
-TEST_F(TakingAway, NothingNamedLikeAPlaceholderIsRemovedOutsideOfSynchronisedFolders) {
-    m_folder.write("a.epub.nextcloud", " ");
-    m_folder.write("b.epub.nextcloud/kept", "kept");
-    for (const char* name : {"a.epub", "b.epub"}) {
-        const auto book = PVAssetMetadata::metadataWithURL_dictionary(m_folder.url(name), nullptr);
-
-        EXPECT_FALSE(m_manager->removeAsset_error(book, &m_error));
-
-        EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::NoSuchFile, m_folder.url(name)));
-    }
-    EXPECT_EQ(names(), (Names{"a.epub.nextcloud", "b.epub.nextcloud"}));
-    EXPECT_EQ(m_folder.read("b.epub.nextcloud/kept"), "kept");
-}
-
-TEST_F(TakingAway, ARedactedAssetIsMovedAside) {
-    const URL aside = makeFolder("aside");
-    const auto book = asset("a.epub");
-    RecordedLog log;
-
-    const AssetPtr redacted = m_manager->redactAsset_intoDirectory_error(book, aside, &m_error);
-
-    ASSERT_TRUE(redacted);
-    EXPECT_TRUE(redacted->wasRedacted());
-    EXPECT_EQ(redacted->url(), m_folder.url("aside/a.epub"));
-    EXPECT_EQ(names("aside"), Names{"a.epub"});
-    EXPECT_EQ(log.lines(),
-              (Lines{"default redactAsset: start asset: " + logText(m_folder.url("a.epub")) +
-                         ", directory: " + logText(aside),
-                     "debug redactAsset: Did perform redact move -- Success"}));
-}
-
-TEST_F(TakingAway, ARedactionDoesNotReplace) {
-    const URL aside = makeFolder("aside");
-    m_folder.write("aside/a.epub", "2");
-    const auto book = asset("a.epub");
-    RecordedLog log;
-
-    EXPECT_FALSE(m_manager->redactAsset_intoDirectory_error(book, aside, &m_error));
-
-    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::FileExists, m_folder.url("aside/a.epub")));
-    EXPECT_EQ(m_folder.read("aside/a.epub"), "2");
-    EXPECT_EQ(log.lines()[1], "error redactAsset: Failed redact asset: " +
-                                  logText(m_folder.url("a.epub")) + " error: " + logText(*m_error));
-}
-
-TEST_F(TakingAway, RedactingNoAssetLeavesTheError) {
-    RecordedLog log;
-
-    EXPECT_FALSE(
-        m_manager->redactAsset_intoDirectory_error(nullptr, makeFolder("aside"), &m_error));
-
-    EXPECT_FALSE(m_error);
-    EXPECT_EQ(log.lines()[1], "error redactAsset: Failed redact asset: (null) error: (null)");
 }
 
 }  // namespace

@@ -54,6 +54,14 @@ TEST(JsonText, WhatIsNoJsonGivesNone) {
                              "+1",
                              "1e",
                              "--1",
+                             "01",
+                             "-01",
+                             "1.",
+                             ".5",
+                             "-.5",
+                             "1.e5",
+                             "-",
+                             "\"a\nb\"",
                              "nan",
                              "1e999"})
         EXPECT_EQ(valueOfJson(text), std::nullopt) << text;

@@ -29,6 +29,21 @@ void appendUtf8(char32_t character, std::string& out) {
     }
 }
 
+bool isControl(char character) {
+    return static_cast<unsigned char>(character) < 0x20;
+}
+
+/// Whether a number has digits where JSON wants some, and no zero before them.
+bool hasDigits(std::string_view number) {
+    const auto isDigitAt = [number](std::size_t offset) {
+        return offset < number.size() && number[offset] >= '0' && number[offset] <= '9';
+    };
+    const std::size_t first = number.starts_with('-') ? 1 : 0;
+    const std::size_t point = number.find('.');
+    return isDigitAt(first) && !(number[first] == '0' && isDigitAt(first + 1)) &&
+           (point == number.npos || isDigitAt(point + 1));
+}
+
 /// Every read gives none, and stays where it is, at what does not belong there.
 class JsonText {
 public:
@@ -116,6 +131,9 @@ private:
         String text;
         for (;;) {
             const std::size_t plain = std::min(m_rest.find_first_of("\"\\"), m_rest.size());
+            if (std::any_of(m_rest.begin(), m_rest.begin() + static_cast<std::ptrdiff_t>(plain),
+                            isControl))
+                return std::nullopt;
             text += m_rest.substr(0, plain);
             m_rest.remove_prefix(plain);
             if (takeWord("\""))
@@ -169,7 +187,7 @@ private:
         const char* end = m_rest.data() + length;
         double number = 0;
         const auto read = std::from_chars(m_rest.data(), end, number);
-        if (length == 0 || read.ptr != end || read.ec != std::errc())
+        if (!hasDigits(m_rest.substr(0, length)) || read.ptr != end || read.ec != std::errc())
             return std::nullopt;
         m_rest.remove_prefix(length);
         return Number::real(number);

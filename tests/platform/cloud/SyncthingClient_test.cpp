@@ -1,5 +1,8 @@
 #include "parvel/platform/linux/cloud/SyncthingClient.h"
 
+#include <sys/fsuid.h>
+
+#include <atomic>
 #include <filesystem>
 #include <map>
 #include <mutex>
@@ -9,6 +12,7 @@
 #include <gtest/gtest.h>
 
 #include "parvel/platform/linux/cloud/HostCloudStore.h"
+#include "parvel/platform/linux/cloud/SyncedPlace.h"
 #include "tests/support/EnvironmentValue.h"
 #include "tests/support/StandInServer.h"
 #include "tests/support/TemporaryDirectory.h"
@@ -45,6 +49,23 @@ std::string okReply(const std::string& body) {
     return "HTTP/1.0 200 OK\r\nContent-Type: application/json\r\nContent-Length: " +
            std::to_string(body.size()) + "\r\n\r\n" + body;
 }
+
+/// What this thread makes meanwhile belongs to another user, where it may say so.
+class StrangerScope {
+public:
+    StrangerScope() : m_own(static_cast<uid_t>(setfsuid(kStranger))) {}
+    ~StrangerScope() { setfsuid(m_own); }
+    StrangerScope(const StrangerScope&) = delete;
+    StrangerScope& operator=(const StrangerScope&) = delete;
+
+    [[nodiscard]] static bool isInForce() {
+        return static_cast<uid_t>(setfsuid(kStranger)) == kStranger;
+    }
+
+private:
+    static constexpr uid_t kStranger = 65'533;
+    uid_t m_own;
+};
 
 const std::string kOne = "[\"ABC:1\"]";
 const std::string kTwo = "[\"ABC:1\", \"DEF:7\"]";
@@ -340,6 +361,53 @@ TEST_F(SyncthingStatus, AFolderBelowAndALinkToItArePathsInTheSameFolder) {
     EXPECT_EQ(status("link/ü b.epub"), DownloadingStatus::Current);
     EXPECT_THAT(requests(), ElementsAre("GET /rest/db/file?folder=my%20books&file="
                                         "deep%2F%C3%BC%20b.epub"));
+}
+
+TEST_F(SyncthingStatus, AKeyIsNotSentToAnotherUsersProgram) {
+    std::atomic<bool> isAsked{false};
+    {
+        const StrangerScope stranger;
+        if (!stranger.isInForce())
+            GTEST_SKIP() << "only the system's own user can make a socket of another's";
+        m_server.emplace([&](StandInConnection& connection) {
+            std::string line;
+            isAsked = connection.readLine(line);
+        });
+    }
+    configure();
+
+    EXPECT_EQ(status(), DownloadingStatus::Downloaded);
+    EXPECT_EQ(reason(), "the client does not run");
+    m_server.reset();
+    EXPECT_FALSE(isAsked);
+}
+
+TEST_F(SyncthingStatus, AMarkOfAnotherNameIsTheOneThatTheConfigurationNames) {
+    m_folder.write("books/.kept", "");
+    m_folder.write("books/deep/a.epub", "content");
+    m_folder.write("bare/a.epub", "content");
+    m_folder.write("config/syncthing/config.xml",
+                   "<configuration><folder id=\"1\" path=\"/nowhere\">"
+                   "<markerName>.kept</markerName></folder><folder id=\"2\" path=\"" +
+                       (m_folder / "bare") +
+                       "\"><markerName>.kept</markerName></folder><folder id=\"3\" path=\"" +
+                       (m_folder / "books") +
+                       "\"><markerName>.kept</markerName></folder></configuration>");
+
+    const auto report = m_store.report(m_folder.url("books/deep/a.epub"), nullptr);
+
+    ASSERT_TRUE(report);
+    EXPECT_EQ(report->client, "Syncthing");
+    EXPECT_EQ(report->root, m_folder / "books");
+    EXPECT_EQ(report->mark, ".kept");
+    EXPECT_EQ(m_store.isUbiquitous(m_folder.url("bare/a.epub"), nullptr), false);
+    EXPECT_EQ(host::markedRootAbove(m_folder / "books/deep"), m_folder / "books");
+}
+
+TEST_F(SyncthingStatus, AMarkOfAnotherNameIsNoneWithoutTheConfiguration) {
+    m_folder.write("books/.kept", "");
+
+    EXPECT_EQ(m_store.isUbiquitous(m_folder.url("books/a.epub"), nullptr), false);
 }
 
 TEST_F(SyncthingStatus, AnItemThatDoesNotComeInTimeFailsTheDownload) {

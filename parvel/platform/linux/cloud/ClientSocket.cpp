@@ -9,6 +9,7 @@
 #include <cstring>
 
 #include "parvel/platform/linux/SystemCall.h"
+#include "parvel/platform/linux/cloud/ListenerOwner.h"
 
 namespace parvel::host {
 
@@ -78,8 +79,11 @@ SocketOutcome ClientSocket::connectToPath(const std::string& path, Deadline dead
 
 SocketOutcome ClientSocket::connectToAddress(const sockaddr_storage& address, socklen_t length,
                                              Deadline deadline) {
-    return connect(address.ss_family, reinterpret_cast<const sockaddr*>(&address), length,
-                   deadline);
+    const SocketOutcome outcome =
+        connect(address.ss_family, reinterpret_cast<const sockaddr*>(&address), length, deadline);
+    if (outcome == SocketOutcome::Done && !isListenerTrusted(address))
+        return SocketOutcome::Gone;
+    return outcome;
 }
 
 SocketOutcome ClientSocket::send(std::string_view bytes, Deadline deadline) {

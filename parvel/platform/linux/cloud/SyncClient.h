@@ -1,5 +1,7 @@
 #pragma once
 
+#include <sys/stat.h>
+
 #include <chrono>
 #include <functional>
 #include <string>
@@ -17,6 +19,12 @@ struct SyncedItem {
     bool isFolder = false;
 
     [[nodiscard]] std::string path() const { return root + "/" + relative; }
+    /// Finds out what stands there now.
+    void look() {
+        struct stat status {};
+        stands = ::stat(path().c_str(), &status) == 0;
+        isFolder = stands && S_ISDIR(status.st_mode);
+    }
 };
 
 /// What came of asking a client about an item.

@@ -7,17 +7,14 @@
 #include <string_view>
 
 #include "parvel/platform/linux/DirectoryStream.h"
-#include "parvel/platform/linux/FileDescriptor.h"
 #include "parvel/platform/linux/ItemTree.h"
+#include "parvel/platform/linux/OpenFolder.h"
 #include "parvel/platform/linux/Paths.h"
-#include "parvel/platform/linux/SystemCall.h"
+#include "parvel/platform/linux/cloud/SyncthingConfig.h"
 
 namespace parvel::host {
 
 namespace {
-
-/// What Syncthing keeps in the root of each folder that it synchronises.
-constexpr const char* kSyncthingMark = ".stfolder";
 
 /// The names of the journal that Nextcloud's client keeps in each root: `.sync_<12 hex digits>.db`,
 /// in older versions `._sync_<hex digits>.db`.
@@ -34,11 +31,6 @@ bool isNextcloudJournal(std::string_view name) {
         return name.find_first_not_of(digits, older.size()) == std::string_view::npos;
     return name.starts_with(newer) && name.size() == newer.size() + newerDigits &&
            name.find_first_not_of(digits, newer.size()) == std::string_view::npos;
-}
-
-FileDescriptor openFolder(int parent, const char* name, int flags) {
-    return FileDescriptor(
-        retried([&] { return ::openat(parent, name, O_DIRECTORY | O_CLOEXEC | flags); }));
 }
 
 std::optional<std::string> nextcloudJournalIn(int folder) {
@@ -64,9 +56,7 @@ bool setItem(SyncedPlace& place, const std::string& path, int levels) {
         item.relative = std::string(lastComponentOfPath(item.root)) + "/" + item.relative;
         item.root = parentFolderOf(item.root);
     }
-    struct stat status {};
-    item.stands = ::stat(path.c_str(), &status) == 0;
-    item.isFolder = item.stands && S_ISDIR(status.st_mode);
+    item.look();
     return true;
 }
 
@@ -91,23 +81,41 @@ std::optional<SyncedPlace> placeOf(const std::string& path, const IsRoot& isRoot
     }
 }
 
+/// Tells the marks of roots, by a configuration read once.
+class Marks {
+public:
+    /// Whose mark an open folder carries, and its name.
+    SyncMark markOf(int folder, const struct stat& status, std::string& name) const {
+        for (const SyncthingMark& mark : m_unusual)
+            if (isSameItem(mark.root, status) && holds(folder, mark.name.c_str())) {
+                name = mark.name;
+                return SyncMark::Syncthing;
+            }
+        if (holds(folder, usualSyncthingMark)) {
+            name = usualSyncthingMark;
+            return SyncMark::Syncthing;
+        }
+        auto journal = nextcloudJournalIn(folder);
+        if (!journal)
+            return SyncMark::None;
+        name = std::move(*journal);
+        return SyncMark::Nextcloud;
+    }
+
+private:
+    static bool holds(int folder, const char* name) {
+        return ::faccessat(folder, name, F_OK, 0) == 0;
+    }
+
+    std::vector<SyncthingMark> m_unusual = unusualSyncthingMarks();
+};
+
 }  // namespace
 
-SyncMark syncMarkOf(int folder, std::string& name) {
-    if (::faccessat(folder, kSyncthingMark, F_OK, 0) == 0) {
-        name = kSyncthingMark;
-        return SyncMark::Syncthing;
-    }
-    auto journal = nextcloudJournalIn(folder);
-    if (!journal)
-        return SyncMark::None;
-    name = std::move(*journal);
-    return SyncMark::Nextcloud;
-}
-
 std::optional<SyncedPlace> markedPlaceOf(const std::string& path) {
-    return placeOf(path, [](int folder, SyncedPlace& place) {
-        place.mark = syncMarkOf(folder, place.markName);
+    const Marks marks;
+    return placeOf(path, [&marks](int folder, SyncedPlace& place) {
+        place.mark = marks.markOf(folder, place.root, place.markName);
         return place.mark != SyncMark::None;
     });
 }
@@ -128,11 +136,14 @@ std::optional<SyncedPlace> desktopPlaceOf(const std::string& path,
 
 std::optional<std::string> markedRootAbove(const std::string& folder) {
     const std::unique_ptr<char, void (*)(void*)> real(::realpath(folder.c_str(), nullptr), &::free);
+    const Marks marks;
     std::optional<std::string> root;
     std::string name;
+    struct stat status {};
     for (std::string path = real ? real.get() : "/"; path != "/"; path = parentFolderOf(path)) {
         const FileDescriptor opened = openFolder(AT_FDCWD, path.c_str(), O_PATH);
-        if (opened && syncMarkOf(opened.get(), name) != SyncMark::None)
+        if (opened && ::fstat(opened.get(), &status) == 0 &&
+            marks.markOf(opened.get(), status, name) != SyncMark::None)
             root = path;
     }
     return root;

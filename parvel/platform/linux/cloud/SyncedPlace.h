@@ -34,9 +34,6 @@ struct SyncedPlace {
     std::string client;   ///< of a root of the desktop's
 };
 
-/// Whose mark an open folder carries, as the root of what a client synchronises, and its name.
-[[nodiscard]] SyncMark syncMarkOf(int folder, std::string& name);
-
 /// The nearest root above the item, by the marks on the disk. None, with errno set, when the item's
 /// own folder or the way up from it can't be reached; outside of every root, a place without mark.
 [[nodiscard]] std::optional<SyncedPlace> markedPlaceOf(const std::string& path);

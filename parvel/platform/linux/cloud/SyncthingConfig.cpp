@@ -45,9 +45,20 @@ std::string expanded(const std::string& path) {
     return home && (path == "~" || path.starts_with("~/")) ? home + path.substr(1) : path;
 }
 
-bool isFolderAt(const std::string& path, const struct stat& root) {
-    struct stat status {};
-    return ::stat(expanded(path).c_str(), &status) == 0 && isSameItem(status, root);
+/// Each configuration that can be read.
+std::vector<std::shared_ptr<const XmlDocument>> configurations() {
+    std::vector<std::shared_ptr<const XmlDocument>> documents;
+    for (const std::string& file : configurationFiles()) {
+        const URL url = URL::fileURLWithPath(file);
+        const auto bytes = Service<FileReader>::current().readFile(url, kLargestConfiguration);
+        if (auto document = bytes ? Service<XmlParser>::current().parse(*bytes, url) : nullptr)
+            documents.push_back(std::move(document));
+    }
+    return documents;
+}
+
+bool findRoot(const std::string& path, struct stat& root) {
+    return ::stat(expanded(path).c_str(), &root) == 0;
 }
 
 std::optional<XmlNode> element(const XmlDocument& document, const std::string& expression) {
@@ -135,7 +146,8 @@ std::optional<SyncthingFolder> folderIn(const XmlDocument& document, const struc
             return std::nullopt;
         const auto path = document.attribute(node->node, "path");
         const auto id = document.attribute(node->node, "id");
-        if (!path || !id || !isFolderAt(*path, root))
+        struct stat status {};
+        if (!path || !id || !findRoot(*path, status) || !isSameItem(status, root))
             continue;
         SyncthingFolder folder{*id, {}, 0, {}};
         setInterface(folder, document);
@@ -144,21 +156,37 @@ std::optional<SyncthingFolder> folderIn(const XmlDocument& document, const struc
     return std::nullopt;
 }
 
+void addUnusualMarks(const XmlDocument& document, std::vector<SyncthingMark>& marks) {
+    const std::string unusual = std::string("/configuration/folder[markerName!='") +
+                                usualSyncthingMark + "' and markerName!='']";
+    for (int number = 1; number <= kMostFolders; ++number) {
+        const std::string each = unusual + "[" + std::to_string(number) + "]";
+        const std::optional<XmlNode> node = element(document, each);
+        if (!node)
+            return;
+        const auto path = document.attribute(node->node, "path");
+        struct stat root {};
+        if (path && findRoot(*path, root))
+            marks.push_back({root, textOf(document, each + "/markerName")});
+    }
+}
+
 }  // namespace
+
+std::vector<SyncthingMark> unusualSyncthingMarks() {
+    std::vector<SyncthingMark> marks;
+    for (const auto& document : configurations())
+        addUnusualMarks(*document, marks);
+    return marks;
+}
 
 std::optional<SyncthingFolder> syncthingFolderAt(const std::string& root) {
     struct stat status {};
     if (::stat(root.c_str(), &status) != 0)
         return std::nullopt;
-    for (const std::string& file : configurationFiles()) {
-        const URL url = URL::fileURLWithPath(file);
-        const auto bytes = Service<FileReader>::current().readFile(url, kLargestConfiguration);
-        const auto document = bytes ? Service<XmlParser>::current().parse(*bytes, url) : nullptr;
-        if (!document)
-            continue;
+    for (const auto& document : configurations())
         if (auto folder = folderIn(*document, status))
             return folder;
-    }
     return std::nullopt;
 }
 

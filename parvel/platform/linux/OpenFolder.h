@@ -1,0 +1,16 @@
+#pragma once
+
+#include <fcntl.h>
+
+#include "parvel/platform/linux/FileDescriptor.h"
+#include "parvel/platform/linux/SystemCall.h"
+
+namespace parvel::host {
+
+/// Opens a folder by its name in another; none, with errno set, also for what is no folder.
+inline FileDescriptor openFolder(int parent, const char* name, int flags) {
+    return FileDescriptor(
+        retried([&] { return ::openat(parent, name, O_DIRECTORY | O_CLOEXEC | flags); }));
+}
+
+}  // namespace parvel::host

@@ -36,9 +36,13 @@ public:
     [[nodiscard]] virtual std::optional<URL> placeholderFile(const URL& url) = 0;
     /// Whether two items lie below the same root.
     [[nodiscard]] virtual bool lieBelowOneRoot(const URL& left, const URL& right) = 0;
-    /// Has the client download an item that is not all on this device, and waits for it. True at
-    /// once for any other item. ETIMEDOUT, with nothing touched, where it is not here within a
-    /// minute, or no client is there to fetch it.
+    /// Whether nothing of the item is still to come, so that moving it away moves the whole of it.
+    /// A file is whole once it has its name; a package is not while its client gives no clear
+    /// answer.
+    [[nodiscard]] virtual bool isAllHere(const URL& url) = 0;
+    /// Has the client download an item that is not all here, and waits for it. True at once for any
+    /// other item. ETIMEDOUT, with nothing touched, where it is not here within a minute, or no
+    /// client is there to fetch it.
     [[nodiscard]] virtual bool fetchContent(const URL& url, ErrorOut error = nullptr) = 0;
     /// What cloudReportForURL gives.
     [[nodiscard]] virtual std::optional<CloudReport> report(const URL& url,

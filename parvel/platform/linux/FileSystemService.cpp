@@ -69,7 +69,7 @@ public:
     bool replaceItem(const URL& existing, const URL& replacement, ReplaceOptions options,
                      std::optional<URL>* resulting, ErrorOut error) override {
         if (!fetchBeforeLeaving(replacement, existing, error) ||
-            (cloud().placeholderFile(existing) && !cloud().fetchContent(existing, error)))
+            (itemExistsAtPath(existing.path()) && !cloud().fetchContent(existing, error)))
             return false;
         const int failure = m_items->replace(existing.path(), replacement.path(), options);
         if (failure != 0)

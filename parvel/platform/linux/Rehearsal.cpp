@@ -188,11 +188,9 @@ public:
     bool lieBelowOneRoot(const URL& left, const URL& right) override {
         return m_store.lieBelowOneRoot(left, right);
     }
+    bool isAllHere(const URL& url) override { return m_store.isAllHere(url); }
     bool fetchContent(const URL& url, ErrorOut error) override {
-        std::optional<DownloadingStatus> status;
-        const bool isNeeded =
-            m_store.downloadingStatus(url, status) && status == DownloadingStatus::NotDownloaded;
-        return !isNeeded || fail(error, makePOSIXError(ETIMEDOUT, url));
+        return m_store.isAllHere(url) || fail(error, makePOSIXError(ETIMEDOUT, url));
     }
     std::optional<CloudReport> report(const URL& url, ErrorOut error) override {
         return m_store.report(url, error);

@@ -142,6 +142,18 @@ TEST_F(CloudMoves, APlaceholderIsDownloadedBeforeItIsReplaced) {
     EXPECT_EQ(m_cloud.fetches, 1);
 }
 
+TEST_F(CloudMoves, APackageWithPlaceholdersInItIsNotReplaced) {
+    m_folder.write("root/p.epub/mimetype.nextcloud", " ");
+    m_folder.write("local/p.epub/mimetype", "new");
+
+    EXPECT_FALSE(m_service->replaceItem(m_folder.url("root/p.epub"), m_folder.url("local/p.epub"),
+                                        ReplaceOptions::Default, nullptr, &m_error));
+
+    expectError(PVPOSIXErrorDomain, ETIMEDOUT, "root/p.epub");
+    EXPECT_TRUE(exists("root/p.epub/mimetype.nextcloud"));
+    EXPECT_TRUE(exists("local/p.epub/mimetype"));
+}
+
 TEST_F(CloudMoves, APlaceholderIsRemovedWithNoDownload) {
     EXPECT_TRUE(m_service->removeItem(m_folder.url("root/a.epub"), &m_error));
 

@@ -1,5 +1,6 @@
 #include "parvel/platform/linux/cloud/NextcloudClient.h"
 
+#include <atomic>
 #include <filesystem>
 #include <mutex>
 #include <vector>
@@ -318,7 +319,11 @@ TEST_F(NextcloudDownload, APackageIsHereOnceNoPlaceholderIsLeftInIt) {
     m_folder.write("root/p.epub/mimetype", "x");
     m_folder.write("root/p.epub/OPS/a.nextcloud", " ");
     m_folder.write("root/p.epub/OPS/b.nextcloud", " ");
-    serve([this](StandInConnection&, const std::string&) {
+    serve([this](StandInConnection& connection, const std::string& line) {
+        if (line.starts_with("RETRIEVE")) {
+            connection.send("STATUS:OK" + line.substr(line.find(':')) + "\n");
+            return;
+        }
         for (const char* name : {"root/p.epub/OPS/a", "root/p.epub/OPS/b"}) {
             std::this_thread::sleep_for(milliseconds(100));
             m_folder.write(name, "content");
@@ -330,12 +335,69 @@ TEST_F(NextcloudDownload, APackageIsHereOnceNoPlaceholderIsLeftInIt) {
     EXPECT_TRUE(std::filesystem::exists(m_folder / "root/p.epub/OPS/b"));
 }
 
-TEST_F(NextcloudDownload, AnItemThatIsHereIsNotAskedFor) {
-    serveStatus("OK");
+TEST_F(NextcloudDownload, AFileThatIsHereIsNotAskedFor) {
+    serveStatus("SYNC");
 
     EXPECT_TRUE(fetch("root/a.epub"));
+    EXPECT_THAT(lines(), IsEmpty());
+}
+
+TEST_F(NextcloudDownload, APackageThatTheClientIsBusyWithIsAwaited) {
+    m_folder.write("root/p.epub/mimetype", "x");
+    std::atomic<int> questions{0};
+    serve([&](StandInConnection& connection, const std::string& line) {
+        const bool isDone = ++questions > 3;
+        if (isDone)
+            m_folder.write("root/p.epub/last", "content");
+        connection.send((isDone ? "STATUS:OK" : "STATUS:SYNC") + line.substr(line.find(':')) +
+                        "\n");
+    });
+
+    EXPECT_TRUE(fetch("root/p.epub"));
+
+    EXPECT_TRUE(std::filesystem::exists(m_folder / "root/p.epub/last"));
+    const std::string question = "RETRIEVE_FILE_STATUS:" + (m_folder / "root/p.epub");
     EXPECT_THAT(lines(),
-                ElementsAre("VERSION:", "RETRIEVE_FILE_STATUS:" + (m_folder / "root/a.epub")));
+                ElementsAre("VERSION:", question, "VERSION:", question, question, question));
+}
+
+TEST_F(NextcloudDownload, APackageIsNotAllHereAfterAnUnclearAnswer) {
+    m_folder.write("root/p.epub/mimetype", "x");
+    serveStatus("FINE");
+
+    EXPECT_FALSE(m_store.isAllHere(m_folder.url("root/p.epub")));
+    EXPECT_FALSE(fetch("root/p.epub"));
+
+    expectTimedOut("root/p.epub");
+    EXPECT_LT(m_took, milliseconds(4000));
+}
+
+TEST_F(NextcloudDownload, APackageIsAllHereWhereTheClientDoesNotRunOrIsDone) {
+    m_folder.write("root/p.epub/mimetype", "x");
+    EXPECT_TRUE(fetch("root/p.epub"));
+
+    for (const char* word : {"OK", "NOP", "IGNORE", "ERROR"}) {
+        serveStatus(word);
+        EXPECT_TRUE(fetch("root/p.epub")) << word;
+        m_server.reset();
+        std::filesystem::remove(m_folder / "Nextcloud/socket");
+    }
+}
+
+TEST_F(NextcloudDownload, AClientThatClosesOverAPackageFailsAtOnce) {
+    m_folder.write("root/p.epub/mimetype", "x");
+    serveRaw([this](StandInConnection& connection) {
+        connection.send("REGISTER_PATH:" + m_registered + "\n" + kHello);
+        std::string line;
+        for (int count = 0; count < 2 && connection.readLine(line); ++count) {
+        }
+        connection.send("STATUS:SYNC" + line.substr(line.find(':')) + "\n");
+    });
+
+    EXPECT_FALSE(fetch("root/p.epub"));
+
+    expectTimedOut("root/p.epub");
+    EXPECT_LT(m_took, milliseconds(1500));
 }
 
 TEST_F(NextcloudDownload, WhatDoesNotComeInTimeFails) {

@@ -1,6 +1,5 @@
 #include "parvel/platform/CloudStore.h"
 
-#include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -10,9 +9,8 @@
 
 #include "parvel/platform/Service.h"
 #include "parvel/platform/linux/DirectoryStream.h"
-#include "parvel/platform/linux/FileDescriptor.h"
 #include "parvel/platform/linux/ItemTree.h"
-#include "parvel/platform/linux/SystemCall.h"
+#include "parvel/platform/linux/OpenFolder.h"
 #include "parvel/platform/linux/cloud/DesktopRoots.h"
 #include "parvel/platform/linux/cloud/HostCloudStore.h"
 
@@ -20,38 +18,39 @@ namespace parvel {
 
 namespace {
 
-/// A package with more entries or levels than these is taken for one that is not all there: nobody
-/// reads its content then.
+/// A package with more entries or levels than these is taken for one that is not all there, as one
+/// that can't be looked through: nobody reads its content then.
 constexpr int mostEntries = 100'000;
 constexpr int mostLevels = 64;
 
-host::FileDescriptor openFolder(int parent, const char* name, int flags) {
-    return host::FileDescriptor(
-        host::retried([&] { return ::openat(parent, name, O_DIRECTORY | O_CLOEXEC | flags); }));
+/// Whether a file of that name stands for another that is still to come: Nextcloud's placeholder,
+/// or what Syncthing has of a file that is on its way.
+bool isStandIn(std::string_view name) {
+    return name.ends_with(host::nextcloudPlaceholderSuffix) ||
+           (name.starts_with(".syncthing.") && name.ends_with(".tmp"));
 }
 
-/// Whether a placeholder file stands anywhere in the folder, no link followed.
-bool holdsPlaceholder(host::FileDescriptor folder, int levels, int& entriesLeft) {
+/// Whether such a file stands anywhere in the folder, no link followed; true where nobody can tell.
+bool holdsStandIn(host::FileDescriptor folder, int levels, int& entriesLeft) {
     host::DirectoryStream entries(std::move(folder));
-    if (!entries.isOpen())
-        return false;
-    if (levels == 0)
+    if (!entries.isOpen() || levels == 0)
         return true;
     while (const dirent* entry = entries.next()) {
         if (--entriesLeft < 0)
             return true;
-        host::FileDescriptor inner;
-        if (entry->d_type == DT_DIR || entry->d_type == DT_UNKNOWN)
-            inner = openFolder(entries.descriptor(), entry->d_name, O_RDONLY | O_NOFOLLOW);
-        if (inner) {
-            if (holdsPlaceholder(std::move(inner), levels - 1, entriesLeft))
+        bool isFile = entry->d_type == DT_REG;
+        if (entry->d_type == DT_DIR || entry->d_type == DT_UNKNOWN) {
+            auto inner =
+                host::openFolder(entries.descriptor(), entry->d_name, O_RDONLY | O_NOFOLLOW);
+            isFile = !inner && errno == ENOTDIR;
+            const bool isGone = !inner && errno == ENOENT;
+            if (!isFile && !isGone && holdsStandIn(std::move(inner), levels - 1, entriesLeft))
                 return true;
-        } else if (std::string_view(entry->d_name).ends_with(host::nextcloudPlaceholderSuffix) &&
-                   (entry->d_type == DT_REG || entry->d_type == DT_UNKNOWN)) {
-            return true;
         }
+        if (isFile && isStandIn(entry->d_name))
+            return true;
     }
-    return false;
+    return errno != 0;
 }
 
 bool isThere(const std::string& path) {
@@ -62,16 +61,44 @@ std::string placeholderPath(const std::string& path) {
     return path + std::string(host::nextcloudPlaceholderSuffix);
 }
 
-/// As far as the disk shows it: the item stands there, and no part of it as a placeholder.
+/// As far as the disk shows it: the item stands there, and for no part of it stands another file.
 bool hasAllContent(const std::string& path) {
     if (!isThere(path))
         return false;
     int entriesLeft = mostEntries;
-    return !holdsPlaceholder(openFolder(AT_FDCWD, path.c_str(), O_RDONLY), mostLevels, entriesLeft);
+    auto folder = host::openFolder(AT_FDCWD, path.c_str(), O_RDONLY);
+    const bool isNoFolder = !folder && errno == ENOTDIR;
+    return isNoFolder || !holdsStandIn(std::move(folder), mostLevels, entriesLeft);
 }
 
 std::string parentPath(const URL& url) {
     return std::string(pathWithoutLastComponent(url.path()));
+}
+
+/// Whether the item stands there and is no folder. Such a file has its name since it is whole, and
+/// a link is moved and removed as a link.
+bool isFileOrLink(const URL& url) {
+    struct stat status {};
+    return ::lstat(url.path().c_str(), &status) == 0 && !S_ISDIR(status.st_mode);
+}
+
+std::optional<DownloadingStatus> statusOf(host::ClientWord word, bool stands) {
+    using host::ClientWord;
+    switch (word) {
+        case ClientWord::Unclear:
+            return std::nullopt;
+        case ClientWord::NotDownloaded:
+        case ClientWord::LeftOut:
+            return DownloadingStatus::NotDownloaded;
+        case ClientWord::Current:
+            return stands ? std::optional(DownloadingStatus::Current) : std::nullopt;
+        case ClientWord::NotKept:
+        case ClientWord::Unknown:
+        case ClientWord::Downloaded:
+        case ClientWord::Busy:
+            break;
+    }
+    return stands ? std::optional(DownloadingStatus::Downloaded) : std::nullopt;
 }
 
 }  // namespace
@@ -101,25 +128,13 @@ HostCloudStore::State HostCloudStore::stateOf(const SyncedPlace& place) {
     if (place.mark == SyncMark::Desktop)
         return {std::nullopt, "the desktop tells of the folder and of no single items"};
     if (isThere(path) ? !hasAllContent(path) : isThere(placeholderPath(path)))
-        return {DownloadingStatus::NotDownloaded, "a placeholder stands for it or a part of it"};
+        return {DownloadingStatus::NotDownloaded, "a placeholder stands for it or a part of it",
+                /*isToCome=*/true};
 
     const ClientAnswer answer = ask(place);
-    const auto onDisk = [&place](DownloadingStatus status) {
-        return place.item.stands ? std::optional(status) : std::nullopt;
-    };
-    switch (answer.word) {
-        case ClientWord::Unclear:
-            break;
-        case ClientWord::NotKept:
-        case ClientWord::Unknown:
-        case ClientWord::Downloaded:
-            return {onDisk(DownloadingStatus::Downloaded), answer.reason};
-        case ClientWord::Current:
-            return {onDisk(DownloadingStatus::Current), answer.reason};
-        case ClientWord::NotDownloaded:
-            return {DownloadingStatus::NotDownloaded, answer.reason};
-    }
-    return {std::nullopt, answer.reason};
+    const bool isToCome = place.item.stands ? place.item.isFolder && !isSettled(answer.word)
+                                            : answer.word == ClientWord::NotDownloaded;
+    return {statusOf(answer.word, place.item.stands), answer.reason, isToCome};
 }
 
 std::shared_ptr<const std::vector<DesktopRoot>> HostCloudStore::toldRoots() {
@@ -201,12 +216,22 @@ bool HostCloudStore::lieBelowOneRoot(const URL& left, const URL& right) {
     return other && other->mark != SyncMark::None && isSameItem(place->root, other->root);
 }
 
+/// None for an item of which nothing is to come.
+std::optional<SyncedPlace> HostCloudStore::placeToFetch(const URL& url) {
+    if (!url.isFileURL() || isFileOrLink(url))
+        return std::nullopt;
+    std::optional<SyncedPlace> place = markedPlaceOf(url.path());
+    const bool isToCome = place && place->mark != SyncMark::None && stateOf(*place).isToCome;
+    return isToCome ? std::move(place) : std::nullopt;
+}
+
+bool HostCloudStore::isAllHere(const URL& url) {
+    return !placeToFetch(url);
+}
+
 bool HostCloudStore::fetchContent(const URL& url, ErrorOut error) {
-    const std::optional<SyncedPlace> place =
-        url.isFileURL() ? markedPlaceOf(url.path()) : std::nullopt;
-    if (!place || place->mark == SyncMark::None)
-        return true;
-    if (stateOf(*place).status != DownloadingStatus::NotDownloaded)
+    const std::optional<SyncedPlace> place = placeToFetch(url);
+    if (!place)
         return true;
     const Deadline deadline = std::chrono::steady_clock::now() + m_waits.download;
     const std::string path = place->item.path();

@@ -26,6 +26,7 @@ public:
                            ErrorOut error) override;
     std::optional<URL> placeholderFile(const URL& url) override;
     bool lieBelowOneRoot(const URL& left, const URL& right) override;
+    bool isAllHere(const URL& url) override;
     bool fetchContent(const URL& url, ErrorOut error) override;
     std::optional<CloudReport> report(const URL& url, ErrorOut error) override;
 
@@ -38,12 +39,14 @@ private:
     struct State {
         std::optional<DownloadingStatus> status;
         std::string_view reason;
+        bool isToCome = false;  ///< the item or a part of it, as far as anybody can tell
     };
 
     [[nodiscard]] Asked& clientOf(SyncMark mark);
     [[nodiscard]] ClientAnswer ask(const SyncedPlace& place);
     [[nodiscard]] State stateOf(const SyncedPlace& place);
     [[nodiscard]] std::optional<SyncedPlace> placeOf(const URL& url);
+    [[nodiscard]] std::optional<SyncedPlace> placeToFetch(const URL& url);
     [[nodiscard]] std::shared_ptr<const std::vector<DesktopRoot>> toldRoots();
 
     CloudWaits m_waits;

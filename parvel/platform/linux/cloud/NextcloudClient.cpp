@@ -44,6 +44,23 @@ std::optional<std::string> sendablePath(const std::string& path) {
     return U_SUCCESS(status) ? std::optional(normalized) : std::nullopt;
 }
 
+ClientAnswer answerOfStatus(std::string_view status) {
+    // A shared item's mark.
+    if (status.ends_with("+SWM"))
+        status.remove_suffix(4);
+    if (status == "OK")
+        return {ClientWord::Current, "the client says that the item is in step"};
+    if (status == "SYNC")
+        return {ClientWord::Busy, "the client is still busy with the item"};
+    if (status == "NOP")
+        return {ClientWord::Unknown, "the client does not know the item yet"};
+    if (status == "IGNORE")
+        return {ClientWord::Downloaded, "the client leaves the item out, or warns of it"};
+    if (status == "ERROR")
+        return {ClientWord::Downloaded, "the client could not bring the item into step"};
+    return {ClientWord::Unclear, "the client's answer is not understood"};
+}
+
 /// One conversation with the client, which begins with it telling the folders that it keeps.
 class Conversation {
 public:
@@ -91,6 +108,13 @@ public:
         return outcome;
     }
 
+    /// Whether the client says that nothing of the folder is still to come.
+    bool isSettledAt(const std::string& path) {
+        std::string status;
+        return retrieveStatus(path, status) == SocketOutcome::Done &&
+               isSettled(answerOfStatus(status).word);
+    }
+
     SocketOutcome makeAvailable(const std::string& path) {
         // A file goes by the name of its placeholder too; the separator stands between items.
         return m_socket.send("MAKE_AVAILABLE_LOCALLY:" + path + "\x1e" + path +
@@ -117,23 +141,6 @@ private:
     int m_linesLeft = kMostLines;
     std::optional<std::string> m_folder;
 };
-
-ClientAnswer answerOfStatus(std::string_view status) {
-    // A shared item's mark.
-    if (status.ends_with("+SWM"))
-        status.remove_suffix(4);
-    if (status == "OK")
-        return {ClientWord::Current, "the client says that the item is in step"};
-    if (status == "SYNC")
-        return {ClientWord::Downloaded, "the client is still busy with the item"};
-    if (status == "NOP")
-        return {ClientWord::Unknown, "the client does not know the item yet"};
-    if (status == "IGNORE")
-        return {ClientWord::Downloaded, "the client leaves the item out, or warns of it"};
-    if (status == "ERROR")
-        return {ClientWord::Downloaded, "the client could not bring the item into step"};
-    return {ClientWord::Unclear, "the client's answer is not understood"};
-}
 
 ClientAnswer answerOfFailure(SocketOutcome outcome) {
     switch (outcome) {
@@ -169,16 +176,19 @@ bool NextcloudClient::fetch(const SyncedItem& item, const std::function<bool()>&
     if (conversation.begin(item) != SocketOutcome::Done)
         return false;
     const std::optional<std::string> path = conversation.pathOf(item);
-    if (!path || conversation.makeAvailable(*path) != SocketOutcome::Done)
+    if (!path || (!isHere() && conversation.makeAvailable(*path) != SocketOutcome::Done))
         return false;
-    while (!isHere()) {
+    for (SyncedItem awaited = item;;) {
+        const bool hasCome = isHere();
+        awaited.look();
+        if (hasCome && (!awaited.isFolder || conversation.isSettledAt(*path)))
+            return true;
         const auto now = std::chrono::steady_clock::now();
         if (now >= deadline)
             return false;
         if (conversation.listen(std::min(deadline, now + kSocketLook)) != SocketOutcome::TimedOut)
-            return isHere();
+            return isHere() && !awaited.isFolder;
     }
-    return true;
 }
 
 }  // namespace parvel::host

@@ -34,8 +34,28 @@ enum class ClientWord {
     Unknown,  ///< the client has no such item, or none yet
     Current,
     Downloaded,  ///< all here, and not what the client holds for current
+    Busy,        ///< here, and the client is still at work on it
+    LeftOut,     ///< the client does not bring this item, nor does it tell others of it
     NotDownloaded,
 };
+
+/// Whether nothing of a folder that stands is still to come. A file has its name once it is whole,
+/// with every client; a package fills up file by file.
+[[nodiscard]] inline bool isSettled(ClientWord word) {
+    switch (word) {
+        case ClientWord::NotKept:
+        case ClientWord::Unknown:
+        case ClientWord::Current:
+        case ClientWord::Downloaded:
+        case ClientWord::LeftOut:
+            return true;
+        case ClientWord::Unclear:
+        case ClientWord::Busy:
+        case ClientWord::NotDownloaded:
+            break;
+    }
+    return false;
+}
 
 struct ClientAnswer {
     ClientWord word;

@@ -127,15 +127,17 @@ std::optional<Version> versionOf(const Dictionary& answer, std::string_view side
     return result;
 }
 
+/// What stands under the name without a version of this device is none that the client brought.
 ClientAnswer answerOfVersions(const Version& local, const Version& global, bool stands) {
     const bool isOffered = !global.counters.empty() && !global.isDeleted;
-    if (!stands && isOffered)
+    const bool isHeld = stands && !local.counters.empty() && !local.isDeleted;
+    if (!isHeld && isOffered)
         return {ClientWord::NotDownloaded, "the client lists the item and has not brought it yet"};
-    if (!stands || (local.counters.empty() && !isOffered))
+    if (!isHeld)
         return {ClientWord::Unknown, "the client does not know the item yet"};
     if (local.isLeftOut)
-        return {ClientWord::Downloaded, "the client leaves the item out"};
-    if (isOffered && !local.isDeleted && local.counters == global.counters)
+        return {ClientWord::LeftOut, "the client leaves the item out"};
+    if (isOffered && local.counters == global.counters)
         return {ClientWord::Current, "this device has the newest version that the client knows"};
     return {ClientWord::Downloaded,
             "this device's version is not the newest that the client knows"};
@@ -216,21 +218,19 @@ ClientAnswer SyncthingClient::ask(const SyncedItem& item, Deadline deadline) {
     if (folder->addressLength == 0)
         return {ClientWord::NotKept, "the client has no plain interface on the loopback"};
     const ClientAnswer answer = answerOfIndex(*folder, item, deadline);
-    const bool isAnswer = answer.word == ClientWord::Current ||
-                          answer.word == ClientWord::Downloaded ||
-                          answer.word == ClientWord::Unknown;
-    return isAnswer && item.stands && item.isFolder
-               ? answerOfPackage(*folder, item, answer, deadline)
-               : answer;
+    const bool isAnswer = isSettled(answer.word) && answer.word != ClientWord::NotKept;
+    return isAnswer && item.isFolder ? answerOfPackage(*folder, item, answer, deadline) : answer;
 }
 
 bool SyncthingClient::fetch(const SyncedItem& item, const std::function<bool()>& isHere,
                             Deadline deadline) {
     for (SyncedItem awaited = item;;) {
-        awaited.stands = isHere();
+        awaited.look();
+        const bool hasCome = isHere();
+        if (hasCome && !awaited.isFolder)
+            return true;
         const ClientWord word = ask(awaited, deadline).word;
-        const bool isWhole = word == ClientWord::Current || word == ClientWord::Downloaded;
-        if (awaited.stands && isWhole)
+        if (hasCome && word != ClientWord::NotKept && isSettled(word))
             return true;
         const auto now = std::chrono::steady_clock::now();
         if (word == ClientWord::NotKept || now >= deadline)

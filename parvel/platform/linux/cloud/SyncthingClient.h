@@ -5,8 +5,8 @@
 namespace parvel::host {
 
 /// Syncthing, found by its configuration and asked over its REST interface on the loopback. It
-/// downloads by itself, and renames what has arrived whole, so that a file under its own name is
-/// all here; a package is, once nothing below it is needed any more.
+/// downloads by itself. What this device has no version of, or leaves out, is not downloaded, and a
+/// package is not as long as anything below it is needed.
 class SyncthingClient final : public SyncClient {
 public:
     [[nodiscard]] std::string_view name() const override { return "Syncthing"; }

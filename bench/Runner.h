@@ -1,30 +1,57 @@
 #pragma once
 
 #include <cstdio>
-#include <cstring>
+#include <filesystem>
 #include <fstream>
 #include <string>
+#include <string_view>
 #include <vector>
 
 namespace parvel::bench {
 
-/// A contender: reads each file named in the list (one path a line) given as its first argument,
-/// and prints how many it could read.
-template <class Read>
-int runOver(int argumentCount, char** arguments, Read&& read) {
-    if (argumentCount < 2) {
-        std::fprintf(stderr, "usage: %s LIST\n", arguments[0]);
-        return 2;
+/// The words of a contender's command line: LIST, then what it takes besides.
+struct Arguments {
+    std::vector<std::string> paths;  ///< those in the list, one a line
+    std::vector<std::string> words;
+
+    [[nodiscard]] bool has(std::string_view word) const {
+        for (const std::string& each : words) {
+            if (each == word)
+                return true;
+        }
+        return false;
     }
-    std::ifstream list(arguments[1]);
-    std::vector<std::string> paths;
+};
+
+inline Arguments argumentsOf(int count, char** arguments) {
+    Arguments result;
+    result.words.assign(arguments + (count < 2 ? count : 2), arguments + count);
+    std::ifstream list(count < 2 ? "" : arguments[1]);
     for (std::string path; std::getline(list, path);)
-        paths.push_back(path);
+        result.paths.push_back(path);
+    return result;
+}
+
+/// Does the work for each path, and prints for how many it went well.
+template <class Work>
+int runOver(const Arguments& arguments, Work&& work) {
     std::size_t succeeded = 0;
-    for (const std::string& path : paths)
-        succeeded += read(path) ? 1 : 0;
-    std::printf("%zu of %zu\n", succeeded, paths.size());
+    for (const std::string& path : arguments.paths)
+        succeeded += work(path) ? 1 : 0;
+    std::printf("%zu of %zu\n", succeeded, arguments.paths.size());
     return 0;
+}
+
+/// The same for what writes: LIST INTO. The work gets a new folder below INTO for each path.
+template <class Work>
+int runInto(const Arguments& arguments, Work&& work) {
+    if (arguments.words.empty())
+        return 2;
+    std::size_t number = 0;
+    return runOver(arguments, [&](const std::string& path) {
+        const std::string folder = arguments.words[0] + "/" + std::to_string(number++);
+        return std::filesystem::create_directory(folder) && work(path, folder);
+    });
 }
 
 }  // namespace parvel::bench

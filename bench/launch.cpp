@@ -1,5 +1,6 @@
 // Runs a command with no output and prints what it and everything that it leaves behind took: CPU
-// microseconds, wall microseconds, peak kilobytes.
+// microseconds, wall microseconds, peak kilobytes. Its own status is the command's, 128 and the
+// signal's number for one that a signal ended.
 
 #include <fcntl.h>
 #include <sys/prctl.h>
@@ -12,6 +13,8 @@
 #include <cstdio>
 
 namespace {
+
+constexpr int kEndedBySignal = 128;
 
 long long microseconds(const timeval& time) {
     return time.tv_sec * 1'000'000LL + time.tv_usec;
@@ -49,7 +52,7 @@ int main(int argumentCount, char** arguments) {
             break;
         if (ended == started) {
             end = Clock::now();
-            result = WIFEXITED(status) ? WEXITSTATUS(status) : 1;
+            result = WIFEXITED(status) ? WEXITSTATUS(status) : kEndedBySignal + WTERMSIG(status);
         }
         processor += microseconds(usage.ru_utime) + microseconds(usage.ru_stime);
         peak = std::max(peak, usage.ru_maxrss);

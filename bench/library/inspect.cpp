@@ -1,13 +1,13 @@
-// The library, as an application calls it: the record of each file. A second argument "cover" asks
-// for the cover too.
+// The library, as an application calls it: the record of each file, with "cover" the cover too.
 
 #include "bench/Runner.h"
 #include "parvel/inspection/PVAssetMetadataInspector.h"
 
-int main(int argumentCount, char** arguments) {
+int main(int argumentCount, char** argumentWords) {
     using parvel::PVAssetMetadataInspector;
-    const bool withCover = argumentCount > 2 && std::strcmp(arguments[2], "cover") == 0;
-    return parvel::bench::runOver(argumentCount, arguments, [&](const std::string& path) {
+    const auto arguments = parvel::bench::argumentsOf(argumentCount, argumentWords);
+    const bool withCover = arguments.has("cover");
+    return parvel::bench::runOver(arguments, [&](const std::string& path) {
         const parvel::URL url = parvel::URL::fileURLWithPath(path);
         const parvel::AssetPtr record =
             withCover ? PVAssetMetadataInspector::metadataIncludingCoverForAssetAtURL_error(url)

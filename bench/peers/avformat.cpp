@@ -6,9 +6,10 @@ extern "C" {
 
 #include "bench/Runner.h"
 
-int main(int argumentCount, char** arguments) {
+int main(int argumentCount, char** argumentWords) {
+    const auto arguments = parvel::bench::argumentsOf(argumentCount, argumentWords);
     av_log_set_level(AV_LOG_QUIET);
-    return parvel::bench::runOver(argumentCount, arguments, [](const std::string& path) {
+    return parvel::bench::runOver(arguments, [](const std::string& path) {
         AVFormatContext* context = nullptr;
         if (avformat_open_input(&context, path.c_str(), nullptr, nullptr) != 0)
             return false;

@@ -30,6 +30,7 @@ bool readBook(const std::string& path) {
 
 }  // namespace
 
-int main(int argumentCount, char** arguments) {
-    return parvel::bench::runOver(argumentCount, arguments, readBook);
+int main(int argumentCount, char** argumentWords) {
+    const auto arguments = parvel::bench::argumentsOf(argumentCount, argumentWords);
+    return parvel::bench::runOver(arguments, readBook);
 }

@@ -6,12 +6,15 @@
 
 #include "bench/Runner.h"
 
-int main(int argumentCount, char** arguments) {
-    const QCoreApplication application(argumentCount, arguments);
-    const QString type = QString::fromLocal8Bit(argumentCount > 2 ? arguments[2] : "");
+int main(int argumentCount, char** argumentWords) {
+    const QCoreApplication application(argumentCount, argumentWords);
+    const auto arguments = parvel::bench::argumentsOf(argumentCount, argumentWords);
+    if (arguments.words.empty())
+        return 2;
+    const QString type = QString::fromStdString(arguments.words[0]);
     const KFileMetaData::ExtractorCollection collection;
     const QList<KFileMetaData::Extractor*> extractors = collection.fetchExtractors(type);
-    return parvel::bench::runOver(argumentCount, arguments, [&](const std::string& path) {
+    return parvel::bench::runOver(arguments, [&](const std::string& path) {
         KFileMetaData::SimpleExtractionResult result(
             QString::fromStdString(path), type, KFileMetaData::ExtractionResult::ExtractMetaData);
         for (KFileMetaData::Extractor* extractor : extractors)

@@ -42,9 +42,10 @@ void drawCover(PopplerDocument* document) {
 
 }  // namespace
 
-int main(int argumentCount, char** arguments) {
-    const bool withCover = argumentCount > 2 && std::strcmp(arguments[2], "cover") == 0;
-    return parvel::bench::runOver(argumentCount, arguments, [&](const std::string& path) {
+int main(int argumentCount, char** argumentWords) {
+    const auto arguments = parvel::bench::argumentsOf(argumentCount, argumentWords);
+    const bool withCover = arguments.has("cover");
+    return parvel::bench::runOver(arguments, [&](const std::string& path) {
         gchar* uri = g_filename_to_uri(path.c_str(), nullptr, nullptr);
         PopplerDocument* document = poppler_document_new_from_file(uri, nullptr, nullptr);
         g_free(uri);

@@ -4,8 +4,9 @@
 
 #include "bench/Runner.h"
 
-int main(int argumentCount, char** arguments) {
-    return parvel::bench::runOver(argumentCount, arguments, [](const std::string& path) {
+int main(int argumentCount, char** argumentWords) {
+    const auto arguments = parvel::bench::argumentsOf(argumentCount, argumentWords);
+    return parvel::bench::runOver(arguments, [](const std::string& path) {
         TagLib::MP4::File file(path.c_str(), false);
         return file.isValid() && file.tag() && !file.tag()->itemMap().isEmpty();
     });

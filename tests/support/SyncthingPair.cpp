@@ -65,8 +65,8 @@ void waitFor(int process) {
         ::waitpid(process, nullptr, 0);
 }
 
-/// The reply of a daemon's REST interface; empty where there is none.
-std::string restReply(int port, const std::string& resource) {
+/// The reply of a daemon's REST interface to a method with a resource; empty where there is none.
+std::string restReply(int port, const std::string& request) {
     sockaddr_in address{};
     address.sin_family = AF_INET;
     address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
@@ -74,11 +74,11 @@ std::string restReply(int port, const std::string& resource) {
     const int socket = ::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
     std::string reply;
     if (::connect(socket, reinterpret_cast<sockaddr*>(&address), sizeof address) == 0) {
-        const timeval second{1, 0};
-        ::setsockopt(socket, SOL_SOCKET, SO_RCVTIMEO, &second, sizeof second);
-        const std::string request =
-            "GET " + resource + " HTTP/1.0\r\nHost: localhost\r\nX-API-Key: secret\r\n\r\n";
-        ::send(socket, request.data(), request.size(), MSG_NOSIGNAL);
+        const timeval wait{10, 0};
+        ::setsockopt(socket, SOL_SOCKET, SO_RCVTIMEO, &wait, sizeof wait);
+        const std::string whole =
+            request + " HTTP/1.0\r\nHost: localhost\r\nX-API-Key: secret\r\n\r\n";
+        ::send(socket, whole.data(), whole.size(), MSG_NOSIGNAL);
         char buffer[4096];
         for (ssize_t length; (length = ::recv(socket, buffer, sizeof buffer, 0)) > 0;)
             reply.append(buffer, static_cast<std::size_t>(length));
@@ -93,7 +93,7 @@ bool SyncthingPair::isInstalled() {
     return ::access("/usr/bin/syncthing", X_OK) == 0;
 }
 
-SyncthingPair::SyncthingPair() {
+SyncthingPair::SyncthingPair(Scans scans) {
     for (std::size_t which : {0, 1}) {
         const std::string home = m_folder / ("home/" + m_names[which] + "/syncthing");
         waitFor(startProgram({"generate", "--home=" + home, "--no-default-folder"},
@@ -107,7 +107,7 @@ SyncthingPair::SyncthingPair() {
         m_guiPorts[which] = freePort();
     }
     for (std::size_t which : {0, 1})
-        configure(which);
+        configure(which, scans);
     for (std::size_t which : {0, 1})
         start(which);
     m_isConnected = waitUntilConnected();
@@ -121,7 +121,13 @@ SyncthingPair::~SyncthingPair() {
         waitFor(process);
 }
 
-void SyncthingPair::configure(std::size_t which) {
+bool SyncthingPair::scanFirst() const {
+    return restReply(m_guiPorts[0], "POST /rest/db/scan?folder=books").find(" 200 ") !=
+           std::string::npos;
+}
+
+void SyncthingPair::configure(std::size_t which, Scans scans) {
+    const bool isAlways = scans == Scans::Always;
     const std::size_t other = 1 - which;
     const auto device = [this](std::size_t of) { return "<device id=\"" + m_devices[of] + "\""; };
     const auto address = [](int port) { return "tcp://127.0.0.1:" + std::to_string(port); };
@@ -129,11 +135,13 @@ void SyncthingPair::configure(std::size_t which) {
     m_folder.write(
         "home/" + m_names[which] + "/syncthing/config.xml",
         "<configuration version=\"36\"><folder id=\"books\" path=\"" + (m_folder / m_names[which]) +
-            "\" type=\"sendreceive\" rescanIntervalS=\"1\" fsWatcherEnabled=\"true\" "
-            "fsWatcherDelayS=\"1\">" +
+            "\" type=\"sendreceive\" fsWatcherDelayS=\"1\" " +
+            (isAlways ? "rescanIntervalS=\"1\" fsWatcherEnabled=\"true\">"
+                      : "rescanIntervalS=\"0\" fsWatcherEnabled=\"false\">") +
             device(which) + "/>" + device(other) + "/></folder>" + device(which) +
             "><address>dynamic</address></device>" + device(other) + "><address>" +
-            address(m_ports[other]) +
+            // Only one calls the other: where both do at once, both hang up and wait.
+            (which == 0 ? "dynamic" : address(m_ports[other])) +
             "</address></device><gui enabled=\"true\" tls=\"false\"><address>127.0.0.1:" +
             std::to_string(m_guiPorts[which]) +
             "</address><apikey>secret</apikey></gui><options><listenAddress>" +
@@ -159,7 +167,7 @@ void SyncthingPair::start(std::size_t which) {
 bool SyncthingPair::waitUntilConnected() {
     const auto deadline = SteadyClock::now() + std::chrono::seconds(60);
     while (SteadyClock::now() < deadline) {
-        const std::string reply = restReply(m_guiPorts[1], "/rest/system/connections");
+        const std::string reply = restReply(m_guiPorts[1], "GET /rest/system/connections");
         if (reply.find("\"connected\": true") != std::string::npos)
             return true;
         std::this_thread::sleep_for(std::chrono::milliseconds(100));

@@ -14,10 +14,13 @@ namespace parvel::testing {
 /// second, and the first sends at most 200 KiB a second.
 class SyncthingPair {
 public:
+    /// When the daemons look for what has changed in their own folders.
+    enum class Scans { Always, OnDemand };
+
     /// Whether the program is installed.
     static bool isInstalled();
 
-    SyncthingPair();
+    explicit SyncthingPair(Scans scans = Scans::Always);
     ~SyncthingPair();
     SyncthingPair(const SyncthingPair&) = delete;
     SyncthingPair& operator=(const SyncthingPair&) = delete;
@@ -25,9 +28,11 @@ public:
     /// False where they do not come up and find each other in time.
     [[nodiscard]] bool isConnected() const { return m_isConnected; }
     [[nodiscard]] const TemporaryDirectory& folder() const { return m_folder; }
+    /// Has the first look through its folder now; whether it has.
+    [[nodiscard]] bool scanFirst() const;
 
 private:
-    void configure(std::size_t which);
+    void configure(std::size_t which, Scans scans);
     void start(std::size_t which);
     bool waitUntilConnected();
 

@@ -131,6 +131,8 @@ public:
     [[nodiscard]] bool contains(std::string_view key) const { return find(key) != nullptr; }
 
     void set(std::string_view key, Value value);
+    /// Makes room for so many entries in all.
+    void reserve(std::size_t entries) { m_entries.reserve(entries); }
     void remove(std::string_view key);
     /// Copies every entry of the other dictionary over this one's.
     void merge(const Dictionary& other);

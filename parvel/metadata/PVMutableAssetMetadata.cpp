@@ -14,6 +14,9 @@ namespace parvel {
 
 namespace {
 
+/// Few records have more.
+constexpr std::size_t usualEntries = 8;
+
 std::optional<Value> pathToStore(const std::optional<URL>& url) {
     return url ? std::optional<Value>(url->path()) : std::nullopt;
 }
@@ -34,6 +37,7 @@ std::optional<Value> normalizedStoreIDValue(const Value* storeID) {
 MutableAssetPtr PVMutableAssetMetadata::initWithURL_dictionary_validate(
     const std::optional<URL>& url, const Dictionary* dictionary, bool validate) {
     auto record = std::make_shared<PVMutableAssetMetadata>(Construction());
+    record->mutableDictionary().reserve(usualEntries);
     if (dictionary)
         record->mutableDictionary() = *dictionary;
     // Deliberate: without validation the URL is not kept.

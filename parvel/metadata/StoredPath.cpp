@@ -17,8 +17,10 @@ std::string pathWithLowercasedExtension(std::string_view path) {
     const std::string_view extension = extensionOfPath(path);
     if (extension.empty())
         return std::string(path);
-    std::string result(pathWithoutExtension(path));
-    return result.append(".").append(Service<TextRules>::current().lowercased(extension));
+    std::string result;
+    result.reserve(path.size());
+    result.append(pathWithoutExtension(path)).append(".");
+    return result.append(Service<TextRules>::current().lowercased(extension));
 }
 
 }  // namespace parvel

@@ -98,7 +98,7 @@ std::optional<Data> LibzipArchive::readWhole(std::uint64_t index, const ZipEntry
     const auto stored = std::make_unique_for_overwrite<std::uint8_t[]>(size);
     if (!file || !readFully(file.get(), stored.get(), size))
         return std::nullopt;
-    return m_decoder.decode(entry, {stored.get(), size});
+    return decodedEntry(entry, {stored.get(), size});
 }
 
 /// libzip checks the checksum when it meets the end, so the end is read too.

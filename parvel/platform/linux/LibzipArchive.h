@@ -53,7 +53,6 @@ private:
     std::uint64_t m_fileSize;
     LibzipSource m_source;
     LibzipHandle m_archive;
-    ZipDecoder m_decoder;
 };
 
 }  // namespace parvel::host

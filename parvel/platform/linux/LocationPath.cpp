@@ -48,10 +48,8 @@ public:
         path.m_isAbsolute = m_scanner.take("/");
         path.m_steps.reserve(kUsualSteps);
         do {
-            std::optional<Step> step = readStep();
-            if (!step || path.m_steps.size() == kMaximumSteps)
+            if (path.m_steps.size() == kMaximumSteps || !readStep(path.m_steps.emplace_back()))
                 return std::nullopt;
-            path.m_steps.push_back(*step);
         } while (!path.m_steps.back().isAttribute && m_scanner.take("/"));
         if (!m_scanner.atEnd())
             return std::nullopt;
@@ -59,24 +57,23 @@ public:
     }
 
 private:
-    std::optional<Step> readStep() {
-        Step step;
+    bool readStep(Step& step) {
         step.isAttribute = m_scanner.take("@");
         const std::string_view name = m_scanner.takeName();
         const std::size_t colon = name.find(':');
         step.name = colon == std::string_view::npos ? name : name.substr(colon + 1);
         if (!isPlainName(step.name))
-            return std::nullopt;
+            return false;
         if (colon != std::string_view::npos) {
             step.namespaceName = boundTo(name.substr(0, colon));
             if (step.namespaceName.empty() || step.isAttribute)
-                return std::nullopt;
+                return false;
         }
         while (m_scanner.take("[")) {
             if (step.isAttribute || !readPredicate(step))
-                return std::nullopt;
+                return false;
         }
-        return step;
+        return true;
     }
 
     std::string_view boundTo(std::string_view prefix) const {

@@ -1,6 +1,7 @@
 // Steps: one read of the file's tail gives the end record and, in a small archive, the directory;
 // else a second read fetches that. The directory is walked once for everything that makes it plain,
-// and again for each name that is sought. One read takes an entry's local header and data together.
+// and again for each name that is sought. One read takes an entry's local header and data together,
+// and what follows close behind.
 
 #include "parvel/platform/linux/PlainZip.h"
 
@@ -23,6 +24,8 @@ constexpr std::size_t tailLength = 4096;
 constexpr std::uint64_t largestKeptDirectory = 1ULL << 20;
 /// More than the longest record: 46 bytes and three fields of 65,535.
 constexpr std::size_t windowLength = 256U << 10;
+/// Of one read for short pieces.
+constexpr std::size_t usualWindowLength = 4096;
 /// Local extra fields of this length still come with the header's own read.
 constexpr std::uint64_t usualExtraLength = 64;
 /// What an entry may take of the file beside its data and name: local extra fields, alignment, a
@@ -301,11 +304,10 @@ PlainZip::Answer PlainZip::readEntry(std::string_view name, std::uint64_t limit,
     if (entry.isLarge())
         return Answer::Unsure;
 
-    Buffer buffer;
     Data::Bytes stored;
-    if (!readStored(entry, name.size(), buffer, stored))
+    if (!readStored(entry, name.size(), stored))
         return Answer::Unsure;
-    content = m_decoder.decode(entry, stored);
+    content = decodedEntry(entry, stored);
     return Answer::Sure;
 }
 
@@ -323,32 +325,45 @@ PlainZip::Search PlainZip::find(std::string_view name, ZipEntry& entry) const {
 }
 
 /// Reads the local header, the data behind it with it where the header is of the usual length.
-bool PlainZip::readStored(const ZipEntry& entry, std::size_t nameLength, Buffer& buffer,
-                          Data::Bytes& stored) const {
+bool PlainZip::readStored(const ZipEntry& entry, std::size_t nameLength, Data::Bytes& stored) {
     if (entry.offset > m_fileSize)
         return false;
     const std::uint64_t available = m_fileSize - entry.offset;
     const auto size = static_cast<std::size_t>(std::min<std::uint64_t>(
         available, zip::localHeaderLength + nameLength + usualExtraLength + entry.compressedSize));
-    buffer.bytes = std::make_unique_for_overwrite<std::uint8_t[]>(size);
-    if (size < zip::localHeaderLength || !readFully(m_file, entry.offset, buffer.bytes.get(), size))
-        return false;
-    const std::uint8_t* header = buffer.bytes.get();
-    if (std::memcmp(header, zip::localSignature, zip::signatureLength) != 0)
+    Data::Bytes piece;
+    if (size < zip::localHeaderLength || !provide(entry.offset, size, piece) ||
+        std::memcmp(piece.data(), zip::localSignature, zip::signatureLength) != 0)
         return false;
 
     const std::uint64_t start =
-        zip::localHeaderLength + zip::get16(header + 26) + zip::get16(header + 28);
+        zip::localHeaderLength + zip::get16(&piece[26]) + zip::get16(&piece[28]);
     const auto length = static_cast<std::size_t>(entry.compressedSize);
     if (start > available || length > available - start)
         return false;
     if (start + length <= size) {
-        stored = {buffer.bytes.get() + start, length};
+        stored = piece.subspan(start, length);
         return true;
     }
-    buffer.bytes = std::make_unique_for_overwrite<std::uint8_t[]>(length);
-    stored = {buffer.bytes.get(), length};
-    return readFully(m_file, entry.offset + start, buffer.bytes.get(), length);
+    return provide(entry.offset + start, length, stored);
+}
+
+/// Bytes that lie within the file, good until the next call. What is read for a short piece serves
+/// the pieces behind it too, for a book's documents often stand one after the other.
+bool PlainZip::provide(std::uint64_t offset, std::size_t size, Data::Bytes& bytes) {
+    const bool isInWindow = offset >= m_windowOffset && size <= m_window.size &&
+                            offset - m_windowOffset <= m_window.size - size;
+    if (!isInWindow) {
+        const std::size_t length = std::max(size, static_cast<std::size_t>(std::min<std::uint64_t>(
+                                                      m_fileSize - offset, usualWindowLength)));
+        m_window = {std::make_unique_for_overwrite<std::uint8_t[]>(length), 0};
+        if (!readFully(m_file, offset, m_window.bytes.get(), length))
+            return false;
+        m_window.size = length;
+        m_windowOffset = offset;
+    }
+    bytes = {m_window.bytes.get() + (offset - m_windowOffset), size};
+    return true;
 }
 
 }  // namespace parvel::host

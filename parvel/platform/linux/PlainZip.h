@@ -45,15 +45,17 @@ private:
     [[nodiscard]] bool keepDirectory(Buffer tail);
     [[nodiscard]] bool directoryIsPlain() const;
     [[nodiscard]] Search find(std::string_view name, ZipEntry& entry) const;
-    [[nodiscard]] bool readStored(const ZipEntry& entry, std::size_t nameLength, Buffer& buffer,
-                                  Data::Bytes& stored) const;
+    [[nodiscard]] bool readStored(const ZipEntry& entry, std::size_t nameLength,
+                                  Data::Bytes& stored);
+    [[nodiscard]] bool provide(std::uint64_t offset, std::size_t size, Data::Bytes& bytes);
 
     int m_file;
     std::uint64_t m_fileSize;
     EndRecord m_end;
     Buffer m_kept;            ///< the piece of the file that holds the directory
     Data::Bytes m_directory;  ///< within it; empty where it is too large to be kept
-    ZipDecoder m_decoder;
+    Buffer m_window;          ///< what was read last of the entries, served from while it lasts
+    std::uint64_t m_windowOffset = 0;
 };
 
 }  // namespace parvel::host

@@ -4,6 +4,8 @@
 #include <sys/stat.h>
 
 #include <algorithm>
+#include <memory>
+#include <new>
 
 namespace parvel::host {
 
@@ -23,6 +25,22 @@ constexpr std::uint64_t mostBytesPerByte = 1032;
 
 bool isLinkOrFolder(const ZipEntry& entry) {
     return S_ISLNK(entry.unixMode()) || S_ISDIR(entry.unixMode());
+}
+
+struct FreeDecompressor {
+    void operator()(libdeflate_decompressor* decompressor) const {
+        libdeflate_free_decompressor(decompressor);
+    }
+};
+
+/// Kept until the thread ends: making one takes as long as inflating a container document.
+libdeflate_decompressor* threadDecompressor() {
+    thread_local std::unique_ptr<libdeflate_decompressor, FreeDecompressor> decompressor;
+    if (!decompressor)
+        decompressor.reset(libdeflate_alloc_decompressor());
+    if (!decompressor)
+        throw std::bad_alloc();
+    return decompressor.get();
 }
 
 bool canGiveItsSize(const ZipEntry& entry) {
@@ -53,24 +71,13 @@ bool canBeDelivered(const ZipEntry& entry, std::uint64_t limit) {
            canGiveItsSize(entry);
 }
 
-ZipDecoder::ZipDecoder() = default;
-ZipDecoder::~ZipDecoder() = default;
-
-void ZipDecoder::Release::operator()(libdeflate_decompressor* decompressor) const {
-    libdeflate_free_decompressor(decompressor);
-}
-
-std::optional<Data> ZipDecoder::decode(const ZipEntry& entry, Data::Bytes stored) {
+std::optional<Data> decodedEntry(const ZipEntry& entry, Data::Bytes stored) {
     auto content = std::make_unique_for_overwrite<std::uint8_t[]>(entry.size);
     if (entry.method == storedMethod) {
         std::copy(stored.begin(), stored.end(), content.get());
     } else if (!stored.empty()) {
-        if (!m_decompressor)
-            m_decompressor.reset(libdeflate_alloc_decompressor());
-        if (!m_decompressor)
-            throw std::bad_alloc();
         // No place for the actual size: anything but the whole size is a failure.
-        if (libdeflate_deflate_decompress(m_decompressor.get(), stored.data(), stored.size(),
+        if (libdeflate_deflate_decompress(threadDecompressor(), stored.data(), stored.size(),
                                           content.get(), entry.size, nullptr) != LIBDEFLATE_SUCCESS)
             return std::nullopt;
     }

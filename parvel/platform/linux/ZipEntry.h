@@ -1,13 +1,9 @@
 #pragma once
 
-#include <cstddef>
 #include <cstdint>
-#include <memory>
 #include <optional>
 
 #include "parvel/foundation/Data.h"
-
-struct libdeflate_decompressor;
 
 namespace parvel::host {
 
@@ -33,22 +29,8 @@ struct ZipEntry {
 /// the limit, whose size its compressed size can give.
 [[nodiscard]] bool canBeDelivered(const ZipEntry& entry, std::uint64_t limit);
 
-/// Turns the stored bytes of entries that are not large into their content.
-class ZipDecoder {
-public:
-    ZipDecoder();
-    ~ZipDecoder();
-    ZipDecoder(const ZipDecoder&) = delete;
-    ZipDecoder& operator=(const ZipDecoder&) = delete;
-
-    /// None when the content is not of the size and checksum that the entry claims.
-    [[nodiscard]] std::optional<Data> decode(const ZipEntry& entry, Data::Bytes stored);
-
-private:
-    struct Release {
-        void operator()(libdeflate_decompressor* decompressor) const;
-    };
-    std::unique_ptr<libdeflate_decompressor, Release> m_decompressor;
-};
+/// The content of an entry that is not large, out of its stored bytes. None when it is not of the
+/// size and checksum that the entry claims.
+[[nodiscard]] std::optional<Data> decodedEntry(const ZipEntry& entry, Data::Bytes stored);
 
 }  // namespace parvel::host

@@ -4,6 +4,8 @@
 
 #include "parvel/metadata/PVMutableAssetMetadata.h"
 #include "parvel/platform/TextRules.h"
+#include "tests/support/RepeatedText.h"
+#include "tests/support/TranslatingLocaliser.h"
 
 namespace parvel::testing {
 namespace {
@@ -13,13 +15,6 @@ std::optional<String> sanitized(const std::string& path, const std::optional<Str
         PVAssetMetadata::metadataWithURL_dictionary(URL::fileURLWithPath(path), nullptr);
     record->setTitle(title);
     return sanitizedFileName(record);
-}
-
-String repeated(std::string_view text, int count) {
-    String result;
-    while (count-- > 0)
-        result += text;
-    return result;
 }
 
 TEST(SanitizedName, TheTitleNamesTheAssetWithItsExtension) {
@@ -49,6 +44,34 @@ TEST(SanitizedName, ForbiddenCharactersGoAndBlanksCollapse) {
     EXPECT_EQ(sanitized("/a.epub", "Dr. No"), "Dr No.epub");
 }
 
+TEST(SanitizedName, OnlyBlanksCollapse) {
+    EXPECT_EQ(sanitized("/a.epub",
+                        "a\t \tb\xC2\xA0\xC2\xA0"
+                        "c"),
+              "a b\xC2\xA0\xC2\xA0"
+              "c.epub");
+}
+
+TEST(SanitizedName, ATitleThatEndsInTheExtensionKeepsItsLetters) {
+    EXPECT_EQ(sanitized("/a.epub", "Book.epub"), "Bookepub.epub");
+}
+
+TEST(SanitizedName, TheItemsNameLosesItsLastExtensionAlone) {
+    EXPECT_EQ(sanitized("/a.tar.epub", std::nullopt), "atar.epub");
+}
+
+TEST(SanitizedName, ANameThatIsAnExtensionAloneIsUnknown) {
+    EXPECT_EQ(sanitized("/.epub", std::nullopt), "unknown.epub");
+}
+
+TEST(SanitizedName, TheExtensionKeepsItsSpelling) {
+    EXPECT_EQ(sanitized("/a.E-PUB", "Book"), "Book.E-PUB");
+}
+
+TEST(SanitizedName, BytesThatAreNoTextBecomeTheReplacementCharacter) {
+    EXPECT_EQ(sanitized("/a\xFF.epub", std::nullopt), "a\xEF\xBF\xBD.epub");
+}
+
 TEST(SanitizedName, LowLineAndHyphenMinusStay) {
     EXPECT_EQ(sanitized("/a.epub", "a_b-c"), "a_b-c.epub");
 }
@@ -71,6 +94,13 @@ TEST(SanitizedName, ATitleOfPunctuationAloneIsUnknown) {
     EXPECT_EQ(sanitized("/a.epub", "?!…"), "unknown.epub");
 }
 
+TEST(SanitizedName, TheApplicationNamesWhatHasNoName) {
+    const TranslatingLocaliser localiser("DEFAULT_UBIQUITY_FILENAME=unknown", "unbekannt");
+
+    EXPECT_EQ(sanitized("/a.epub", "?!…"), "unbekannt.epub");
+    EXPECT_EQ(sanitized("/???", std::nullopt), "unbekannt");
+}
+
 TEST(SanitizedName, ATitleOfBlanksIsOneBlank) {
     EXPECT_EQ(sanitized("/a.epub", "   "), " .epub");
 }
@@ -81,13 +111,27 @@ TEST(SanitizedName, ALongTitleIsCutTo254UnitsLessTheExtension) {
 }
 
 TEST(SanitizedName, LengthsAreCountedInUTF16Units) {
-    EXPECT_EQ(sanitized("/a.epub", repeated("漢", 300)), repeated("漢", 250) + ".epub");
-    EXPECT_EQ(sanitized("/a.epub", repeated("😀", 200)), repeated("😀", 125) + ".epub");
+    EXPECT_EQ(sanitized("/a.epub", repeatedText("漢", 300)), repeatedText("漢", 250) + ".epub");
+    EXPECT_EQ(sanitized("/a.epub", repeatedText("😀", 200)), repeatedText("😀", 125) + ".epub");
+}
+
+TEST(SanitizedName, ALongExtensionLeavesTheTitleWhatRoomThereIs) {
+    EXPECT_EQ(sanitized("/a." + String(253, 'e'), "Book"), "B." + String(253, 'e'));
+    EXPECT_EQ(sanitized("/a." + repeatedText("漢", 253), "Book"), "B." + repeatedText("漢", 253));
+}
+
+TEST(SanitizedName, AnExtensionOf254UnitsAndMoreLeavesNothingOfTheTitle) {
+    for (const int units : {254, 255, 300})
+        EXPECT_EQ(sanitized("/a." + String(units, 'e'), "Book"), "unknown." + String(units, 'e'));
+}
+
+TEST(SanitizedName, ANameWithoutExtensionIsCutTo254Units) {
+    EXPECT_EQ(sanitized("/" + String(300, 'x'), std::nullopt), String(254, 'x'));
 }
 
 TEST(SanitizedName, ACutThroughASurrogatePairLeavesTheReplacementCharacter) {
-    EXPECT_EQ(sanitized("/a.epub", "x" + repeated("😀", 200)),
-              "x" + repeated("😀", 124) + "\xEF\xBF\xBD.epub");
+    EXPECT_EQ(sanitized("/a.epub", "x" + repeatedText("😀", 200)),
+              "x" + repeatedText("😀", 124) + "\xEF\xBF\xBD.epub");
 }
 
 TEST(FittingName, AShortNameStays) {
@@ -96,11 +140,19 @@ TEST(FittingName, AShortNameStays) {
 }
 
 TEST(FittingName, ALongNameIsCutAtWholeCodePointsWithRoomForACount) {
-    const String fitting = fittingFileName(repeated("漢", 250) + ".epub");
+    const String fitting = fittingFileName(repeatedText("漢", 250) + ".epub");
 
-    EXPECT_EQ(fitting, repeated("漢", 81) + ".epub");
+    EXPECT_EQ(fitting, repeatedText("漢", 81) + ".epub");
     EXPECT_LE(fitting.size() + 5, 255U);
     EXPECT_TRUE(isValidUTF8(fitting));
+}
+
+TEST(FittingName, ANameWithoutExtensionIsCutToo) {
+    EXPECT_EQ(fittingFileName(repeatedText("漢", 100)), repeatedText("漢", 83));
+}
+
+TEST(FittingName, AnExtensionThatFillsTheNameLeavesNoStem) {
+    EXPECT_EQ(fittingFileName("unknown." + String(254, 'e')), "." + String(254, 'e'));
 }
 
 }  // namespace

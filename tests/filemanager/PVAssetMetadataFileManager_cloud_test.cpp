@@ -3,36 +3,46 @@
 
 #include <gtest/gtest.h>
 
-#include "tests/support/ManagedFolder.h"
 #include "tests/support/RecordedLog.h"
+#include "tests/support/RecordingFileSystem.h"
+#include "tests/support/RefusingServices.h"
+#include "tests/support/RepeatedText.h"
+#include "tests/support/ScriptedCoordinator.h"
+#include "tests/support/SynchronisedFolder.h"
+#include "tests/support/TranslatingLocaliser.h"
 
 namespace parvel::testing {
 namespace {
 
 using Lines = std::vector<std::string>;
 
-/// A folder that a client synchronises, by its mark on disk.
-class SynchronisedFolder : public ManagedFolder {
+class MovingInAndOut : public SynchronisedFolder {
 protected:
-    void SetUp() override {
-        setenv("XDG_RUNTIME_DIR", m_locks.path().c_str(), 1);
-        makeFolder("cloud/.stfolder");
-    }
-    void TearDown() override { unsetenv("XDG_RUNTIME_DIR"); }
-
     AssetPtr setUbiquitous(bool ubiquitous, const AssetPtr& moved, const URL& directory,
                            bool replace = false) {
         return m_manager->setUbiquitous_asset_intoDirectory_replace_error(
             ubiquitous, moved, directory, replace, &m_error);
     }
-    [[nodiscard]] URL cloud() const { return m_folder.url("cloud"); }
-    [[nodiscard]] Names booksInCloud() const {
-        Names all = names("cloud");
-        std::erase(all, ".stfolder");
-        return all;
-    }
+    /// Of a replacement: no result, the error as it was, no line.
+    void expectNoReport(const AssetPtr& book) {
+        m_error = makeNoIdentityError();
+        RecordedLog log;
 
-    TemporaryDirectory m_locks;
+        EXPECT_FALSE(setUbiquitous(true, book, cloud(), /*replace=*/true));
+
+        EXPECT_EQ(m_error, makeNoIdentityError());
+        EXPECT_EQ(log.lines(), Lines{});
+    }
+    std::shared_ptr<RecordingFileSystem> recordCalls() {
+        auto service = std::make_shared<RecordingFileSystem>();
+        m_manager->setFileManager(service);
+        return service;
+    }
+    std::shared_ptr<ScriptedCoordinator> scriptCoordinator() {
+        auto coordinator = std::make_shared<ScriptedCoordinator>();
+        m_manager->setFileCoordinator(coordinator);
+        return coordinator;
+    }
 };
 
 /// Takes the name in the synchronised folder between the test and the move, once.
@@ -50,7 +60,7 @@ private:
     bool m_hasCompeted = false;
 };
 
-TEST_F(SynchronisedFolder, ACompetitorThatTookTheNameSendsTheCountOn) {
+TEST_F(MovingInAndOut, ACompetitorThatTookTheNameSendsTheCountOn) {
     m_manager->setFileManager(std::make_shared<CompetingCloudService>());
 
     const AssetPtr moved = setUbiquitous(true, asset("Guide.epub", "mine"), cloud());
@@ -62,19 +72,19 @@ TEST_F(SynchronisedFolder, ACompetitorThatTookTheNameSendsTheCountOn) {
     EXPECT_EQ(m_folder.read("cloud/Guide 1.epub"), "mine");
 }
 
-TEST_F(SynchronisedFolder, ABookGoesInUnderItsSanitisedTitle) {
+TEST_F(MovingInAndOut, ABookGoesInUnderItsSanitisedTitle) {
     const auto book = asset("a.epub");
     book->setTitle("My: Book?");
 
     const AssetPtr moved = setUbiquitous(true, book, cloud());
 
     ASSERT_TRUE(moved);
-    EXPECT_EQ(moved->url(), m_folder.url("cloud/My Book.epub"));
+    EXPECT_EQ(moved->url(), inCloud("My Book.epub"));
     EXPECT_EQ(booksInCloud(), Names{"My Book.epub"});
     EXPECT_FALSE(m_error);
 }
 
-TEST_F(SynchronisedFolder, ABookWhoseNameIsTakenIsCountedUp) {
+TEST_F(MovingInAndOut, ABookWhoseNameIsTakenIsCountedUp) {
     m_folder.write("cloud/Book.epub", "2");
 
     EXPECT_TRUE(setUbiquitous(true, asset("Book.epub"), cloud()));
@@ -82,14 +92,14 @@ TEST_F(SynchronisedFolder, ABookWhoseNameIsTakenIsCountedUp) {
     EXPECT_EQ(booksInCloud(), (Names{"Book 1.epub", "Book.epub"}));
 }
 
-TEST_F(SynchronisedFolder, ABookComesOutAgain) {
+TEST_F(MovingInAndOut, ABookComesOutAgain) {
     EXPECT_TRUE(setUbiquitous(false, asset("cloud/Book.epub"), makeFolder("local")));
 
     EXPECT_EQ(booksInCloud(), Names{});
     EXPECT_EQ(names("local"), Names{"Book.epub"});
 }
 
-TEST_F(SynchronisedFolder, AFolderThatNobodySynchronisesTakesNoBookIn) {
+TEST_F(MovingInAndOut, AFolderThatNobodySynchronisesTakesNoBookIn) {
     const URL local = makeFolder("local");
 
     EXPECT_FALSE(setUbiquitous(true, asset("a.epub"), local));
@@ -98,29 +108,77 @@ TEST_F(SynchronisedFolder, AFolderThatNobodySynchronisesTakesNoBookIn) {
     EXPECT_EQ(names("local"), Names{});
 }
 
-TEST_F(SynchronisedFolder, ABookThatIsNotDownloadedDoesNotComeOut) {
+TEST_F(MovingInAndOut, ABookThatIsNotDownloadedDoesNotComeOut) {
     m_folder.write("cloud/Book.epub.nextcloud", " ");
-    const auto book =
-        PVAssetMetadata::metadataWithURL_dictionary(m_folder.url("cloud/Book.epub"), nullptr);
+    const auto book = PVAssetMetadata::metadataWithURL_dictionary(inCloud("Book.epub"), nullptr);
 
     EXPECT_FALSE(setUbiquitous(false, book, makeFolder("local")));
 
-    EXPECT_EQ(m_error, makePOSIXError(ETIMEDOUT, m_folder.url("cloud/Book.epub")));
+    EXPECT_EQ(m_error, makePOSIXError(ETIMEDOUT, inCloud("Book.epub")));
     EXPECT_EQ(booksInCloud(), Names{"Book.epub.nextcloud"});
 }
 
-TEST_F(SynchronisedFolder, AnOverlongNameIsCutToFitTheDisk) {
+TEST_F(MovingInAndOut, AnOverlongNameIsCutToFitTheDisk) {
     const auto book = asset("a.epub");
-    String title;
-    for (int i = 0; i < 300; ++i)
-        title += "漢";
-    book->setTitle(title);
+    book->setTitle(repeatedText("漢", 300));
 
     EXPECT_TRUE(setUbiquitous(true, book, cloud()));
     EXPECT_EQ(booksInCloud()[0].size(), 248U);
 }
 
-TEST_F(SynchronisedFolder, NoRecordIsRefusedWithItsReason) {
+TEST_F(MovingInAndOut, AnEmptyNameIsNoneAndLeavesTheError) {
+    const TranslatingLocaliser localiser("DEFAULT_UBIQUITY_FILENAME=unknown", "");
+    const auto service = recordCalls();
+    m_error = makeNoIdentityError();
+    const auto nameless = asset("!!!");
+    for (const bool replace : {false, true}) {
+        RecordedLog log;
+
+        EXPECT_FALSE(setUbiquitous(true, nameless, cloud(), replace));
+
+        EXPECT_EQ(m_error, makeNoIdentityError());
+        EXPECT_EQ(log.lines(), Lines{});
+    }
+    EXPECT_EQ(service->calls, Lines{});
+}
+
+TEST_F(MovingInAndOut, TheGivenServiceMovesWithoutCoordinationAndWithTheGivenFlag) {
+    for (const bool ubiquitous : {true, false}) {
+        const auto service = recordCalls();
+        const auto coordinator = scriptCoordinator();
+
+        EXPECT_TRUE(setUbiquitous(ubiquitous, asset("a.epub"), cloud()));
+
+        const std::string target = inCloud(ubiquitous ? "a.epub" : "a 1.epub").path();
+        EXPECT_EQ(service->calls.back(),
+                  (ubiquitous ? "in " : "out ") + (m_folder / "a.epub") + " to " + target);
+        EXPECT_EQ(coordinator->calls.size(), 0U);
+    }
+}
+
+TEST_F(MovingInAndOut, ASuccessLeavesTheErrorAsItWasAndIsNotLogged) {
+    m_error = makeNoIdentityError();
+    const auto book = asset("a.epub");
+    RecordedLog log;
+
+    EXPECT_TRUE(setUbiquitous(true, book, cloud()));
+
+    EXPECT_EQ(m_error, makeNoIdentityError());
+    EXPECT_EQ(log.lines(), Lines{});
+}
+
+TEST_F(MovingInAndOut, AFailedMoveIsNotLoggedAndNobodyNeedsToAskForItsError) {
+    const auto book = asset("a.epub");
+    RecordedLog log;
+
+    EXPECT_FALSE(m_manager->setUbiquitous_asset_intoDirectory_replace_error(
+        true, book, makeFolder("local"), /*replace=*/false, nullptr));
+
+    EXPECT_EQ(log.lines(), Lines{});
+    EXPECT_EQ(m_folder.read("a.epub"), "content");
+}
+
+TEST_F(MovingInAndOut, NoRecordIsRefusedWithItsReason) {
     RecordedLog log;
 
     EXPECT_FALSE(setUbiquitous(true, nullptr, cloud()));
@@ -130,7 +188,7 @@ TEST_F(SynchronisedFolder, NoRecordIsRefusedWithItsReason) {
                                  logText(*m_error)});
 }
 
-TEST_F(SynchronisedFolder, ARecordWithoutURLIsRefusedAsUnknown) {
+TEST_F(MovingInAndOut, ARecordWithoutURLIsRefusedAsUnknown) {
     const Dictionary dictionary{{"itemName", "Title"}, {"PVDisplayName", "Name"}};
     const auto book = PVAssetMetadata::metadataWithURL_dictionary(std::nullopt, &dictionary);
     RecordedLog log;
@@ -142,7 +200,7 @@ TEST_F(SynchronisedFolder, ARecordWithoutURLIsRefusedAsUnknown) {
                                  logText(*m_error)});
 }
 
-TEST_F(SynchronisedFolder, WithoutAPlaceForTheErrorARefusalLogsNone) {
+TEST_F(MovingInAndOut, WithoutAPlaceForTheErrorARefusalLogsNone) {
     RecordedLog log;
 
     EXPECT_FALSE(m_manager->setUbiquitous_asset_intoDirectory_replace_error(
@@ -152,7 +210,7 @@ TEST_F(SynchronisedFolder, WithoutAPlaceForTheErrorARefusalLogsNone) {
               Lines{"error setUbiquitous: Failed to migrate asset: (null) error: (null)"});
 }
 
-TEST_F(SynchronisedFolder, AReplacementReportsNothingAlsoWhenItSucceeds) {
+TEST_F(MovingInAndOut, AReplacementReportsNothingAlsoWhenItSucceeds) {
     m_folder.write("cloud/Book.epub", "old");
     RecordedLog log;
 
@@ -164,7 +222,7 @@ TEST_F(SynchronisedFolder, AReplacementReportsNothingAlsoWhenItSucceeds) {
     EXPECT_EQ(log.lines(), Lines{});
 }
 
-TEST_F(SynchronisedFolder, AReplacementKeepsWhatTheNewVersionLacks) {
+TEST_F(MovingInAndOut, AReplacementKeepsWhatTheNewVersionLacks) {
     const auto old = asset("cloud/Book.epub", "old");
     old->setGeneratedID("ID");
     ASSERT_TRUE(m_manager->setExtendedAttributesForAsset_error(old));
@@ -174,116 +232,64 @@ TEST_F(SynchronisedFolder, AReplacementKeepsWhatTheNewVersionLacks) {
     EXPECT_EQ(m_manager->extendedAttributesForAsset_error(old)->size(), 1U);
 }
 
-TEST_F(SynchronisedFolder, ANewVersionTakesThePlaceAndItsOwnName) {
-    const auto old = asset("cloud/Old Title.epub", "old");
-    const auto newVersion = asset("new.epub", "new");
-    newVersion->setTitle("New Title");
-    m_error = makeNoIdentityError();
+TEST_F(MovingInAndOut, AReplacementOfNothingMovesTheAssetIn) {
+    EXPECT_FALSE(setUbiquitous(true, asset("Book.epub", "new"), cloud(), /*replace=*/true));
 
-    const AssetPtr replaced =
-        m_manager->replaceUbiquitousAsset_withAsset_error(old, newVersion, &m_error);
-
-    ASSERT_TRUE(replaced);
-    EXPECT_EQ(replaced->url(), m_folder.url("cloud/New Title.epub"));
-    EXPECT_EQ(replaced->title(), "New Title");
-    EXPECT_FALSE(m_error);
-    EXPECT_EQ(booksInCloud(), Names{"New Title.epub"});
-    EXPECT_EQ(m_folder.read("cloud/New Title.epub"), "new");
+    EXPECT_EQ(m_folder.read("cloud/Book.epub"), "new");
+    EXPECT_EQ(names(), Names{"cloud"});
 }
 
-TEST_F(SynchronisedFolder, ANewVersionOfTheSameNameStaysWhereItIs) {
-    const auto old = asset("cloud/Book.epub", "old");
-    const auto newVersion = asset("Book.epub", "new");
+TEST_F(MovingInAndOut, AReplacementIsCoordinatedOnTheTarget) {
+    const auto service = recordCalls();
+    const auto coordinator = scriptCoordinator();
+    const auto book = asset("a.epub");
+    book->setTitle("My: Book");
 
-    const AssetPtr replaced =
-        m_manager->replaceUbiquitousAsset_withAsset_error(old, newVersion, &m_error);
+    EXPECT_FALSE(setUbiquitous(true, book, cloud(), /*replace=*/true));
 
-    ASSERT_TRUE(replaced);
-    EXPECT_EQ(replaced->url(), m_folder.url("cloud/Book.epub"));
-    EXPECT_EQ(booksInCloud(), Names{"Book.epub"});
+    EXPECT_EQ(coordinator->calls, (std::vector<ScriptedCoordinator::Call>{
+                                      {inCloud("My Book.epub"), WritingIntent::ForReplacing}}));
+    EXPECT_EQ(service->calls, Lines{"replace " + inCloud("My Book.epub").path() + " by " +
+                                    (m_folder / "a.epub") + " options 0"});
 }
 
-TEST_F(SynchronisedFolder, AReplacedVersionWhoseNewNameIsTakenStaysUnderTheOldOne) {
-    const auto old = asset("cloud/Old.epub", "old");
-    m_folder.write("cloud/New.epub", "other");
-    const auto newVersion = asset("New.epub", "new");
+TEST_F(MovingInAndOut, AReplacementTakesThePlaceThatTheCoordinatorTells) {
+    m_folder.write("cloud/Moved.epub", "old");
+    const auto coordinator = scriptCoordinator();
+    coordinator->handed[1] = inCloud("Moved.epub");
 
-    EXPECT_FALSE(m_manager->replaceUbiquitousAsset_withAsset_error(old, newVersion, &m_error));
+    EXPECT_FALSE(setUbiquitous(true, asset("Book.epub", "new"), cloud(), /*replace=*/true));
 
-    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::FileExists, m_folder.url("cloud/New.epub")));
-    EXPECT_EQ(m_folder.read("cloud/Old.epub"), "new");
-    EXPECT_EQ(m_folder.read("cloud/New.epub"), "other");
+    EXPECT_EQ(booksInCloud(), Names{"Moved.epub"});
+    EXPECT_EQ(m_folder.read("cloud/Moved.epub"), "new");
 }
 
-TEST_F(SynchronisedFolder, AFailedReplacementLeavesBothAndSaysWhy) {
-    const auto old = asset("cloud/Book.epub", "old");
-    const auto gone =
-        PVAssetMetadata::metadataWithURL_dictionary(m_folder.url("gone.epub"), nullptr);
+TEST_F(MovingInAndOut, AReplacementWithoutAPlaceDoesAndReportsNothing) {
+    const auto service = recordCalls();
+    const auto coordinator = scriptCoordinator();
+    coordinator->handed[1] = std::nullopt;
 
-    EXPECT_FALSE(m_manager->replaceUbiquitousAsset_withAsset_error(old, gone, &m_error));
+    expectNoReport(asset("Book.epub"));
 
-    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::NoSuchFile, m_folder.url("gone.epub")));
-    EXPECT_EQ(m_folder.read("cloud/Book.epub"), "old");
+    EXPECT_EQ(service->calls, Lines{});
 }
 
-/// Hands out what a test says, in the order of the calls.
-class ScriptedCoordinator : public ForwardingFileCoordinator {
-public:
-    ScriptedCoordinator() : ForwardingFileCoordinator(FileCoordinator::makeDefault()) {}
-    bool coordinateWriting(const URL& url, WritingIntent intent, ErrorOut error,
-                           const Accessor& accessor) override {
-        calls.emplace_back(url, intent);
-        if (calls.size() == failingCall)
-            return fail(error, makePOSIXError(EDEADLK, url));
-        accessor(calls.size() == callWithoutURL ? std::nullopt : std::optional(url));
-        return true;
-    }
-    std::vector<std::pair<URL, WritingIntent>> calls;
-    std::size_t failingCall = 0;
-    std::size_t callWithoutURL = 0;
-};
+TEST_F(MovingInAndOut, ACoordinationThatFailsIsNotReported) {
+    const auto coordinator = scriptCoordinator();
+    coordinator->refusedCall = 1;
 
-TEST_F(SynchronisedFolder, BothStepsOfAReplacementAreCoordinatedOnTheSynchronisedAsset) {
-    const auto coordinator = std::make_shared<ScriptedCoordinator>();
-    m_manager->setFileCoordinator(coordinator);
-    const auto old = asset("cloud/Old.epub", "old");
+    expectNoReport(asset("Book.epub"));
 
-    EXPECT_TRUE(m_manager->replaceUbiquitousAsset_withAsset_error(old, asset("New.epub")));
-
-    using Call = std::pair<URL, WritingIntent>;
-    EXPECT_EQ(coordinator->calls, (std::vector<Call>{{*old->url(), WritingIntent::ForReplacing},
-                                                     {*old->url(), WritingIntent::ForMoving}}));
+    EXPECT_EQ(booksInCloud(), Names{});
 }
 
-TEST_F(SynchronisedFolder, ACoordinatorWithoutURLFailsTheReplacement) {
-    const auto coordinator = std::make_shared<ScriptedCoordinator>();
-    coordinator->callWithoutURL = 1;
-    m_manager->setFileCoordinator(coordinator);
-    const auto old = asset("cloud/Old.epub", "old");
-    RecordedLog log;
+TEST_F(MovingInAndOut, AReplacementThatFailsIsNotReported) {
+    m_manager->setFileManager(
+        std::make_shared<RefusingFileSystem>([](auto, const URL&) { return true; }));
 
-    EXPECT_FALSE(
-        m_manager->replaceUbiquitousAsset_withAsset_error(old, asset("New.epub"), &m_error));
+    expectNoReport(asset("Book.epub"));
 
-    EXPECT_EQ(m_error, makeMissingURLError());
-    EXPECT_EQ(log.lines(),
-              Lines{"error replaceUbiquitousAsset: Failed due to nil newURL provided."});
-    EXPECT_EQ(coordinator->calls.size(), 1U);
-    EXPECT_EQ(m_folder.read("cloud/Old.epub"), "old");
-}
-
-TEST_F(SynchronisedFolder, ACoordinationThatFailsIsTheError) {
-    for (const std::size_t failing : {1, 2}) {
-        const auto coordinator = std::make_shared<ScriptedCoordinator>();
-        coordinator->failingCall = failing;
-        m_manager->setFileCoordinator(coordinator);
-        const auto old = asset("cloud/Old.epub", "old");
-
-        EXPECT_FALSE(
-            m_manager->replaceUbiquitousAsset_withAsset_error(old, asset("New.epub"), &m_error));
-
-        EXPECT_EQ(m_error, makePOSIXError(EDEADLK, *old->url()));
-    }
+    EXPECT_EQ(m_folder.read("Book.epub"), "content");
 }
 
 }  // namespace

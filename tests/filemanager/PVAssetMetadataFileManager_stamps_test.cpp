@@ -1,7 +1,7 @@
 #include <gtest/gtest.h>
 
-#include "tests/support/ForwardingXattrStore.h"
 #include "tests/support/ManagedFolder.h"
+#include "tests/support/ReadOnlyAttributes.h"
 #include "tests/support/RecordedLog.h"
 #include "tests/support/Records.h"
 #include "tests/support/RefusingSizeQuery.h"
@@ -77,16 +77,8 @@ TEST_F(StampingAssets, AnAssetThatCarriesItsIdentityIsStampedWithoutAnError) {
     EXPECT_EQ(m_manager->extendedAttributesForAsset_error(stamped)->size(), 1U);
 }
 
-/// Writes no attribute.
-class FullXattrStore : public ForwardingXattrStore {
-public:
-    int set(const std::string&, const std::string&, std::span<const std::byte>) override {
-        return ENOSPC;
-    }
-};
-
 TEST_F(StampingAssets, AttributesThatCanNotBeWrittenAreTheError) {
-    const FullXattrStore store;
+    const ReadOnlyAttributes attributes;
     const auto book = asset("a.epub");
     book->setGeneratedID("ID");
 
@@ -96,7 +88,7 @@ TEST_F(StampingAssets, AttributesThatCanNotBeWrittenAreTheError) {
     EXPECT_TRUE(stamped->_hasAllocatedSize());
     ASSERT_TRUE(m_error);
     EXPECT_EQ(m_error->domain(), PVPOSIXErrorDomain);
-    EXPECT_EQ(m_error->code(), ENOSPC);
+    EXPECT_EQ(m_error->code(), EROFS);
 }
 
 /// Tells of no item whether it is a directory.

@@ -116,6 +116,19 @@ TEST_F(PlacingInstalls, ANewBookGoesIntoSynchronisedStorageUnderItsSanitisedName
     EXPECT_EQ(names("staging"), Names{});
 }
 
+TEST_F(PlacingInstalls, ANewBookReplacesNoneInSynchronisedStorageThoughAsked) {
+    m_folder.write("cloud/Book.epub", "other");
+    makeTask(zippedBook("Book.epub"), /*stages=*/true);
+    m_task->setReplaceExisting(true);
+
+    const AssetPtr installed = executeIntoCloud();
+
+    ASSERT_TRUE(installed);
+    EXPECT_EQ(installed->url(), m_folder.url("cloud/Book 1.epub"));
+    EXPECT_EQ(booksInCloud(), (Names{"Book 1.epub", "Book.epub"}));
+    EXPECT_EQ(m_folder.read("cloud/Book.epub"), "other");
+}
+
 TEST_F(PlacingInstalls, AnUpdateReplacesTheBookInSynchronisedStorage) {
     m_folder.write("cloud/Old.epub/OPS/old", "old");
     const AssetPtr old = recordAt(m_folder.url("cloud/Old.epub"));

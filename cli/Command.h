@@ -46,6 +46,7 @@ std::unique_ptr<Command> makeAttributesCommand();
 std::unique_ptr<Command> makeCheckCommand();
 std::unique_ptr<Command> makeCloudCommand();
 std::unique_ptr<Command> makeCoverCommand();
+std::unique_ptr<Command> makeDoctorCommand();
 std::unique_ptr<Command> makeEditCommand();
 std::unique_ptr<Command> makeInflateCommand();
 std::unique_ptr<Command> makeInspectCommand();

@@ -34,6 +34,8 @@ std::span<const CommandEntry> commands() {
                      "Move assets into and out of synchronised folders.", makeCloudCommand},
         CommandEntry{"check", "[DIR|PATH...]", "Compare records with what is on the disk.",
                      makeCheckCommand},
+        CommandEntry{"doctor", "[DIR|PATH...]", "Say what endangers assets, and what to do.",
+                     makeDoctorCommand},
     };
     return entries;
 }

@@ -16,6 +16,10 @@ _parvel_options() {
                 --json --jsonl --plist --log --help -h'
             ;;
         cover) echo '--output -o --size --best --json --jsonl --plist --log --help -h' ;;
+        doctor)
+            echo '--exit-code --files-from --null -0
+                --json --jsonl --plist --log --help -h'
+            ;;
         edit)
             echo '--set --updates --cover --restore-cover --inflate --temporary --direct --progress --force --record --dry-run
                 --files-from --null -0 --recursive -r
@@ -107,7 +111,7 @@ _parvel() {
         mapfile -t COMPREPLY < <(compgen -W "$(_parvel_options "$command")" -- "$current")
     elif [[ -z $command ]]; then
         mapfile -t COMPREPLY < <(compgen -W \
-            'attributes check cloud cover edit inflate inspect install match move
+            'attributes check cloud cover doctor edit inflate inspect install match move
                 pack redact remove rename trash update' -- "$current")
     else
         compopt -o filenames

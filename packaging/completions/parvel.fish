@@ -2,7 +2,7 @@
 
 function __parvel_needs_command
     not __fish_seen_subcommand_from \
-        attributes check cloud cover edit inflate inspect install match move pack redact remove rename trash update
+        attributes check cloud cover doctor edit inflate inspect install match move pack redact remove rename trash update
 end
 
 set -l levels 'off fault error default debug'
@@ -24,18 +24,19 @@ complete -c parvel -n __parvel_needs_command -f -a remove -d 'Delete assets for 
 complete -c parvel -n __parvel_needs_command -f -a redact -d 'Move assets aside'
 complete -c parvel -n __parvel_needs_command -f -a cloud -d 'Move assets into and out of synchronised folders'
 complete -c parvel -n __parvel_needs_command -f -a check -d 'Compare records with the disk'
+complete -c parvel -n __parvel_needs_command -f -a doctor -d 'Say what endangers assets'
 complete -c parvel -n __parvel_needs_command -l version -d 'Print the version'
 complete -c parvel -n __parvel_needs_command -l json -d 'Print the version as JSON'
 complete -c parvel -l log -x -a $levels -d 'Print log lines'
 complete -c parvel -s h -l help -d 'Print the options'
 
-for command in attributes check cloud cover edit inflate inspect install match move pack redact remove rename trash update
+for command in attributes check cloud cover doctor edit inflate inspect install match move pack redact remove rename trash update
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l json -d 'Print one JSON array'
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l jsonl -d 'Print lines of JSON'
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l plist -d 'Print a property list'
 end
 
-for command in attributes check cloud edit inflate inspect install move pack redact remove rename trash update
+for command in attributes check cloud doctor edit inflate inspect install move pack redact remove rename trash update
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l files-from -r -d 'Read PATHs from a file'
     complete -c parvel -n "__fish_seen_subcommand_from $command" -s 0 -l null -d 'PATHs end with a NUL'
 end
@@ -93,6 +94,7 @@ complete -c parvel -n '__fish_seen_subcommand_from cloud' -l force -d 'Replace a
 
 complete -c parvel -n '__fish_seen_subcommand_from check' -l records -r -d 'The records'
 complete -c parvel -n '__fish_seen_subcommand_from check' -l exit-code -d 'End with status 4 where anything is found'
+complete -c parvel -n '__fish_seen_subcommand_from doctor' -l exit-code -d 'End with status 4 where anything is found'
 complete -c parvel -n '__fish_seen_subcommand_from check' -l dry-run -d 'Touch nothing'
 
 complete -c parvel -n '__fish_seen_subcommand_from edit' -l set -x -d 'Change KEY=VALUE'

@@ -154,6 +154,7 @@ def workloads(build, share):
         [Goal("listed 100 times", "listed once", "memory", at_most=1.1)], rounds=1)
     yield Workload("start of the program", None, [
         Contender("true", ["/bin/true"], "floor", each=STARTS),
+        Contender("its libraries alone", [bench("floor_start")], each=STARTS),
         Contender("library", [parvel, "--version"], "library", each=STARTS)],
         [Goal("library", "true", "cpu", at_most=5)], per="start")
 

@@ -114,6 +114,15 @@ TEST(OPFDocument, OnlyAMetaInNoNamespaceTellsTheFormat) {
     EXPECT_EQ(parvel_opf_metadata_format(*bare.metadata), "fixed");
 }
 
+TEST(OPFDocument, WhatStandsUnderAnUndeclaredPrefixIsAnotherName) {
+    const ParsedOPF opf = opfWithMetadata(R"(<u:meta property="folium:format">no</u:meta>
+        <dc:contributor u:id="pvp">no</dc:contributor>
+        <dc:contributor u:id="x" id="pvp">Folium Author</dc:contributor>)");
+
+    EXPECT_EQ(parvel_opf_metadata_format(*opf.metadata), std::nullopt);
+    EXPECT_EQ(parvel_opf_metadata_producer(*opf.metadata), "Folium Author");
+}
+
 TEST(OPFDocument, OnlyAMetaOfThePackageNamespaceTellsTheCover) {
     const ParsedOPF usual = opfWithMetadata("<meta name=\"cover\" content=\"img\"/>");
     const ParsedOPF bare = opfWithMetadata("<meta xmlns=\"\" name=\"cover\" content=\"img\"/>");

@@ -36,12 +36,13 @@ std::string pickedFrom(std::mt19937& random, const std::vector<std::string>& cho
 }
 
 void appendElement(std::mt19937& random, std::string& text, int depth) {
-    const std::string name = pickedFrom(random, {"a", "b", "o:a", "o:b", "p:a", "x:a"});
+    const std::string name = pickedFrom(random, {"a", "b", "o:a", "o:b", "p:a", "x:a", "u:a"});
     text += "<" + name;
     if (random() % 4 == 0)
         text += pickedFrom(random, {" xmlns='urn:o'", " xmlns=''", " xmlns:o='urn:p'"});
     if (random() % 2 == 0)
-        text += pickedFrom(random, {" id='1'", " id='2'", " id='&amp;&#x9;2'", " o:id='1'"});
+        text += pickedFrom(random, {" id='1'", " id='2'", " id='&amp;&#x9;2'", " o:id='1'",
+                                    " u:id='1'", " u:id='2' id='1'"});
     if (random() % 4 == 0)
         text += pickedFrom(random, {" name='1'", " xml:id='n1'", " p:name='2'"});
     text += ">";

@@ -85,6 +85,15 @@ TEST(XmlDocument, MatchesAnUnprefixedNameInNoNamespaceOnly) {
     EXPECT_EQ(valueAt(metadata, "o:meta[@property='folium:format']"), "other");
 }
 
+TEST(XmlDocument, TakesAnUndeclaredPrefixForAPartOfTheName) {
+    const auto document = parsed("<a><u:b u:x='1' x='2'>no</u:b><b u:x='3'>yes</b></a>");
+
+    EXPECT_EQ(valueAt(document->root(), "/a/b"), "yes");
+    EXPECT_EQ(valueAt(document->root(), "/a/b[@x='3']"), "none");
+    EXPECT_EQ(valueAt(document->root(), "/a/b/@x"), "none");
+    EXPECT_EQ(valueAt(document->root(), "/a/*/@x"), "2");
+}
+
 TEST(XmlDocument, ReadsAttributeNodes) {
     EXPECT_EQ(valueIn(kBook, "/o:package/@unique-identifier"), "uid");
 }

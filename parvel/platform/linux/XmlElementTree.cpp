@@ -47,7 +47,7 @@ private:
             return stop();
         m_open.push_back(static_cast<std::uint32_t>(m_tree.m_elements.size()));
         Element& element = m_tree.m_elements.emplace_back();
-        element.name = tag.name;
+        element.name = fullName(tag.name, tag.prefix, tag.namespaceName);
         element.namespaceName = tag.namespaceName;
         element.textBegin = static_cast<std::uint32_t>(m_tree.m_text.size());
         element.attributesBegin = static_cast<std::uint32_t>(m_tree.m_attributes.size());
@@ -61,7 +61,14 @@ private:
         m_tree.m_values.append(reinterpret_cast<const char*>(slots[3]),
                                static_cast<std::size_t>(slots[4] - slots[3]));
         const auto end = static_cast<std::uint32_t>(m_tree.m_values.size());
-        m_tree.m_attributes.push_back({slots[0], slots[2], begin, end});
+        m_tree.m_attributes.push_back(
+            {fullName(slots[0], slots[1], slots[2]), slots[2], begin, end});
+    }
+
+    /// A prefix that is not declared stays part of the name, as in libxml2's tree.
+    const xmlChar* fullName(const xmlChar* name, const xmlChar* prefix,
+                            const xmlChar* namespaceName) const {
+        return prefix && !namespaceName ? xmlDictQLookup(parser()->dict, prefix, name) : name;
     }
 
     void endElement() override {

@@ -19,7 +19,8 @@ class PVInstallAssetMetadataIOTask;
 
 /// Every file operation on an asset passes through here. It takes a record, which it leaves as it
 /// is, and gives a new one that says what became of the asset; none, with an error, where the
-/// operation failed. A null record, or one without URL, names no item.
+/// operation failed. A null record, or one without URL, names no item: -1002 where nothing else is
+/// said.
 ///
 /// A manager holds nothing but its two platform services, may be made freely, and is for one thread
 /// at a time. What a failed operation had completed is not undone; a file or package that the host
@@ -56,7 +57,8 @@ public:
     /// Moves the item into the directory under its own name. A book may instead be named after its
     /// store ID, or its generated ID where it has none; a PDF or audiobook counts up past names
     /// that are taken, to 9999, if asked. General error 259, without URL, for a book with no usable
-    /// name: an ID that is empty, ".", "..", or holds a slash or NUL is none.
+    /// name: an ID that is empty, ".", "..", or holds a slash or NUL is none. None with the error
+    /// untouched for a PDF or audiobook without URL.
     AssetPtr moveAsset_toDirectory_replaceExisting_renameIfCollision_useAssetIDFileName_error(
         const AssetPtr& asset, const URL& directory, bool replaceExisting, bool renameIfCollision,
         bool useAssetIDFileName, ErrorOut error = nullptr);
@@ -142,8 +144,8 @@ public:
                                                              const URL& directory, bool replace,
                                                              ErrorOut error = nullptr);
     /// Puts the new version in the synchronised asset's place and then under its own sanitised
-    /// name. The error is written in every case. A replaced item whose move failed stays where it
-    /// is.
+    /// name. -1002 also where the coordinator has no place to tell. The error is written in every
+    /// case. A replaced item whose move failed stays where it is.
     AssetPtr replaceUbiquitousAsset_withAsset_error(const AssetPtr& asset,
                                                     const AssetPtr& newVersion,
                                                     ErrorOut error = nullptr);

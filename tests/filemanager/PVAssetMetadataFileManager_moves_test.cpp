@@ -38,10 +38,24 @@ TEST_F(MovingAssets, AnAssetMovedToItsOwnPlaceIsTheSameRecordWithoutALogLine) {
     EXPECT_EQ(names(), Names{"a.epub"});
 }
 
+TEST_F(MovingAssets, ThePlaceOfARecordMayBeSpelledTheOtherWayToo) {
+    asset("a.epub");
+    const AssetPtr book =
+        PVAssetMetadata::metadataWithURL_dictionary(m_folder.url("x/..//./a.epub"), nullptr);
+
+    EXPECT_EQ(moveTo(book, m_folder.url("a.epub")), book);
+
+    EXPECT_EQ(names(), Names{"a.epub"});
+}
+
 TEST_F(MovingAssets, NoTargetGivesNoneAndLeavesTheError) {
     m_error = makeNoIdentityError();
+    RecordedLog log;
 
     EXPECT_FALSE(moveTo(asset("a.epub"), std::nullopt));
+    EXPECT_FALSE(moveTo(emptyRecord(), std::nullopt, /*replace=*/true));
+
+    EXPECT_EQ(log.lines(), Lines{});
 
     EXPECT_EQ(m_error, makeNoIdentityError());
     EXPECT_EQ(names(), Names{"a.epub"});

@@ -28,6 +28,17 @@ TEST(FileManager, KeepsTheGivenServiceAndMakesACoordinator) {
     EXPECT_TRUE(manager->fileCoordinator());
 }
 
+TEST(FileManager, ReleasesItsServicesWithItself) {
+    auto manager = PVAssetMetadataFileManager::init();
+    const std::weak_ptr<FileSystemService> service = manager->fileManager();
+    const std::weak_ptr<FileCoordinator> coordinator = manager->fileCoordinator();
+
+    manager.reset();
+
+    EXPECT_TRUE(service.expired());
+    EXPECT_TRUE(coordinator.expired());
+}
+
 TEST(FileManager, ItsServicesCanBeReplaced) {
     const auto manager = PVAssetMetadataFileManager::init();
     const auto service = FileSystemService::makeDefault();

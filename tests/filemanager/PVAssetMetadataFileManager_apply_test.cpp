@@ -194,16 +194,16 @@ TEST_F(ApplyingUpdates, AnUpdateThatIsMissingFailsAtTheMove) {
     EXPECT_EQ(names("library"), Names{});
 }
 
-TEST_F(ApplyingUpdates, AnUpdateWithoutURLHasNoNameToMoveTo) {
+TEST_F(ApplyingUpdates, AnUpdateWithoutURLHasNothingToMove) {
     const auto existing = book("library/77.epub", "old", {{"itemId", "77"}, {"genre", "Crime"}});
 
     EXPECT_FALSE(apply(recordOver({{"itemId", "77"}}), nullptr));
-    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::Corrupt, std::nullopt));
+    EXPECT_EQ(m_error, makeMissingURLError());
 
     m_error.reset();
     const AssetPtr applied = apply(recordOver({{"itemId", "77"}, {"genre", "Other"}}), existing);
     ASSERT_TRUE(applied);
-    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::Corrupt, std::nullopt));
+    EXPECT_EQ(m_error, makeMissingURLError());
     EXPECT_EQ(valueOf(applied->genre()), Value("Crime"));
     EXPECT_EQ(m_folder.read("library/77.epub"), "old");
 }

@@ -3,6 +3,7 @@
 
 #include "cli/AssetRecord.h"
 #include "cli/Batch.h"
+#include "cli/BookStaging.h"
 #include "cli/Command.h"
 #include "cli/DryRun.h"
 #include "cli/Interrupt.h"
@@ -152,7 +153,9 @@ Result AttributesCommand::write(const std::string& path) const {
         m_dryRun.makeManager()->setExtendedAttributesForAsset_error(asset, &result.error);
     result.fields.push_back({"written", Number::boolean(written)});
     setRecord(result, asset, PVAssetMetadataFlavorFull);
-    result.advice = "nothing in it or on it says which asset it is; --record can say it";
+    result.advice = standsAt(urlOfPath(path))
+                        ? "nothing in it or on it says which asset it is; --record can say it"
+                        : "it is not there";
     result.outcome = written ? "has its attributes" : "nothing to write";
     return result;
 }

@@ -17,8 +17,12 @@ void BookStaging::declare(CommandLine& line) {
 }
 
 void BookStaging::begin() {
-    if (m_temporary)
-        m_directory = urlOfOption("--temporary", *m_temporary);
+    if (!m_temporary)
+        return;
+    m_directory = urlOfOption("--temporary", *m_temporary);
+    std::error_code unknown;
+    if (!std::filesystem::is_directory(m_directory->path(), unknown))
+        throw UsageError("--temporary " + *m_temporary + ": there is no such folder");
 }
 
 std::optional<StagingPlace> BookStaging::placeFor(const URL& book, const URL& folder, bool isForced,
@@ -33,7 +37,7 @@ std::optional<StagingPlace> BookStaging::placeFor(const URL& book, const URL& fo
         place.fresh = StagingDirectory::makeIn(folder, &result.error);
         if (!place.fresh) {
             if (result.error->domain() == PVFileErrorDomain)
-                result.advice = "there is no folder " + folder.path() + ": make it first";
+                result.advice = adviceForMissingFolder(folder);
             return std::nullopt;
         }
         place.directory = place.fresh->url();
@@ -71,6 +75,11 @@ bool isRefusedForCapitals(const AssetPtr& asset, Result& result) {
     refuse(result, "the library would look for a name that ends in small letters",
            "give it such a name first, with \"parvel move --to\"");
     return true;
+}
+
+std::string adviceForMissingFolder(const URL& folder) {
+    return standsAt(folder) ? folder.path() + " is no folder"
+                            : "there is no folder " + folder.path() + ": make it first";
 }
 
 bool standsAt(const URL& url) {

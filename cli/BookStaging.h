@@ -48,6 +48,9 @@ void refuse(Result& result, std::string reason, std::string advice);
 /// Refuses an asset that the library would take another file for, by the capitals in its extension.
 [[nodiscard]] bool isRefusedForCapitals(const AssetPtr& asset, Result& result);
 
+/// What to do about a folder that is not there, or is none.
+[[nodiscard]] std::string adviceForMissingFolder(const URL& folder);
+
 /// Whether anything stands there, a dangling link included.
 [[nodiscard]] bool standsAt(const URL& url);
 

@@ -78,25 +78,30 @@ void CommandLine::note(std::string_view text) {
     m_note = text;
 }
 
-bool CommandLine::takesValue(std::string_view longName) const {
+const CommandLine::Option* CommandLine::optionOf(std::string_view longName) const {
     for (const Group& group : m_groups) {
         for (const Option& option : group.options) {
-            if (option.takesValue() && longNameOf(option.names) == longName)
-                return true;
+            if (longNameOf(option.names) == longName)
+                return &option;
         }
     }
-    return false;
+    return nullptr;
 }
 
 /// The parser takes "--name=" as a name whose value is the next argument. Here it is the empty
-/// text.
+/// text. Nor does a flag have a value here.
 std::vector<std::string> CommandLine::withEmptyValuesApart(
     std::span<const std::string> arguments) const {
     std::vector<std::string> out;
     const auto end = std::find(arguments.begin(), arguments.end(), "--");
     for (auto argument = arguments.begin(); argument != end; ++argument) {
-        if (argument->ends_with('=') && takesValue(argument->substr(0, argument->size() - 1)))
-            out.insert(out.end(), {argument->substr(0, argument->size() - 1), std::string()});
+        const std::size_t sign = argument->find('=');
+        const std::string name = argument->substr(0, sign);
+        const Option* option = sign != argument->npos ? optionOf(name) : nullptr;
+        if (option && !option->takesValue())
+            throw UsageError(name + " takes no value");
+        if (option && sign + 1 == argument->size())
+            out.insert(out.end(), {name, std::string()});
         else
             out.push_back(*argument);
     }
@@ -140,6 +145,9 @@ std::vector<std::string> CommandLine::parse(std::span<const std::string> argumen
     std::reverse(reversed.begin(), reversed.end());
     try {
         parser.parse(reversed);
+    } catch (const CLI::ArgumentMismatch& error) {
+        const std::string_view words = error.what();  // "--name: 1 required TEXT missing"
+        throw UsageError(std::string(words.substr(0, words.find(':'))) + " needs a value");
     } catch (const CLI::ParseError& error) {
         throw UsageError(error.what());
     }

@@ -60,7 +60,7 @@ private:
         std::vector<Option> options;
     };
 
-    [[nodiscard]] bool takesValue(std::string_view longName) const;
+    [[nodiscard]] const Option* optionOf(std::string_view longName) const;
     [[nodiscard]] std::vector<std::string> withEmptyValuesApart(
         std::span<const std::string> arguments) const;
 

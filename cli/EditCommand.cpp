@@ -22,7 +22,8 @@ public:
 private:
     void readUpdates();
     [[nodiscard]] Dictionary updatesFor(const AssetPtr& asset) const;
-    [[nodiscard]] bool isRefused(const AssetPtr& asset, Result& result) const;
+    [[nodiscard]] bool isRefused(const AssetPtr& asset, const Dictionary& updates,
+                                 Result& result) const;
     void edit(PVAssetMetadataFileManager& manager, const AssetPtr& asset, Result& result) const;
     [[nodiscard]] std::string outcomeOf(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
                                         const AssetPtr& edited) const;
@@ -105,9 +106,23 @@ Dictionary EditCommand::updatesFor(const AssetPtr& asset) const {
     return updates;
 }
 
-bool EditCommand::isRefused(const AssetPtr& asset, Result& result) const {
+bool EditCommand::isRefused(const AssetPtr& asset, const Dictionary& updates,
+                            Result& result) const {
     if (m_changes.isForced())
         return false;
+    // A book is expanded from the place that its record names, over what has that name beside it,
+    // and what is written goes there.
+    const auto record = asset->dictionaryRepresentation();
+    const auto isElsewhere = [&](std::string_view place) {
+        const Value* told = updates.find(place);
+        const Value* known = record->find(place);
+        return told && !(known && *told == *known);
+    };
+    if (isElsewhere(key::sourcePath) || isElsewhere(key::path)) {
+        refuse(result, "the record would name another place, and the asset would stay in its own",
+               "\"parvel move\" moves it; --force edits what the record names then");
+        return true;
+    }
     const auto backup = asset->bazaarArtworkBackupURL();
     if (m_restoresCover && m_inflates && backup && !standsAt(*backup)) {
         refuse(result, "no first cover is kept in the book, and the present one would be lost",
@@ -119,18 +134,11 @@ bool EditCommand::isRefused(const AssetPtr& asset, Result& result) const {
 
 void EditCommand::edit(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
                        Result& result) const {
-    if (isRefused(asset, result))
-        return;
     const Dictionary updates = updatesFor(asset);
+    if (isRefused(asset, updates, result))
+        return;
     std::optional<StagingPlace> place = StagingPlace{};
     const bool isExpanded = m_inflates && asset->isCompressedBookWithError() == true;
-    // A book is expanded from the place that its record names, over what has that name beside it.
-    const bool isElsewhere = updates.find(key::sourcePath) || updates.find(key::path);
-    if (isExpanded && isElsewhere && !m_changes.isForced()) {
-        refuse(result, "the edit changes the place that the book would be expanded from",
-               "change it in an edit without --inflate, or give --force");
-        return;
-    }
     if (isExpanded)
         place = m_staging.placeFor(*asset->url(), asset->url()->deletingLastPathComponent(),
                                    m_changes.isForced(), result);
@@ -149,6 +157,9 @@ void EditCommand::edit(PVAssetMetadataFileManager& manager, const AssetPtr& asse
         result.outcome = outcomeOf(manager, asset, edited);
     else
         result.nothing = "not edited";
+    const bool isBadName = !edited && result.error == makeMissingURLError();
+    if (isBadName)
+        result.advice = "its display name makes no name of a file";
 }
 
 std::string EditCommand::outcomeOf(PVAssetMetadataFileManager& manager, const AssetPtr& asset,

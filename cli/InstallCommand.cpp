@@ -132,6 +132,12 @@ bool InstallCommand::isRefused(PVAssetMetadataFileManager& manager, const AssetP
                                Result& result) const {
     if (m_changes.isForced())
         return false;
+    const bool takesOldName = m_updating && m_replaces && !m_goesToCloud;
+    if (takesOldName && m_updating->assetType() != asset->assetType()) {
+        refuse(result, "the updated one is an asset of another kind, whose name it would get",
+               "leave out --updating, or give --force");
+        return true;
+    }
     if (const std::optional<URL> other = placeOfOldName(manager)) {
         refuse(result, other->path() + " is another asset than the updated one, and would be lost",
                "give its folder with --into, or --force to lose it");

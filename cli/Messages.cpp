@@ -2,14 +2,17 @@
 
 #include <cerrno>
 
+#include "cli/AssetWalk.h"
 #include "cli/TerminalText.h"
 
 namespace parvel::cli {
 namespace {
 
-std::string_view adviceForLibraryError(std::int64_t code) {
-    switch (static_cast<PVParvelFoundationErrorCode>(code)) {
+std::string_view adviceForLibraryError(const Result& result) {
+    switch (static_cast<PVParvelFoundationErrorCode>(result.error->code())) {
         case PVParvelFoundationErrorCode::NoAssetType:
+            if (isPlainFolder(urlOfPath(result.path).path()))
+                return "it is a folder: name the assets in it, or take them all with -r";
             return "a book ends in .epub or .folium, a document in .pdf, an audiobook in .m4a";
         case PVParvelFoundationErrorCode::NoAssetID:
             return "nothing in it or on it says which asset it is";
@@ -39,7 +42,7 @@ std::string_view adviceForPOSIXError(std::int64_t code) {
 std::string_view adviceFor(const Result& result) {
     const Error& error = *result.error;
     if (error.domain() == PVParvelFoundationErrorDomain)
-        return adviceForLibraryError(error.code());
+        return adviceForLibraryError(result);
     if (error.domain() == PVPOSIXErrorDomain)
         return adviceForPOSIXError(error.code());
     const bool isAbsent = error.domain() == PVFileErrorDomain &&

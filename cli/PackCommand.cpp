@@ -23,6 +23,7 @@ namespace {
 namespace fs = std::filesystem;
 
 constexpr std::string_view kMimetype = "mimetype";
+constexpr std::string_view kContainer = "META-INF/container.xml";
 constexpr std::size_t kLongestMimetype = 1024;
 
 /// An open file, closed with its owner.
@@ -190,8 +191,16 @@ void PackCommand::pack(PVAssetMetadataFileManager& manager, const AssetPtr& asse
     const URL package = *asset->url();
     std::error_code unknown;
     result.nothing = "not packed";
+    if (!standsAt(package)) {
+        result.error = makeFileError(PVFileErrorCode::NoSuchFile, package);
+        return;
+    }
     if (!fs::is_directory(package.path(), unknown)) {
         refuse(result, "it is no package folder", "a zipped book is packed already");
+        return;
+    }
+    if (!fs::exists(fs::path(package.path()) / kContainer, unknown)) {
+        refuse(result, "it holds no book", "a book has a " + std::string(kContainer));
         return;
     }
     const URL folder = target.standardized().deletingLastPathComponent();

@@ -46,7 +46,9 @@ void RenameCommand::rename(PVAssetMetadataFileManager& manager, const AssetPtr& 
             [this](PVMutableAssetMetadata& copy) { copy.setDisplayName(m_displayName); });
     const AssetPtr renamed = manager.normalizeNamingForAsset_error(named, &result.error);
     setRecord(result, renamed, PVAssetMetadataFlavorFull);
-    if (!renamed)
+    if (!renamed && result.error == makeMissingURLError())
+        result.advice = "its display name makes no name of a file";
+    else if (!renamed)
         result.advice = adviceForTransfer(result, urlOfPath(result.path),
                                           "choose another name with --display-name");
     else if (renamed->url() != asset->url())

@@ -2,6 +2,8 @@
 
 #include <cerrno>
 
+#include "cli/BookStaging.h"
+
 namespace parvel::cli {
 namespace {
 
@@ -9,13 +11,14 @@ std::string adviceForFileError(const Result& result, const URL& place, const URL
                                std::string_view ifTaken) {
     switch (static_cast<PVFileErrorCode>(result.error->code())) {
         case PVFileErrorCode::FileExists:
+            if (isSamePlace(place, source))
+                return "it is there already";
             return "something stands at " + place.path() + (ifTaken.empty() ? "" : ": ") +
                    std::string(ifTaken);
         case PVFileErrorCode::NoSuchFile:
             if (place == source)
                 return place == urlOfPath(result.path) ? "" : place.path() + " is not there";
-            return "there is no folder " + place.deletingLastPathComponent().path() +
-                   ": make it first";
+            return adviceForMissingFolder(place.deletingLastPathComponent());
         case PVFileErrorCode::Corrupt:
             break;
     }

@@ -5,6 +5,7 @@
 
 #include "parvel/platform/linux/cloud/ListenerOwner.h"
 
+#include <fcntl.h>
 #include <netinet/in.h>
 #include <unistd.h>
 
@@ -15,18 +16,21 @@
 #include <optional>
 #include <string>
 #include <string_view>
-#include <vector>
+#include <utility>
 
 #include "parvel/platform/linux/FileDescriptor.h"
-#include "parvel/platform/linux/OpenFolder.h"
 #include "parvel/platform/linux/SystemCall.h"
 
 namespace parvel::host {
 
 namespace {
 
-/// Where a listener of a table may stand to get a connection: addresses with ports, as written.
-using Places = std::vector<std::string>;
+/// Where a listener of a table may stand to get a connection, as written: at the address itself,
+/// which goes before, or at every one.
+struct Places {
+    std::string exact;
+    std::string everywhere;
+};
 
 std::string hexadecimal(std::uint32_t number, std::size_t digits) {
     constexpr std::string_view names = "0123456789ABCDEF";
@@ -36,9 +40,11 @@ std::string hexadecimal(std::uint32_t number, std::size_t digits) {
     return text;
 }
 
+/// Of an address of version 6.
+using Words = std::array<std::uint32_t, 4>;
+
 /// An address's words as the tables have them, each in the order of this machine.
-template <std::size_t size>
-std::string written(const std::array<std::uint32_t, size>& words) {
+std::string written(const Words& words) {
     std::string text;
     for (const std::uint32_t word : words)
         text += hexadecimal(word, 8);
@@ -46,26 +52,26 @@ std::string written(const std::array<std::uint32_t, size>& words) {
 }
 
 struct Tables {
-    Places tcp;
+    std::optional<Places> tcp;
     Places tcp6;
 };
 
 Tables placesOf(const sockaddr_storage& address) {
-    constexpr std::array<std::uint32_t, 4> everywhere6{};
+    constexpr Words everywhere6{};
     if (address.ss_family == AF_INET) {
         sockaddr_in to{};
         std::memcpy(&to, &address, sizeof to);
         const std::uint32_t host = to.sin_addr.s_addr;
         const std::string port = ":" + hexadecimal(ntohs(to.sin_port), 4);
-        return {{hexadecimal(host, 8) + port, hexadecimal(INADDR_ANY, 8) + port},
-                {written<4>({0, 0, htonl(0xFFFF), host}) + port, written(everywhere6) + port}};
+        return {Places{hexadecimal(host, 8) + port, hexadecimal(INADDR_ANY, 8) + port},
+                {written({0, 0, htonl(0xFFFF), host}) + port, written(everywhere6) + port}};
     }
     sockaddr_in6 to{};
     std::memcpy(&to, &address, sizeof to);
-    std::array<std::uint32_t, 4> host{};
+    Words host{};
     std::memcpy(host.data(), &to.sin6_addr, sizeof to.sin6_addr);
     const std::string port = ":" + hexadecimal(ntohs(to.sin6_port), 4);
-    return {{}, {written(host) + port, written(everywhere6) + port}};
+    return {std::nullopt, {written(host) + port, written(everywhere6) + port}};
 }
 
 /// Takes the next word off the line.
@@ -76,13 +82,22 @@ std::string_view nextWord(std::string_view& line) {
     return word;
 }
 
-/// What the listeners of a table say of the places.
+/// Whether a user who listens is this one, or the system's own, who can read what is sent anyway.
+bool isTrustedUser(std::string_view digits) {
+    uid_t user = 0;
+    const char* const end = digits.data() + digits.size();
+    const auto read = std::from_chars(digits.data(), end, user);
+    return read.ec == std::errc() && read.ptr == end && (user == ::geteuid() || user == 0);
+}
+
+/// What the listeners of the tables say of the places.
 struct Found {
+    std::optional<bool> isExactTrusted;
     bool isOwn = false;
     bool isForeign = false;
 };
 
-/// False at the end of the listeners.
+/// False where nothing more is to be learnt from the table: the listeners end, or one is exact.
 bool readLine(std::string_view line, const Places& places, Found& found) {
     constexpr std::string_view listening = "0A";
     nextWord(line);
@@ -90,24 +105,23 @@ bool readLine(std::string_view line, const Places& places, Found& found) {
     nextWord(line);
     if (nextWord(line) != listening)
         return false;
-    if (std::find(places.begin(), places.end(), local) == places.end())
+    if (local != places.exact && local != places.everywhere)
         return true;
     for (int skipped = 0; skipped < 3; ++skipped)
         nextWord(line);
-    const std::string_view digits = nextWord(line);
-    uid_t user = 0;
-    const bool isRead =
-        std::from_chars(digits.data(), digits.data() + digits.size(), user).ec == std::errc();
-    // The system's own user can read whatever is sent in any case.
-    const bool isTrusted = isRead && (user == ::geteuid() || user == 0);
-    (isTrusted ? found.isOwn : found.isForeign) = true;
-    return true;
+    const bool isTrusted = isTrustedUser(nextWord(line));
+    if (local == places.exact)
+        found.isExactTrusted = isTrusted;
+    else
+        (isTrusted ? found.isOwn : found.isForeign) = true;
+    return local != places.exact;
 }
 
 void readTable(const char* path, const Places& places, Found& found) {
     const FileDescriptor table(retried([&] { return ::open(path, O_RDONLY | O_CLOEXEC); }));
     std::string text;
-    std::array<char, 16384> buffer;
+    // As long as a padded line: to fill a larger one, the kernel looks through all sockets.
+    std::array<char, 150> buffer;
     for (bool isTitle = true; table;) {
         const ssize_t length =
             retried([&] { return ::read(table.get(), buffer.data(), buffer.size()); });
@@ -127,9 +141,11 @@ void readTable(const char* path, const Places& places, Found& found) {
 bool isListenerTrusted(const sockaddr_storage& address) {
     const Tables places = placesOf(address);
     Found found;
-    readTable("/proc/net/tcp", places.tcp, found);
-    readTable("/proc/net/tcp6", places.tcp6, found);
-    return found.isOwn && !found.isForeign;
+    if (places.tcp)
+        readTable("/proc/net/tcp", *places.tcp, found);
+    if (!found.isExactTrusted)
+        readTable("/proc/net/tcp6", places.tcp6, found);
+    return found.isExactTrusted.value_or(found.isOwn && !found.isForeign);
 }
 
 }  // namespace parvel::host

@@ -3,24 +3,14 @@
 #include <algorithm>
 #include <ostream>
 
-#include "parvel/metadata/PVMutableAssetMetadata.h"
-#include "parvel/platform/XattrStore.h"
-#include "parvel/xattr/PNMetadataXattr.h"
+#include "tests/faults/EditOperations.h"
+#include "tests/faults/InstallOperations.h"
+#include "tests/faults/OperationParts.h"
 
 namespace parvel::testing {
 namespace {
 
 using Manager = PVAssetMetadataFileManager;
-
-MutableAssetPtr assetAt(const TestLibrary& library, const std::string& place) {
-    auto asset = PVAssetMetadata::metadataWithURL_dictionary(library.url(place), nullptr);
-    asset->setTitle("A title");
-    asset->setAuthor("An author");
-    asset->setGenre("Science");
-    const Value storeID("4711");
-    asset->setStoreID(&storeID);
-    return asset;
-}
 
 auto moving(const std::string& from, const std::string& to, bool replace = false) {
     return [=](Manager& manager, const TestLibrary& library) {
@@ -106,25 +96,7 @@ auto attributing(const std::string& at) {
     };
 }
 
-bool hasAttribute(const std::string& path, std::string_view name) {
-    std::size_t size = 0;
-    return XattrStore::host().size(path, std::string(name), size) == 0;
-}
-
-/// An item that has its identity has all else, so that a set that was cut short is written again.
-auto identityComesLast(const std::string& at) {
-    return [=](const TestLibrary& library) -> std::string {
-        const std::string path = library.path(at);
-        const bool isComplete = hasAttribute(path, PNMetadataXattrTitle) &&
-                                hasAttribute(path, PNMetadataXattrAuthor) &&
-                                hasAttribute(path, PNMetadataXattrGenre);
-        return hasAttribute(path, PNMetadataXattrAssetID) && !isComplete
-                   ? "the identity was written before the rest"
-                   : "";
-    };
-}
-
-std::vector<Operation> makeOperations() {
+std::vector<Operation> fileOperations() {
     return {
         {"MovesAFile",
          {{"from/a.pdf", "file 1"}},
@@ -225,6 +197,11 @@ std::vector<Operation> makeOperations() {
          {},
          removing("from/a.epub"),
          {{}}},
+        {"RemovesABarredPackage",
+         {{"from/a.epub", "package 1 barred"}},
+         {},
+         removing("from/a.epub"),
+         {{}}},
         {"RedactsAPackage",
          {{"from/a.epub", "package 1"}},
          {{"to/a.epub", "package 1"}},
@@ -268,6 +245,13 @@ std::vector<Operation> makeOperations() {
          .run = stamping("from/a.pdf"),
          .alsoHolds = identityComesLast("from/a.pdf")},
     };
+}
+
+std::vector<Operation> makeOperations() {
+    std::vector<Operation> all = fileOperations();
+    for (const auto& more : {installOperations(), editOperations()})
+        all.insert(all.end(), more.begin(), more.end());
+    return all;
 }
 
 bool isOnOtherFileSystem(const Layout& layout) {

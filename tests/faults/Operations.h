@@ -20,9 +20,16 @@ struct Operation {
     std::vector<Layout> between = {};
     /// What else a kill may leave, for the length of one system call.
     std::vector<Layout> killed = {};
+    /// What else a failure may leave.
+    std::vector<Layout> failed = {};
+    /// What else it may leave with success: a step failed whose failure it passes over.
+    std::vector<Layout> succeeded = {};
     /// What more must hold whatever happened; what is wrong, or nothing.
     std::function<std::string(const TestLibrary& library)> alsoHolds = nullptr;
-    bool answers = true;  ///< whether its result tells its success
+    /// Made ready before it runs, where a layout does not say all.
+    std::function<void(const TestLibrary& library)> prepare = nullptr;
+    bool completesWhatIsLeft = false;  ///< tried again, it also clears what it left itself
+    bool answers = true;               ///< whether its result tells its success
     bool hasTrashOnOtherFileSystem = false;
 
     [[nodiscard]] bool needsTwoFileSystems() const;

@@ -10,6 +10,7 @@
 #include <sys/ioctl.h>
 #include <sys/prctl.h>
 #include <sys/socket.h>
+#include <sys/stat.h>
 #include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -197,8 +198,10 @@ FileDescriptor receiveDescriptor(int socket) {
     return FileDescriptor(descriptor);
 }
 
-/// Root would be refused nothing by modes; the children are refused what a user is.
+/// Root would be refused nothing by modes; the children are refused what a user is, and make files
+/// as most users do.
 void becomeOrdinaryUser() {
+    ::umask(022);
     if (::geteuid() == 0 && (::setresgid(kNobody, kNobody, kNobody) != 0 ||
                              ::setresuid(kNobody, kNobody, kNobody) != 0))
         ::_exit(kNoFilter);

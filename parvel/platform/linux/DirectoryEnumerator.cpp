@@ -17,12 +17,17 @@ constexpr int kMaximumEnumeratedDepth = 400;
 
 class EnumeratedEntry : public DirectoryEnumerator::Entry {
 public:
-    EnumeratedEntry(int folder, const char* name) : m_folder(folder), m_name(name) {
-        m_isKnown = ::fstatat(folder, name, &m_status, AT_SYMLINK_NOFOLLOW) == 0;
+    EnumeratedEntry(int folder, const dirent& listed) : m_folder(folder), m_listed(listed) {
+        m_isKnown = ::fstatat(folder, listed.d_name, &m_status, AT_SYMLINK_NOFOLLOW) == 0;
     }
 
+    /// Most file systems list the kind with the name. So a folder whose status can't be had is not
+    /// given the mode of a file, by which nobody could enter it.
     std::optional<bool> isDirectory() const override {
-        return m_isKnown ? std::optional(S_ISDIR(m_status.st_mode)) : std::nullopt;
+        if (m_isKnown)
+            return S_ISDIR(m_status.st_mode);
+        return m_listed.d_type == DT_UNKNOWN ? std::nullopt
+                                             : std::optional(m_listed.d_type == DT_DIR);
     }
     std::optional<std::uint64_t> totalAllocatedSize() const override {
         if (!m_isKnown)
@@ -30,12 +35,12 @@ public:
         return static_cast<std::uint64_t>(m_status.st_blocks) * 512;
     }
     bool setPermissions(unsigned mode) const override {
-        return ::fchmodat(m_folder, m_name, mode, AT_SYMLINK_NOFOLLOW) == 0;
+        return ::fchmodat(m_folder, m_listed.d_name, mode, AT_SYMLINK_NOFOLLOW) == 0;
     }
 
 private:
     int m_folder;
-    const char* m_name;
+    const dirent& m_listed;
     struct stat m_status {};
     bool m_isKnown;
 };
@@ -51,7 +56,7 @@ void enumerateFolder(FileDescriptor folder, int depth,
     while (const dirent* found = ::readdir(opened)) {
         if (found->d_name[0] == '.')
             continue;
-        const EnumeratedEntry entry(descriptor, found->d_name);
+        const EnumeratedEntry entry(descriptor, *found);
         visit(entry);
         if (entry.isDirectory() == true && depth < kMaximumEnumeratedDepth)
             enumerateFolder(

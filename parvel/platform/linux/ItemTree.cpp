@@ -160,18 +160,19 @@ int unlinkEntry(int folder, const char* name, int flags) {
     return error;
 }
 
-/// Opens a folder on the way down, made readable first where it is our own and was not; then
-/// `oldMode` is the mode that it had.
+/// Opens a folder on the way down, made readable and searchable first where it is our own and was
+/// not; then `oldMode` is the mode that it had.
 FileDescriptor openForRemoval(int folder, const char* name, std::optional<mode_t>& oldMode) {
     const int flags = O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
     FileDescriptor below(::openat(folder, name, flags));
     struct stat status {};
-    if (below || errno != EACCES)
+    const bool isUsable = below && ::faccessat(below.get(), ".", X_OK, AT_EACCESS) == 0;
+    if (isUsable || errno != EACCES)
         return below;
     if (::fstatat(folder, name, &status, AT_SYMLINK_NOFOLLOW) != 0 ||
         ::fchmodat(folder, name, S_IRWXU, AT_SYMLINK_NOFOLLOW) != 0) {
         errno = EACCES;
-        return below;
+        return {};
     }
     oldMode = status.st_mode & ALLPERMS;
     below = FileDescriptor(::openat(folder, name, flags));

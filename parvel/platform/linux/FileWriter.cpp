@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <sys/stat.h>
 
+#include <cerrno>
 #include <cstdio>
 #include <string>
 
@@ -45,7 +46,9 @@ int makeFile(const std::string& path, const Data& bytes) {
 /// Puts the mode and attributes of the file that goes on the one that comes. A link has none.
 int inheritFrom(const std::string& oldFile, const std::string& newFile) {
     struct stat status {};
-    if (::lstat(oldFile.c_str(), &status) != 0 || !S_ISREG(status.st_mode))
+    if (::lstat(oldFile.c_str(), &status) != 0)
+        return errno == ENOENT ? 0 : errno;
+    if (!S_ISREG(status.st_mode))
         return 0;
     if (const int error = host::inheritMetadata(oldFile, newFile))
         return error;

@@ -161,7 +161,9 @@ std::vector<Finding> AssetDiagnosis::findingsOfAsset(Result& result) {
                             "it can't be inspected: " + (inspected.reason.empty() && inspected.error
                                                              ? inspected.error->message()
                                                              : inspected.reason),
-                            "bring it back from a backup, or from where it came"});
+                            access(url.path().c_str(), R_OK) == 0
+                                ? "bring it back from a backup, or from where it came"
+                                : "check the permissions of the file"});
     if (keepsNoAttributes(url) && isFirstOfItsFileSystem(url))
         findings.push_back(makeNoAttributesFinding());
     addAttributeFindings(url, report && report->isUbiquitous, findings);

@@ -39,6 +39,10 @@ constexpr std::array kReasons{
     Reason{"Failed to determine if url is directory", "the file could not be looked at", 5},
     Reason{"Exception while parsing Bazaar Metadta", "the store metadata file is malformed", 5},
     Reason{"BazaarMetadata: fail", "the file is no property list", 5},
+    Reason{"persistMetadata: Failed to create metadata plist",
+           "what it should keep is nothing that its store metadata file can hold", 5},
+    Reason{"persistMetadata: Failed to persist updated book metadata",
+           "its store metadata file could not be written", 5},
     Reason{"Failed to get opf data. url: %@ error: %@", "the package document can't be read", 4},
     Reason{"Failed to get opf data", "the book has no container document (META-INF/container.xml)",
            3},
@@ -97,6 +101,10 @@ void printLogLines(LogLevel least) {
 }
 
 CallLog::CallLog(LogLevel least) : m_scope(*this, std::min(least, s_printed)) {}
+
+bool CallLog::hasKnownReason() const {
+    return m_rank > kFailureRank;
+}
 
 void CallLog::clear() {
     m_reason.clear();

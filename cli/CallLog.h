@@ -24,6 +24,8 @@ public:
     void clear();
     /// Why the call yielded nothing, in words for a person; empty when nothing was said.
     [[nodiscard]] const std::string& reason() const { return m_reason; }
+    /// Whether a step failed that is known for what it means to a person.
+    [[nodiscard]] bool hasKnownReason() const;
 
 private:
     void write(const LogLine& line) override;

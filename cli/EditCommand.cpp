@@ -1,13 +1,12 @@
 #include "cli/AssetChanges.h"
 #include "cli/BookStaging.h"
+#include "cli/CallLog.h"
 #include "cli/Command.h"
 #include "cli/FileContents.h"
 #include "cli/Progress.h"
 #include "cli/PropertyValue.h"
 #include "cli/RecordFile.h"
-#include "parvel/foundation/ValueReadings.h"
 #include "parvel/metadata/PVAssetMetadataKeys.h"
-#include "parvel/xattr/PNMetadataXattr.h"
 
 namespace parvel::cli {
 namespace {
@@ -26,7 +25,7 @@ private:
                                  Result& result) const;
     void edit(PVAssetMetadataFileManager& manager, const AssetPtr& asset, Result& result) const;
     [[nodiscard]] std::string outcomeOf(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
-                                        const AssetPtr& edited) const;
+                                        const AssetPtr& edited, Result& result) const;
 
     std::vector<std::string> m_sets;
     std::optional<std::string> m_updatesFile;
@@ -145,6 +144,7 @@ void EditCommand::edit(PVAssetMetadataFileManager& manager, const AssetPtr& asse
     if (!place)
         return;
     AssetPtr edited;
+    CallLog log;
     {
         BusyProgress progress(m_form, result.path);
         edited = manager.updateAsset_withUpdates_temporaryDirectory_inflateIfNeeded_error(
@@ -153,17 +153,18 @@ void EditCommand::edit(PVAssetMetadataFileManager& manager, const AssetPtr& asse
             progress.finish();
     }
     setRecord(result, edited, PVAssetMetadataFlavorFull);
-    if (edited)
-        result.outcome = outcomeOf(manager, asset, edited);
-    else
-        result.nothing = "not edited";
+    result.nothing = edited ? "not all of it is written" : "not edited";
+    result.reason = log.reason();
+    result.isUndone = edited && log.hasKnownReason();
+    if (edited && !result.isUndone)
+        result.outcome = outcomeOf(manager, asset, edited, result);
     const bool isBadName = !edited && result.error == makeMissingURLError();
     if (isBadName)
         result.advice = "its display name makes no name of a file";
 }
 
 std::string EditCommand::outcomeOf(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
-                                   const AssetPtr& edited) const {
+                                   const AssetPtr& edited, Result& result) const {
     // Where nothing but the name changes, the library gives the record of the old name.
     if (edited == asset)
         return manager.fileManager()->itemExistsAtPath(asset->url()->path())
@@ -175,12 +176,13 @@ std::string EditCommand::outcomeOf(PVAssetMetadataFileManager& manager, const As
         return "nothing is written on an audiobook; this is what its record would be";
     if (asset->isBook() && m_inflates)
         return "edited";
-    const auto kept = manager.extendedAttributesForAsset_error(edited);
-    const Value* identity = kept ? kept->find(PNMetadataXattrAssetID) : nullptr;
-    const bool keepsAttributes = identity && stringForm(identity) == edited->assetID();
-    if (!keepsAttributes)
+    // What an edit could not write it tells nobody; written once more, that has an error.
+    std::optional<Error> error;
+    (void)manager.updateExtendedAttributesForAsset_error(edited, &error);
+    if (error == makeNoIdentityError())
         return "nothing is written: the file keeps no attributes of this asset; write them first, "
                "with \"parvel attributes --write\"";
+    result.error = error;
     return asset->isBook() ? "its attributes are written; --inflate writes into the book, too"
                            : "its attributes are written";
 }

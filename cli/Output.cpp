@@ -6,6 +6,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "cli/Messages.h"
+
 namespace parvel::cli {
 namespace {
 
@@ -43,8 +45,8 @@ void Output::flush() {
 bool Output::finish(std::string_view command) {
     flush();
     if (failed() && m_errno != EPIPE)
-        writeToStandardError("parvel: " + std::string(command) +
-                             ": standard output: " + strerrordesc_np(m_errno) + "\n");
+        writeToStandardError(
+            problemLine(command, std::string("standard output: ") + strerrordesc_np(m_errno)));
     return !failed();
 }
 

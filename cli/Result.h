@@ -22,12 +22,13 @@ struct Result {
     std::optional<Error> error;
     std::vector<Dictionary::Entry> fields;  ///< what the command adds to the keys of every result
     bool needsRecord = true;                ///< whether it is a failure that there is no record
+    bool isUndone = false;                  ///< a record came, but not all that it says was written
     std::string_view nothing = "no metadata";  ///< what there is where there is no record
     std::string reason;   ///< what the log said about a failure, in words for a person
     std::string advice;   ///< what to do about a failure, where the command knows
     std::string outcome;  ///< what was done, in words for a person, where that is the result's text
 
-    [[nodiscard]] bool succeeded() const { return (record || !needsRecord) && !error; }
+    [[nodiscard]] bool succeeded() const { return (record || !needsRecord) && !error && !isUndone; }
 };
 
 /// "epub", "folium", "pdf", "m4a" or "unknown".

@@ -1,4 +1,4 @@
-"""PDFs and tagged audio files made from nothing, for a folder of books that holds none."""
+"""Chapters, PDFs and tagged audio files made from nothing."""
 
 import random
 import struct
@@ -9,6 +9,13 @@ WORDS = "the lamp of a garden in winter stood over every road that led away from
 
 def text_of(chance, words):
     return " ".join(chance.choice(WORDS) for _ in range(words))
+
+
+def made_chapter(number):
+    """40 KB of text."""
+    chance = random.Random(number)
+    paragraphs = "".join(f"<p>{text_of(chance, 80)}</p>\n" for _ in range(110))
+    return f"<html><body>{paragraphs}</body></html>".encode()
 
 
 def page_content(chance):

@@ -33,12 +33,14 @@ LARGE_AUDIO = 110 << 20
 COPIED = 170 << 20
 RECORDS = (1_000, 10_000, 100_000)
 MADE = 12  # files made from nothing
-EXPANDED = 20  # books to expand, three of them with many entries
+EXPANDED = 40  # books to expand, one of them with many entries
 CONTAINER = "{urn:oasis:names:tc:opendocument:xmlns:container}"
 OPF = "{http://www.idpf.org/2007/opf}"
 DC = "{http://purl.org/dc/elements/1.1/}"
 STORE_FILE = "BazaarMetadata.plist"
 FILLER = random.Random(1).randbytes(LARGEST)
+PICTURE = 120 << 10
+CHAPTERS = [made_files.made_chapter(number) for number in range(8)]
 
 
 def share_of(number, share):
@@ -92,6 +94,18 @@ def store_file(number):
                            "itemId": 900000 + number, "genre": "Fiction"})
 
 
+def fill(archive, size):
+    """Adds pictures, which no longer shrink, and chapters until the file is that large."""
+    for number in itertools.count():
+        missing = size - archive.fp.tell()
+        if missing <= 0:
+            return
+        start = number * PICTURE % (LARGEST - PICTURE)
+        archive.writestr(f"OEBPS/images/plate-{number:04}.jpg",
+                         FILLER[start:start + min(missing, PICTURE)], zipfile.ZIP_STORED)
+        archive.writestr(f"OEBPS/text/part-{number:04}.xhtml", CHAPTERS[number % len(CHAPTERS)])
+
+
 def write_book(path, entries, number, chance):
     size = int(SMALLEST * (LARGEST / SMALLEST) ** chance.random())
     with zipfile.ZipFile(path, "w", zipfile.ZIP_DEFLATED, compresslevel=1) as archive:
@@ -106,9 +120,7 @@ def write_book(path, entries, number, chance):
         if number % 100 == 50:
             for index in range(MANY_ENTRIES - len(names)):
                 archive.writestr(f"OEBPS/pages/{index:05}.xhtml", b"<p/>", zipfile.ZIP_STORED)
-        missing = size - archive.fp.tell()
-        if missing > 0:
-            archive.writestr("OEBPS/filler.bin", FILLER[:missing], zipfile.ZIP_STORED)
+        fill(archive, size)
 
 
 def write_package(folder, zipped, entries):
@@ -215,10 +227,11 @@ def write_books(into, sources, count, parvel):
     books = [into / "books" / f"{number:05}.epub" for number in range(count)]
     for number, path in enumerate(books):
         write_book(path, sources[number % len(sources)], number, chance)
-    many = books[50::100][:3]
-    few = [books[number * 97 % count] for number in range(EXPANDED)]
     write_list(into, "books", books)
-    write_list(into, "expanded-books", list(dict.fromkeys(many + few))[:EXPANDED])
+    # The first asset is taken off with the start: the smallest, for what comes of the others is
+    # told beside what comes of all.
+    expanded = {*books[50:51], *(books[number * 97 % count] for number in range(EXPANDED - 1))}
+    write_list(into, "expanded-books", sorted(expanded, key=lambda path: path.stat().st_size))
     write_list(into, "attributed", [path for number, path in enumerate(books) if number % 3])
     write_attributes(into, "attributed", parvel)
 

@@ -201,9 +201,7 @@ protected:
     /// What was not done is done when it is tried again.
     void expectSuccessLater(const TestLibrary& library) const {
         const Layout found = layoutOf(library);
-        const bool isLeft = m_operation.completesWhatIsLeft && found != m_operation.after &&
-                            !contains(m_operation.succeeded, found) &&
-                            !contains(m_operation.failed, found);
+        const bool isLeft = m_operation.completesWhatIsLeft && contains(m_operation.between, found);
         if (found != m_operation.before && !isLeft)
             return;
         EXPECT_EQ(runFreely(m_host.abilities, [&] { return run(library); }), m_operation.answers)

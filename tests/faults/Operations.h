@@ -9,7 +9,8 @@
 
 namespace parvel::testing {
 
-/// An operation that is cut short everywhere: a row of the table in Operations.cpp.
+/// An operation that is cut short everywhere: a row of a table in Operations.cpp,
+/// InstallOperations.cpp or EditOperations.cpp.
 struct Operation {
     std::string name;
     Layout before;

@@ -281,10 +281,14 @@ std::string TestLibrary::nameOf(const std::string& path, const Layout& known) co
         if (modelOf(item).whole == found)
             return item;
     }
+    std::string alike;  // the plainest of those that differ from each other in modes alone
     for (const auto& [place, item] : known) {
-        if (modelOf(item).butForModes == foundButForModes)
-            return item + " but for modes";
+        const bool isPlainer = alike.empty() || item.size() < alike.size();
+        if (isPlainer && modelOf(item).butForModes == foundButForModes)
+            alike = item;
     }
+    if (!alike.empty())
+        return alike + " but for modes";
     for (const auto& [place, item] : known) {
         if (isPartOf(path, modelOf(item).path))
             return "part of " + item;

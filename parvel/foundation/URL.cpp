@@ -92,7 +92,6 @@ struct URLParts {
     std::string_view scheme;
     std::optional<std::string_view> authority;
     std::string_view path;
-    std::string_view tail;  ///< the query and the fragment, with their marks
 };
 
 /// None where there is no scheme.
@@ -100,7 +99,7 @@ std::optional<URLParts> splitURL(std::string_view text) {
     const std::size_t colon = text.find(':');
     if (colon == std::string_view::npos || colon == 0)
         return std::nullopt;
-    URLParts parts{text.substr(0, colon), std::nullopt, text.substr(colon + 1), {}};
+    URLParts parts{text.substr(0, colon), std::nullopt, text.substr(colon + 1)};
     const bool isScheme = isLetter(parts.scheme.front()) &&
                           std::all_of(parts.scheme.begin(), parts.scheme.end(), [](char c) {
                               return isLetter(c) || isDigit(c) || c == '+' || c == '-' || c == '.';
@@ -114,9 +113,7 @@ std::optional<URLParts> splitURL(std::string_view text) {
         parts.authority = parts.path.substr(0, end);
         parts.path.remove_prefix(end);
     }
-    const std::size_t end = std::min(parts.path.find_first_of("?#"), parts.path.size());
-    parts.tail = parts.path.substr(end);
-    parts.path = parts.path.substr(0, end);
+    parts.path = parts.path.substr(0, parts.path.find_first_of("?#"));
     return parts;
 }
 

@@ -96,6 +96,14 @@ TEST(URL, IsNoneForABrokenFileURL) {
         EXPECT_FALSE(URL::fromString(text)) << text;
 }
 
+TEST(URL, TakesNoCharacterBesideTheHexadecimalDigitsForOne) {
+    for (const char* text : {"%/0", "%:0", "%@0", "%G0", "%`0", "%g0", "%0/", "%0:", "%0@", "%0G",
+                             "%0`", "%0g", "%+1", "%-1", "% 1"})
+        EXPECT_EQ(pathOfText("file:///a" + std::string(text)), "none") << text;
+    for (const char* text : {"%30", "%39", "%41", "%4F", "%6a", "%6f"})
+        EXPECT_NE(pathOfText("file:///" + std::string(text)), "none") << text;
+}
+
 TEST(URL, ReadsOtherURLsWithTheirPathAsItStands) {
     const std::optional<URL> url = URL::fromString("https://host:80/a%20b/c.png?x=/y.z#f");
 

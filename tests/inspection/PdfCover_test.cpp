@@ -87,6 +87,7 @@ TEST(PdfCover, InABoxWithoutRoomIsNone) {
 
     EXPECT_FALSE(drawnIn(&page, 0, 380));
     EXPECT_FALSE(drawnIn(nullptr, 340, 0));
+    EXPECT_FALSE(drawnIn(nullptr, 10, 1));  // not a pixel wide
     EXPECT_FALSE(drawnIn(nullptr, 1e9, 1e9));
     EXPECT_FALSE(drawnIn(nullptr, -1, -1));
 }

@@ -173,6 +173,21 @@ TEST(IdentityMetadata, HasNoPathNorURLNorWarningWithAGeneratedIDAlone) {
     EXPECT_TRUE(log.lines().empty());
 }
 
+TEST(IdentityMetadata, HasNoPathNorURLNorWarningWithAStoreIDAlone) {
+    const RecordedLog log;
+    const Value storeID = integerValue(7);
+
+    const MutableAssetPtr record =
+        PVAssetMetadata::identityMetadataWithStoreID_generatedID_url_error(&storeID, nullptr,
+                                                                           std::nullopt);
+
+    ASSERT_TRUE(record);
+    EXPECT_EQ(*record->backingDictionary(),
+              (Dictionary{{"itemId", "7"}, {"PVGenerationCount", integerValue(1)}}));
+    EXPECT_EQ(record->url(), std::nullopt);
+    EXPECT_TRUE(log.lines().empty());
+}
+
 TEST(IdentityMetadata, HasTheURLAlone) {
     const MutableAssetPtr record =
         PVAssetMetadata::identityMetadataWithStoreID_generatedID_url_error(

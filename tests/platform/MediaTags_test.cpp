@@ -135,8 +135,17 @@ TEST_F(AudioTags, ACoverIsTheFirstItemsBytesOfAnyTypeButText) {
 }
 
 TEST_F(AudioTags, ACoverOverTheLimitIsNone) {
-    EXPECT_EQ(bytesOf(open(file(item("covr", 13, "12345")))->bytes(MediaTag::CoverArt, 4)),
-              "(none)");
+    const std::string bytes = file(item("covr", 13, "12345"));
+
+    EXPECT_EQ(bytesOf(open(bytes)->bytes(MediaTag::CoverArt, 4)), "(none)");
+    EXPECT_EQ(bytesOf(open(bytes)->bytes(MediaTag::CoverArt, 5)), "12345");
+}
+
+TEST_F(AudioTags, ATextOverAMebibyteIsNone) {
+    const std::string longest(1 << 20, 'x');
+
+    EXPECT_EQ(text(file(item(kArtist, 1, longest)), MediaTag::Artist), longest);
+    EXPECT_EQ(text(file(item(kArtist, 1, longest + "x")), MediaTag::Artist), std::nullopt);
 }
 
 TEST_F(AudioTags, ACoverThatClaimsMoreThanTheFileHasIsNone) {

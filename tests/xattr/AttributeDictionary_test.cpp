@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include <cerrno>
+
 #include "parvel/xattr/PNMetadataXattr.h"
 #include "tests/support/AttributeFolder.h"
 #include "tests/support/ForwardingXattrStore.h"
@@ -167,6 +169,25 @@ TEST_F(AttributeDictionary, AsksNameByNameWhereTheListFails) {
     EXPECT_EQ(attributeDictionaryAtURL(url), (Dictionary{{String(PNMetadataXattrAssetID), "ID"},
                                                          {String(PNMetadataXattrRating), "5"}}));
     EXPECT_EQ(store.m_asked.size(), std::size(dictionaryNames));
+}
+
+/// Has no decorated form of one name.
+class StoreWithoutAName : public ForwardingXattrStore {
+public:
+    bool decorate(std::string& name) override {
+        if (name != PNMetadataXattrYear)
+            return ForwardingXattrStore::decorate(name);
+        errno = EINVAL;
+        return false;
+    }
+};
+
+TEST_F(AttributeDictionary, IsNoneWhereANameCanNotBeDecorated) {
+    const URL url = file();
+    setStored(url, PNMetadataXattrTitle, "Title");
+    const StoreWithoutAName store;
+
+    EXPECT_EQ(attributeDictionaryAtURL(url), std::nullopt);
 }
 
 TEST_F(AttributeDictionary, IsNoneForAFileThatCanBeListedButNotRead) {

@@ -113,6 +113,40 @@ TEST_F(AttributeWriting, UpdatingWritesWhatDiffers) {
     EXPECT_EQ(stored(url, PNMetadataXattrSortTitle), Text());
 }
 
+TEST_F(AttributeWriting, UpdatingWritesEachOfTitleAuthorAndGenreByItself) {
+    const URL url = file();
+    const auto asset = record(url);
+    ASSERT_TRUE(setAttributesForAsset(asset, nullptr));
+
+    asset->setAuthor("Another");
+    EXPECT_TRUE(updateAttributesForAsset(asset, &m_error));
+    EXPECT_EQ(stored(url, PNMetadataXattrAuthor), "Another");
+    EXPECT_EQ(stored(url, PNMetadataXattrTitle), "Title");
+
+    asset->setGenre("Other");
+    EXPECT_TRUE(updateAttributesForAsset(asset, &m_error));
+    EXPECT_EQ(stored(url, PNMetadataXattrGenre), "Other");
+
+    asset->setTitle("");
+    EXPECT_TRUE(updateAttributesForAsset(asset, &m_error));
+    EXPECT_EQ(stored(url, PNMetadataXattrTitle), "");
+    EXPECT_FALSE(m_error);
+}
+
+TEST_F(AttributeWriting, UpdatingLeavesWhatTheRecordLacks) {
+    const URL url = file();
+    ASSERT_TRUE(setAttributesForAsset(record(url), nullptr));
+    const auto bare = PVAssetMetadata::metadataWithURL_dictionary(url, nullptr);
+    bare->setGeneratedID("ID");
+
+    EXPECT_FALSE(updateAttributesForAsset(bare, &m_error));
+
+    EXPECT_EQ(stored(url, PNMetadataXattrTitle), "Title");
+    EXPECT_EQ(stored(url, PNMetadataXattrAuthor), "Author");
+    EXPECT_EQ(stored(url, PNMetadataXattrGenre), "Genre");
+    EXPECT_FALSE(m_error);
+}
+
 TEST_F(AttributeWriting, UpdatingWithNothingChangedIsFalseWithoutAnError) {
     const auto asset = record(file());
     ASSERT_TRUE(setAttributesForAsset(asset, nullptr));
@@ -164,6 +198,7 @@ TEST_F(AttributeWriting, UpdatingNeedsAURLAnAssetIDAndReadableAttributes) {
     EXPECT_EQ(m_error, makeMissingURLError());
 
     const auto asset = record(file());
+    setStored(*asset->url(), PNMetadataXattrAssetID, "ID");
     asset->setGeneratedID(std::nullopt);
     EXPECT_FALSE(updateAttributesForAsset(asset, &m_error));
     EXPECT_EQ(m_error, makeNoIdentityError());

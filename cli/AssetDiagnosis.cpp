@@ -195,7 +195,7 @@ std::vector<Finding> findingsOfTrash(FileSystemService& service, const URL& item
     if (service.trashItem(item, &place, &error))
         return {};
     return {{"noTrash", "it can't be trashed" + (error ? ": " + error->message() : std::string()),
-             "see that the trash, ~/.local/share/Trash, is a folder that you may write to"}};
+             "see that you may write to its folder and to the trash, ~/.local/share/Trash"}};
 }
 
 }  // namespace parvel::cli

@@ -153,9 +153,10 @@ Result AttributesCommand::write(const std::string& path) const {
         m_dryRun.makeManager()->setExtendedAttributesForAsset_error(asset, &result.error);
     result.fields.push_back({"written", Number::boolean(written)});
     setRecord(result, asset, PVAssetMetadataFlavorFull);
-    result.advice = standsAt(urlOfPath(path))
-                        ? "nothing in it or on it says which asset it is; --record can say it"
-                        : "it is not there";
+    if (result.error == makeNoIdentityError())
+        result.advice = standsAt(urlOfPath(path))
+                            ? "nothing in it or on it says which asset it is; --record can say it"
+                            : "it is not there";
     result.outcome = written ? "has its attributes" : "nothing to write";
     return result;
 }

@@ -235,7 +235,9 @@ void PackCommand::pack(PVAssetMetadataFileManager& manager, const AssetPtr& asse
     }
     if (failure.errnoValue != 0) {
         result.error = makePOSIXError(failure.errnoValue, URL::fileURLWithPath(failure.path));
-        result.advice = failure.path + " can't be packed";
+        const bool isFull = failure.errnoValue == ENOSPC || failure.errnoValue == EDQUOT;
+        if (!isFull)
+            result.advice = failure.path + " can't be packed";
         return;
     }
     if (!isRehearsal && !manager.fileManager()->moveItem(staged, target, &result.error))

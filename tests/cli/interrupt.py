@@ -9,9 +9,11 @@ SIGNAL is INT or TERM. Prints what came out and the exit status.
 """
 
 import fcntl
+import os
 import signal
 import subprocess
 import sys
+import tempfile
 import time
 
 
@@ -40,16 +42,19 @@ def wait_until_idle(command):
 
 
 def midway(name, words):
-    command = subprocess.Popen(words, stdin=subprocess.DEVNULL, stdout=subprocess.PIPE,
-                               stderr=subprocess.PIPE, text=True)
-    fcntl.fcntl(command.stderr, fcntl.F_SETPIPE_SZ, 4096)
-    command.stderr.read(1)
-    wait_until_idle(command)
-    command.send_signal(signal.Signals["SIG" + name])
-    out, err = command.communicate()
-    print(out, end="")
-    print(*[line for line in err.split("\n") if line.startswith("parvel: ")], sep="\n")
-    print("status", command.wait())
+    ours, theirs = os.pipe()
+    fcntl.fcntl(theirs, fcntl.F_SETPIPE_SZ, 4096)  # soon full
+    with tempfile.TemporaryFile("w+") as results:
+        command = subprocess.Popen(words, stdin=subprocess.DEVNULL, stdout=results, stderr=theirs)
+        os.close(theirs)
+        os.read(ours, 1)
+        wait_until_idle(command)
+        command.send_signal(signal.Signals["SIG" + name])
+        with open(ours) as messages:
+            told = [line for line in messages if line.startswith("parvel: ")]
+        status = command.wait()
+        results.seek(0)
+        print(results.read() + "".join(told) + f"status {status}")
 
 
 def twice(name, words):

@@ -110,9 +110,9 @@ bool isContainer(const Value& value) {
     return value.typeID() == TypeID::Array || value.typeID() == TypeID::Dictionary;
 }
 
-bool isKeyBefore(const Dictionary::Entry& entry, std::string_view key) {
+constexpr auto isKeyBefore = [](const Dictionary::Entry& entry, std::string_view key) {
     return entry.key < key;
-}
+};
 
 void appendEscaped(String& text, const String& string) {
     for (char character : string) {

@@ -64,7 +64,7 @@ MutableAssetPtr PVAssetMetadataInspector::_xAttrMetadataForAssetAtURL_error(
 
     // The record has the URL, so the one error of this read that is handed out can't arise.
     MutableAssetPtr record = PVAssetMetadata::metadataWithURL_dictionary(url, nullptr);
-    const Dictionary attributes = attributeDictionaryAtURL(url).value_or(Dictionary());
+    const Dictionary attributes = readableAttributesAtURL(url);
     setFromAttributes(*record, AttributeTexts(attributes));
     return record;
 }

@@ -5,6 +5,7 @@
 #include <cerrno>
 #include <cstddef>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "parvel/foundation/PVParvelLog.h"
@@ -31,10 +32,12 @@ constexpr std::array readNames = {
 /// name need not be asked for, and a value of the usual length is read without asking for its size.
 class AttributeReader {
 public:
-    explicit AttributeReader(const URL& carrier)
-        : m_carrier(carrier), m_store(Service<XattrStore>::current()) {
-        m_isListed = carrier.isFileURL() && m_store.list(carrier.path(), m_listed) == 0;
+    explicit AttributeReader(URL carrier)
+        : m_carrier(std::move(carrier)), m_store(Service<XattrStore>::current()) {
+        m_isListed = m_carrier.isFileURL() && m_store.list(m_carrier.path(), m_listed) == 0;
     }
+
+    [[nodiscard]] bool isListed() const { return m_isListed; }
 
     /// Whether asking for the attribute could give anything but its absence.
     [[nodiscard]] bool mayHold(std::string_view name) {
@@ -61,27 +64,30 @@ public:
 private:
     static constexpr std::size_t usualLength = 512;
 
-    const URL& m_carrier;
+    URL m_carrier;
     XattrStore& m_store;
     std::vector<std::string> m_listed;
     bool m_isListed;
     std::string m_name;  ///< as the store takes it
 };
 
-}  // namespace
+/// Of the item itself, or of what stands for it. What can be listed stands there.
+AttributeReader readerAtURL(const URL& url) {
+    AttributeReader reader(url);
+    const std::optional<URL> placeholder =
+        reader.isListed() ? std::nullopt : Service<CloudStore>::current().placeholderFile(url);
+    if (!placeholder)
+        return reader;
+    PVParvelLog().info("xAttrs: Using promised URL");
+    return AttributeReader(*placeholder);
+}
 
-std::optional<Dictionary> attributeDictionaryAtURL(const URL& url) {
-    const std::optional<URL> placeholder = Service<CloudStore>::current().placeholderFile(url);
-    if (placeholder)
-        PVParvelLog().info("xAttrs: Using promised URL");
-    const URL& carrier = placeholder ? *placeholder : url;
-
-    AttributeReader reader(carrier);
-    // The first name is asked for in any case: the list can be had of a file that can't be read,
-    // and an empty one where no attributes are kept.
+/// None when any read fails.
+std::optional<Dictionary> attributesByReader(AttributeReader reader, bool alwaysAsksForFirst) {
     Dictionary attributes;
     for (const std::string_view name : readNames) {
-        if (name != readNames.front() && !reader.mayHold(name))
+        const bool isAsked = alwaysAsksForFirst && name == readNames.front();
+        if (!isAsked && !reader.mayHold(name))
             continue;
         std::optional<String> text;
         if (!reader.read(name, text))
@@ -90,6 +96,19 @@ std::optional<Dictionary> attributeDictionaryAtURL(const URL& url) {
             attributes.set(name, std::move(*text));
     }
     return attributes;
+}
+
+}  // namespace
+
+std::optional<Dictionary> attributeDictionaryAtURL(const URL& url) {
+    // The list can be had of a file that can't be read, and an empty one where no attributes are
+    // kept: only a question for a name tells.
+    return attributesByReader(readerAtURL(url), /*alwaysAsksForFirst=*/true);
+}
+
+Dictionary readableAttributesAtURL(const URL& url) {
+    return attributesByReader(readerAtURL(url), /*alwaysAsksForFirst=*/false)
+        .value_or(Dictionary());
 }
 
 }  // namespace parvel

@@ -11,5 +11,8 @@ namespace parvel {
 /// read fails. Where the item's content is not on this device, the file that stands for it is read,
 /// and "xAttrs: Using promised URL" logged.
 [[nodiscard]] std::optional<Dictionary> attributeDictionaryAtURL(const URL& url);
+/// The same, but empty when any read fails, so that a file without attributes need not be asked
+/// whether it could be read.
+[[nodiscard]] Dictionary readableAttributesAtURL(const URL& url);
 
 }  // namespace parvel

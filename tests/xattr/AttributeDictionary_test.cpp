@@ -159,6 +159,33 @@ TEST_F(AttributeDictionary, AsksOnlyForTheFirstNameAndThoseThatStandThere) {
     EXPECT_EQ(store.m_asked, expected);
 }
 
+TEST_F(AttributeDictionary, ReadableAttributesAreAskedForOnlyWhereTheyStand) {
+    const URL url = file();
+    setStored(url, PNMetadataXattrRating, "5");
+    WatchedStore store;
+
+    EXPECT_EQ(readableAttributesAtURL(url), (Dictionary{{String(PNMetadataXattrRating), "5"}}));
+    EXPECT_EQ(store.m_asked, std::vector<std::string>{std::string(PNMetadataXattrRating)});
+}
+
+TEST_F(AttributeDictionary, ReadableAttributesAreNoneAtAllWhenOneReadFails) {
+    const URL url = file();
+    setStored(url, PNMetadataXattrAssetID, "ID");
+    setStored(url, PNMetadataXattrAuthor, "x");
+    WatchedStore store;
+    store.m_refused = PNMetadataXattrAuthor;
+
+    EXPECT_EQ(readableAttributesAtURL(url), Dictionary());
+}
+
+TEST_F(AttributeDictionary, ReadableAttributesAreThoseOfThePlaceholder) {
+    const URL placeholder = file("book.epub.nextcloud");
+    setStored(placeholder, PNMetadataXattrTitle, "Far Away");
+
+    EXPECT_EQ(readableAttributesAtURL(m_folder.url("book.epub")),
+              (Dictionary{{String(PNMetadataXattrTitle), "Far Away"}}));
+}
+
 TEST_F(AttributeDictionary, AsksNameByNameWhereTheListFails) {
     const URL url = file();
     setStored(url, PNMetadataXattrAssetID, "ID");

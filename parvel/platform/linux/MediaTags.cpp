@@ -8,11 +8,9 @@
 
 #include <algorithm>
 #include <array>
-#include <cerrno>
 #include <cstring>
-#include <map>
+#include <memory>
 #include <string_view>
-#include <vector>
 
 #include "parvel/platform/MediaTags.h"
 #include "parvel/platform/TextRules.h"
@@ -26,6 +24,8 @@ namespace {
 using host::FileDescriptor;
 
 constexpr std::uint64_t kTextLimit = 1ULL << 20;
+/// Titles and names are shorter.
+constexpr std::size_t kShortValue = 1024;
 constexpr std::size_t kFirstWindow = 4096;
 constexpr std::size_t kLargestWindow = 65536;
 
@@ -79,19 +79,18 @@ public:
     /// `length` bytes at an offset, at most a window's; null when the file has no such bytes. Good
     /// until the next call.
     const std::uint8_t* peek(std::uint64_t offset, std::size_t length) {
-        if (offset < m_start || offset + length > m_start + m_window.size())
+        if (!isInWindow(offset, length))
             fill(offset, length);
-        const bool isThere = offset >= m_start && offset + length <= m_start + m_window.size();
-        return isThere ? m_window.data() + (offset - m_start) : nullptr;
+        return isInWindow(offset, length) ? m_window.get() + (offset - m_start) : nullptr;
     }
 
-    /// Bytes past the window, whole or not at all.
+    /// Bytes of any length, whole or not at all.
     [[nodiscard]] bool read(std::uint64_t offset, std::uint8_t* bytes, std::uint64_t length) const {
         for (std::uint64_t at = 0; at < length;) {
-            const ssize_t got =
-                ::pread(m_file.get(), bytes + at, length - at, static_cast<off_t>(offset + at));
-            if (got < 0 && errno == EINTR)
-                continue;
+            const ssize_t got = host::retried([&] {
+                return ::pread(m_file.get(), bytes + at, length - at,
+                               static_cast<off_t>(offset + at));
+            });
             if (got <= 0)
                 return false;
             at += static_cast<std::uint64_t>(got);
@@ -100,24 +99,32 @@ public:
     }
 
 private:
+    [[nodiscard]] bool isInWindow(std::uint64_t offset, std::size_t length) const {
+        return offset >= m_start && offset + length <= m_start + m_length;
+    }
+
     void fill(std::uint64_t offset, std::size_t length) {
-        const bool isNext = offset >= m_start && offset <= m_start + m_window.size() + 64;
+        const bool isNext = offset >= m_start && offset <= m_start + m_length + 64;
         m_nextWindow = isNext ? std::min(m_nextWindow * 2, kLargestWindow) : kFirstWindow;
+        const std::size_t wanted = std::max(length, m_nextWindow);
+        if (wanted > m_capacity) {
+            m_window = std::make_unique_for_overwrite<std::uint8_t[]>(wanted);
+            m_capacity = wanted;
+        }
         m_start = offset;
-        m_window.resize(std::max(length, m_nextWindow));
-        ssize_t got = 0;
-        do {
-            got =
-                ::pread(m_file.get(), m_window.data(), m_window.size(), static_cast<off_t>(offset));
-        } while (got < 0 && errno == EINTR);
-        m_window.resize(got > 0 ? static_cast<std::size_t>(got) : 0);
+        const ssize_t got = host::retried([&] {
+            return ::pread(m_file.get(), m_window.get(), wanted, static_cast<off_t>(offset));
+        });
+        m_length = got > 0 ? static_cast<std::size_t>(got) : 0;
     }
 
     FileDescriptor m_file;
     std::uint64_t m_size;
     std::uint64_t m_start = 0;
+    std::size_t m_length = 0;
     std::size_t m_nextWindow = kFirstWindow;
-    std::vector<std::uint8_t> m_window;
+    std::unique_ptr<std::uint8_t[]> m_window;
+    std::size_t m_capacity = 0;
 };
 
 /// One atom's content.
@@ -166,9 +173,11 @@ public:
     explicit MP4Asset(WindowedFile file) : m_file(std::move(file)) { findTags(); }
 
     std::optional<std::string> text(MediaTag tag) override {
-        const auto value = valueOf(tag);
+        const std::optional<TagValue>& value = itemOf(tag).value;
         if (!value || value->size > kTextLimit)
             return std::nullopt;
+        if (value->bytes)
+            return textOf(tag, value->type, *value->bytes);
         std::string bytes(value->size, '\0');
         if (!m_file.read(value->offset, reinterpret_cast<std::uint8_t*>(bytes.data()), value->size))
             return std::nullopt;
@@ -176,7 +185,7 @@ public:
     }
 
     std::optional<Data> bytes(MediaTag tag, std::uint64_t limit) override {
-        const auto value = valueOf(tag);
+        const std::optional<TagValue>& value = itemOf(tag).value;
         if (!value || isTextType(value->type) || isIntegerType(value->type) || value->size > limit)
             return std::nullopt;
         auto buffer = std::make_unique_for_overwrite<std::uint8_t[]>(value->size);
@@ -197,6 +206,11 @@ private:
         std::uint32_t type;
         std::uint64_t offset;
         std::uint64_t size;
+        std::optional<std::string> bytes;  ///< of a short one that may be text
+    };
+    struct Item {
+        bool isThere = false;
+        std::optional<TagValue> value;
     };
 
     void findTags() {
@@ -231,18 +245,40 @@ private:
         });
     }
 
-    /// The first item of a key counts.
-    void noteItem(const Atom& item) {
-        static const std::map<std::uint32_t, MediaTag> tags{{atomName("cnID"), MediaTag::SongID},
-                                                            {atomName("\xA9"
-                                                                      "ART"),
-                                                             MediaTag::Artist},
-                                                            {atomName("\xA9"
-                                                                      "nam"),
-                                                             MediaTag::SongName},
-                                                            {atomName("covr"), MediaTag::CoverArt}};
-        if (const auto found = tags.find(item.name); found != tags.end())
-            m_items.emplace(found->second, item);
+    Item& itemOf(MediaTag tag) { return m_items[static_cast<std::size_t>(tag)]; }
+
+    static std::optional<MediaTag> tagOf(std::uint32_t name) {
+        switch (name) {
+            case atomName("cnID"):
+                return MediaTag::SongID;
+            case atomName(
+                "\xA9"
+                "ART"):
+                return MediaTag::Artist;
+            case atomName(
+                "\xA9"
+                "nam"):
+                return MediaTag::SongName;
+            case atomName("covr"):
+                return MediaTag::CoverArt;
+            default:
+                return std::nullopt;
+        }
+    }
+
+    /// The first item of a key counts. A short value is taken while the window stands over it.
+    void noteItem(const Atom& atom) {
+        const std::optional<MediaTag> tag = tagOf(atom.name);
+        if (!tag || itemOf(*tag).isThere)
+            return;
+        Item& item = itemOf(*tag);
+        item.isThere = true;
+        item.value = valueOf(atom);
+        if (!item.value || *tag == MediaTag::CoverArt || item.value->size > kShortValue)
+            return;
+        const auto size = static_cast<std::size_t>(item.value->size);
+        if (const std::uint8_t* bytes = m_file.peek(item.value->offset, size))
+            item.value->bytes.emplace(reinterpret_cast<const char*>(bytes), size);
     }
 
     template <class Visitor>
@@ -254,19 +290,15 @@ private:
     }
 
     /// The item's first "data" atom: four bytes of type, four of locale, the value.
-    std::optional<TagValue> valueOf(MediaTag tag) {
-        const auto item = m_items.find(tag);
-        if (item == m_items.end())
-            return std::nullopt;
-        for (std::uint64_t at = item->second.begin;
-             const auto atom = atomAt(m_file, at, item->second.end);) {
+    std::optional<TagValue> valueOf(const Atom& item) {
+        for (std::uint64_t at = item.begin; const auto atom = atomAt(m_file, at, item.end);) {
             if (atom->name == atomName("data")) {
                 const std::uint8_t* head =
                     atom->end - atom->begin >= 8 ? m_file.peek(atom->begin, 8) : nullptr;
                 if (!head || atom->isCut)
                     return std::nullopt;
                 return TagValue{bigEndian32(head) & 0xFFFFFF, atom->begin + 8,
-                                atom->end - atom->begin - 8};
+                                atom->end - atom->begin - 8, std::nullopt};
             }
             at = atom->end;
         }
@@ -297,7 +329,7 @@ private:
     }
 
     WindowedFile m_file;
-    std::map<MediaTag, Atom> m_items;
+    std::array<Item, 4> m_items;  ///< one a tag, in their order
 };
 
 bool beginsLikeMP4(WindowedFile& file) {

@@ -84,6 +84,21 @@ TEST_F(Audiobook, ThePreloadedRecordWins) {
     EXPECT_EQ(record->author(), "An Author");
 }
 
+TEST_F(Audiobook, ThePreloadedAuthorAndCoverWinOverTheTags) {
+    const URL url = write(soundAudiobook());
+    const auto preloaded = PVAssetMetadata::metadataWithURL_dictionary(url, nullptr);
+    preloaded->setAuthor("Mine");
+    const Data cover = Data::copyOf(std::string_view("my cover"));
+    preloaded->setCoverImageData(&cover);
+
+    const auto record = read(url, /*includeCover=*/true, preloaded);
+
+    EXPECT_EQ(record->author(), "Mine");
+    EXPECT_EQ(*record->coverImageData(), Value(cover));
+    EXPECT_EQ(record->title(), "A Title");
+    EXPECT_EQ(stringForm(record->storeID()), "42");
+}
+
 TEST_F(Audiobook, WhatIsNoAudioFileIsRefusedWithItsURL) {
     const URL url = write("just some text, no atoms");
 
@@ -110,6 +125,16 @@ TEST_F(Audiobook, TheInspectorTakesTheIdentityFromTheAttributes) {
     ASSERT_TRUE(record);
     EXPECT_EQ(record->assetID(), "own");
     EXPECT_FALSE(m_error);
+}
+
+TEST_F(Audiobook, AnIdentityInTheAttributesDoesNotHelpWhatIsNoAudioFile) {
+    const URL url = write("just some text, no atoms");
+    if (!pvamfm_setExtendedAttributeString_forKey_error(url, "own", PNMetadataXattrAssetID))
+        GTEST_SKIP() << "no extended attributes on this file system";
+
+    EXPECT_FALSE(PVAssetMetadataInspector::metadataForAssetAtURL_error(url, &m_error));
+
+    EXPECT_EQ(m_error, makeNoAssetIDError(url));
 }
 
 TEST_F(Audiobook, TheInspectorReadsTheWholeWay) {

@@ -206,6 +206,17 @@ TEST_F(ImmediatelyAvailable, IsTheWholeRecordWhereTheContentIsHere) {
     }
 }
 
+TEST_F(ImmediatelyAvailable, HandsOutTheErrorOfTheWholeReadWhereTheContentIsHere) {
+    ToldCloudStore cloud;
+    cloud.m_status = DownloadingStatus::Current;
+    const URL damaged = file("damaged.m4a");
+    setStored(damaged, PNMetadataXattrAssetID, "own");
+
+    EXPECT_FALSE(available(damaged));
+
+    EXPECT_EQ(m_error, makeNoAssetIDError(damaged));
+}
+
 TEST_F(ImmediatelyAvailable, IsWhatTheAttributesHoldWhereTheContentIsElsewhere) {
     ToldCloudStore cloud;
     cloud.m_status = DownloadingStatus::NotDownloaded;

@@ -136,6 +136,49 @@ TEST_F(PdfMetadata, ARefusedDigestLeavesTheRecordWithoutIdentity) {
               (Lines{"debug Getting pdf metadata", "error Failed to generate PDF ID"}));
 }
 
+/// A host whose digests fail at their end, in force while it lives.
+class UnfinishedDigest : public Digest {
+public:
+    std::unique_ptr<Running> beginMD5() override { return std::make_unique<Unfinished>(); }
+    std::optional<SHA256> sha256(const Data&) override { return std::nullopt; }
+
+private:
+    struct Unfinished : Running {
+        void update(Data::Bytes) override {}
+        std::optional<MD5> finish() override { return std::nullopt; }
+    };
+
+    Service<Digest>::Replacement m_replacement{*this};
+};
+
+TEST_F(PdfMetadata, ADigestThatFailsAtItsEndLeavesTheRecordWithoutIdentity) {
+    const UnfinishedDigest digest;
+    m_pdfs.content.authorText = "Henry David Thoreau";
+    RecordedLog log;
+
+    const auto record = read();
+
+    ASSERT_TRUE(record);
+    EXPECT_FALSE(record->generatedID());
+    EXPECT_EQ(record->author(), "Henry David Thoreau");
+    EXPECT_FALSE(m_error);
+    EXPECT_EQ(log.lines(),
+              (Lines{"debug Getting pdf metadata", "error Failed to generate PDF ID"}));
+}
+
+TEST_F(PdfMetadata, WithAKeptIdentityAFileThatCanNotBeOpenedFailsTheSame) {
+    const auto kept = preloaded();
+    kept->setGeneratedID("KEPT");
+    m_pdfs.openError = makePOSIXError(EACCES, m_url);
+    RecordedLog log;
+
+    EXPECT_FALSE(read(/*includeCover=*/false, kept));
+
+    EXPECT_EQ(m_error, makePOSIXError(EACCES, m_url));
+    EXPECT_EQ(log.lines(),
+              (Lines{"debug Getting pdf metadata", "default Failed to read PDF contents"}));
+}
+
 TEST_F(PdfMetadata, AFileThatCanNotBeOpenedFailsWithThatError) {
     m_pdfs.openError = makePOSIXError(EACCES, m_url);
     RecordedLog log;

@@ -1,5 +1,6 @@
 #include <cerrno>
 #include <filesystem>
+#include <fstream>
 
 #include <gtest/gtest.h>
 #include <sys/stat.h>
@@ -61,6 +62,72 @@ TEST_F(PdfReading, GivesTheRecordOfADocument) {
     EXPECT_EQ(asset->pageCount(), 2U);
     EXPECT_FALSE(asset->isLocked());
     EXPECT_EQ(asset->assetID().value_or("").size(), 32U);
+}
+
+TEST_F(PdfReading, TakesNothingFromOtherEntriesOfTheInformation) {
+    const AssetPtr asset = read(PdfBuilder{}
+                                    .information("/Title (Another) /Keywords (woods) /Creator (C) "
+                                                 "/Producer (P) /Trapped /True /Own (entry)")
+                                    .page(""));
+
+    ASSERT_TRUE(asset);
+    std::vector<std::string> keys;
+    for (const auto& [name, value] : *asset->backingDictionary())
+        keys.push_back(name);
+    EXPECT_EQ(keys, (std::vector<std::string>{"PVDisplayName", "PVGeneratedItemId",
+                                              "PVGenerationCount", "PVIsLocked", "explicit",
+                                              "itemName", "pageCount", "path", "sourcePath"}));
+    EXPECT_EQ(asset->title(), "Walden");
+}
+
+/// What encrypts a document of the author "Thoreau" for its owner alone: it opens without a
+/// password.
+PdfBuilder documentWithOwnerPassword() {
+    return PdfBuilder{}
+        .information("/Author <166C306C7855FF>")
+        .trailer(
+            "/Encrypt << /Filter /Standard /V 1 /R 2 /P -4 "
+            "/O <C92422687FACEE686E373F10B5C7D04738053152F7E2EE30E11C69EC442576AB> "
+            "/U <1CDD99426EDD37A3C2CD10E4FC8FB3A0B4414761A73AF9DF968B3AB8BDB8D94E> >> "
+            "/ID [<01> <01>]")
+        .page("");
+}
+
+TEST_F(PdfReading, ReadsADocumentThatOnlyItsOwnersPasswordProtectsAndDoesNotMarkIt) {
+    const AssetPtr asset = read(documentWithOwnerPassword(), /*includeCover=*/true);
+
+    ASSERT_TRUE(asset);
+    EXPECT_FALSE(asset->isLocked());
+    EXPECT_EQ(asset->author(), "Thoreau");
+    EXPECT_EQ(asset->pageCount(), 1U);
+    EXPECT_TRUE(asset->coverImageData());
+}
+
+TEST_F(PdfReading, ReadsADocumentOfMoreThanTwoGigabytes) {
+    constexpr std::uint64_t table = (std::uint64_t{1} << 31) + 100;
+    const std::string text = PdfBuilder{}.information("/Author (Thoreau)").page("").bytes();
+    const std::size_t gap = text.find("xref\n");
+    m_folder.write("Walden.pdf", text.substr(0, gap));
+    std::error_code error;
+    std::filesystem::resize_file(m_url.path(), table, error);
+    if (error)
+        GTEST_SKIP() << "no files of 2 GB here: " << error.message();
+    std::string end = text.substr(gap);
+    end.replace(end.find("startxref\n") + 10, std::to_string(gap).size(), std::to_string(table));
+    std::ofstream(m_url.path(), std::ios::binary | std::ios::app) << end;
+    // With an identity that is kept the file is not read whole.
+    const Dictionary kept{{"PVGeneratedItemId", "KEPT"}};
+
+    const AssetPtr asset =
+        PVAssetMetadataInspector::_pdf_metadataForAssetAtURL_preloadedMetadata_includeCover_error(
+            m_url, PVAssetMetadata::metadataWithURL_dictionary(m_url, &kept),
+            /*includeCover=*/true, &m_error);
+
+    ASSERT_TRUE(asset);
+    EXPECT_EQ(asset->author(), "Thoreau");
+    EXPECT_EQ(asset->pageCount(), 1U);
+    EXPECT_EQ(asset->assetID(), "KEPT");
+    EXPECT_TRUE(asset->coverImageData());
 }
 
 TEST_F(PdfReading, DrawsTheFirstPageOnWhite) {

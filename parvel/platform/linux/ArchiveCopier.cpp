@@ -1,6 +1,8 @@
 #include "parvel/platform/ArchiveCopier.h"
 
 #include <atomic>
+#include <memory>
+#include <utility>
 
 #include "parvel/foundation/ValueReadings.h"
 #include "parvel/platform/linux/ArchiveExpansion.h"
@@ -21,7 +23,9 @@ public:
         return host::countPackage(path, reports());
     }
     Count countArchive(const std::string& path) override {
-        return host::countArchiveEntries(path, reports());
+        int error = 0;
+        m_source = host::SourceArchive::open(path, reports(), error);
+        return m_source ? host::countArchiveEntries(*m_source, reports()) : Count();
     }
 
     int copy(const std::string& source, const std::string& destination,
@@ -30,7 +34,7 @@ public:
         if (const int error = running.cancellation())
             return error;
         const bool isArchive = boolReading(options.find(extractPKZip));
-        if (const int error = isArchive ? host::expandArchive(source, destination, running)
+        if (const int error = isArchive ? expand(source, destination, running)
                                         : host::copyPackage(source, destination, running))
             return error;
         int error = host::syncItem(destination);
@@ -44,7 +48,18 @@ public:
 private:
     [[nodiscard]] host::CopierReports reports() { return {*this, m_callbacks, m_isCancelled}; }
 
+    /// Expands what was counted, where that stands there still, with its directory read already.
+    int expand(const std::string& source, const std::string& destination,
+               const host::CopierReports& running) {
+        int error = 0;
+        std::unique_ptr<host::SourceArchive> archive = std::move(m_source);
+        if (!archive || !archive->isStillAt(source))
+            archive = host::SourceArchive::open(source, running, error);
+        return archive ? host::expandArchive(*archive, destination, running) : running.fatal(error);
+    }
+
     ArchiveCopierCallbacks* m_callbacks = nullptr;
+    std::unique_ptr<host::SourceArchive> m_source;
     std::atomic<bool> m_isCancelled{false};
 };
 

@@ -6,23 +6,20 @@
 #include "parvel/platform/linux/ArchiveExpansion.h"
 
 #include <fcntl.h>
-#include <sys/stat.h>
 #include <sys/statvfs.h>
 
 #include <algorithm>
 #include <cstring>
 #include <limits>
-#include <memory>
 #include <string>
 #include <string_view>
 
 #include "parvel/foundation/URL.h"
-#include "parvel/platform/linux/FileDescriptor.h"
-#include "parvel/platform/linux/ItemContent.h"
-#include "parvel/platform/linux/LibzipArchive.h"
+#include "parvel/platform/linux/ItemTree.h"
 #include "parvel/platform/linux/OpenBeneath.h"
 #include "parvel/platform/linux/Paths.h"
 #include "parvel/platform/linux/SystemCall.h"
+#include "parvel/platform/linux/WriteBehind.h"
 #include "parvel/platform/linux/ZipFormat.h"
 
 namespace parvel::host {
@@ -43,28 +40,6 @@ std::uint64_t saturatingSum(std::uint64_t left, std::uint64_t right) {
                ? std::numeric_limits<std::uint64_t>::max()
                : left + right;
 }
-
-struct OpenArchive {
-    FileDescriptor file;
-    std::uint64_t size = 0;
-    std::unique_ptr<LibzipArchive> archive;
-
-    /// 0 or the errno value.
-    [[nodiscard]] int open(const std::string& path) {
-        file = FileDescriptor(retried(
-            [&] { return ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY); }));
-        struct stat status {};
-        if (!file || ::fstat(file.get(), &status) != 0)
-            return errno;
-        if (S_ISDIR(status.st_mode))
-            return EISDIR;
-        if (!S_ISREG(status.st_mode))
-            return EBADMSG;
-        size = static_cast<std::uint64_t>(status.st_size);
-        archive = LibzipArchive::open(file.get(), size, kDirectoryBudget);
-        return archive ? 0 : EBADMSG;
-    }
-};
 
 bool isFolder(std::string_view name, const ZipEntry& entry) {
     return name.ends_with('/') || S_ISDIR(entry.unixMode());
@@ -162,7 +137,7 @@ public:
             if (const int error = expandEntry(index))
                 return error;
         }
-        return 0;
+        return m_reports.awaited(m_disk);
     }
 
 private:
@@ -198,6 +173,8 @@ private:
             return m_reports.failed(path, errno);
 
         int error = deliver(index, entry, file.get());
+        if (error == 0)
+            error = m_disk.add(file.get(), entry.size);
         if (error == 0)
             error = file.close();
         if (error == 0) {
@@ -235,6 +212,7 @@ private:
     FoldersBelow m_folders;
     const std::string& m_destination;
     const CopierReports& m_reports;
+    TreeBehind m_disk;
 };
 
 /// The folders that a name asks for beyond those of the entry before it.
@@ -247,26 +225,26 @@ std::uint64_t newFolders(std::string_view before, std::string_view name) {
 /// Entries that share their bytes make a small archive expand without end: together they must fit
 /// into the file. So do long names, by the folders that they ask for. What is made must fit on the
 /// disk.
-int checkClaims(const OpenArchive& source, const std::string& destination) {
+int checkClaims(SourceArchive& source, const std::string& destination) {
     std::uint64_t stored = 0;
     std::uint64_t content = 0;
     std::uint64_t folders = 0;
     std::string before;
-    const std::uint64_t count = source.archive->entryCount();
+    const std::uint64_t count = source.archive().entryCount();
     for (std::uint64_t index = 0; index < count; ++index) {
-        if (const char* name = source.archive->name(index)) {
+        if (const char* name = source.archive().name(index)) {
             folders += newFolders(before, name);
             before = name;
         }
         ZipEntry entry;
-        if (!source.archive->describe(index, entry))
+        if (!source.archive().describe(index, entry))
             continue;
         stored = saturatingSum(stored, entry.compressedSize);
         stored = saturatingSum(stored, zip::localHeaderLength + zip::directoryHeaderLength);
         if (checkContent(entry) == 0)
             content = saturatingSum(content, entry.size);
     }
-    if (stored > source.size || folders > kMostNewFolders)
+    if (stored > source.size() || folders > kMostNewFolders)
         return EBADMSG;
     content = saturatingSum(content, folders * kFolderBytes);
     struct statvfs room {};
@@ -277,16 +255,44 @@ int checkClaims(const OpenArchive& source, const std::string& destination) {
 
 }  // namespace
 
-ArchiveCopier::Count countArchiveEntries(const std::string& archive, const CopierReports& reports) {
+std::unique_ptr<SourceArchive> SourceArchive::open(const std::string& path,
+                                                   const CopierReports& reports, int& error) {
+    auto source = std::make_unique<SourceArchive>();
+    source->m_file = FileDescriptor(retried(
+        [&] { return ::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY); }));
+    if (!source->m_file || ::fstat(source->m_file.get(), &source->m_status) != 0) {
+        error = errno;
+        return nullptr;
+    }
+    if (S_ISREG(source->m_status.st_mode))
+        source->m_archive =
+            LibzipArchive::open(source->m_file.get(), source->size(), kDirectoryBudget,
+                                [reports] { return reports.cancellation(); });
+    if (source->m_archive)
+        return source;
+    error = reports.cancellation();
+    if (error == 0)
+        error = S_ISDIR(source->m_status.st_mode) ? EISDIR : EBADMSG;
+    return nullptr;
+}
+
+bool SourceArchive::isStillAt(const std::string& path) const {
+    const auto isSameTime = [](const timespec& left, const timespec& right) {
+        return left.tv_sec == right.tv_sec && left.tv_nsec == right.tv_nsec;
+    };
+    struct stat now {};
+    return ::stat(path.c_str(), &now) == 0 && isSameItem(now, m_status) &&
+           now.st_size == m_status.st_size && isSameTime(now.st_mtim, m_status.st_mtim) &&
+           isSameTime(now.st_ctim, m_status.st_ctim);
+}
+
+ArchiveCopier::Count countArchiveEntries(SourceArchive& source, const CopierReports& reports) {
     ArchiveCopier::Count result;
-    OpenArchive source;
-    if (source.open(archive) != 0)
-        return result;
-    const std::uint64_t count = source.archive->entryCount();
+    const std::uint64_t count = source.archive().entryCount();
     for (std::uint64_t index = 0; index < count && reports.cancellation() == 0; ++index) {
-        const char* name = source.archive->name(index);
+        const char* name = source.archive().name(index);
         ZipEntry entry;
-        if (!name || !source.archive->describe(index, entry) || isFolder(name, entry))
+        if (!name || !source.archive().describe(index, entry) || isFolder(name, entry))
             continue;
         ++result.files;
         result.bytes = saturatingSum(result.bytes, entry.size);
@@ -294,11 +300,8 @@ ArchiveCopier::Count countArchiveEntries(const std::string& archive, const Copie
     return result;
 }
 
-int expandArchive(const std::string& archive, const std::string& destination,
+int expandArchive(SourceArchive& source, const std::string& destination,
                   const CopierReports& reports) {
-    OpenArchive source;
-    if (const int error = source.open(archive))
-        return reports.fatal(error);
     if (const int error = checkClaims(source, destination))
         return reports.fatal(error);
     if (::mkdir(destination.c_str(), 0700) != 0)
@@ -306,7 +309,7 @@ int expandArchive(const std::string& archive, const std::string& destination,
     FileDescriptor root(::open(destination.c_str(), O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
     if (!root)
         return reports.fatal(errno);
-    return Expansion(*source.archive, std::move(root), destination, reports).run();
+    return Expansion(source.archive(), std::move(root), destination, reports).run();
 }
 
 }  // namespace parvel::host

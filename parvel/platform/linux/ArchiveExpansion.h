@@ -1,18 +1,45 @@
 #pragma once
 
+#include <sys/stat.h>
+
+#include <cstdint>
+#include <memory>
 #include <string>
 
 #include "parvel/platform/ArchiveCopier.h"
 #include "parvel/platform/linux/CopierReports.h"
+#include "parvel/platform/linux/FileDescriptor.h"
+#include "parvel/platform/linux/LibzipArchive.h"
 
 namespace parvel::host {
 
+/// An archive that is counted and expanded with its directory read once.
+class SourceArchive {
+public:
+    /// Null with the errno value, told nobody: EBADMSG for what is no archive.
+    [[nodiscard]] static std::unique_ptr<SourceArchive> open(const std::string& path,
+                                                             const CopierReports& reports,
+                                                             int& error);
+
+    /// Whether the path names the same file still, unchanged as far as its times tell.
+    [[nodiscard]] bool isStillAt(const std::string& path) const;
+    [[nodiscard]] std::uint64_t size() const {
+        return static_cast<std::uint64_t>(m_status.st_size);
+    }
+    [[nodiscard]] LibzipArchive& archive() { return *m_archive; }
+
+private:
+    FileDescriptor m_file;
+    struct stat m_status {};
+    std::unique_ptr<LibzipArchive> m_archive;
+};
+
 /// The archive's entries that are no folders; what the archive copier says holds.
-[[nodiscard]] ArchiveCopier::Count countArchiveEntries(const std::string& archive,
+[[nodiscard]] ArchiveCopier::Count countArchiveEntries(SourceArchive& source,
                                                        const CopierReports& reports);
 
 /// Expands the archive into a new folder. 0 or the errno value, told already.
-[[nodiscard]] int expandArchive(const std::string& archive, const std::string& destination,
+[[nodiscard]] int expandArchive(SourceArchive& source, const std::string& destination,
                                 const CopierReports& reports);
 
 }  // namespace parvel::host

@@ -6,6 +6,7 @@
 #include <string>
 
 #include "parvel/platform/ArchiveCopier.h"
+#include "parvel/platform/linux/WriteBehind.h"
 
 namespace parvel::host {
 
@@ -29,6 +30,17 @@ public:
             m_callbacks->fatalError(m_copier);
         }
         return error;
+    }
+
+    /// Waits until all files are on the disk. 0 or the errno value, told already.
+    [[nodiscard]] int awaited(TreeBehind& files) const {
+        int error = cancellation();
+        while (error == 0 && !files.isEmpty()) {
+            error = files.awaitOldest();
+            if (error == 0)
+                error = cancellation();
+        }
+        return fatal(error);
     }
 
     /// 0 when the copy is to go on without the file, else the error.

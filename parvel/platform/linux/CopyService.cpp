@@ -11,6 +11,7 @@
 #include "parvel/platform/linux/ItemTree.h"
 #include "parvel/platform/linux/Paths.h"
 #include "parvel/platform/linux/SystemCall.h"
+#include "parvel/platform/linux/WriteBehind.h"
 
 namespace parvel {
 

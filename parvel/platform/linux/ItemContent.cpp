@@ -22,8 +22,6 @@ namespace parvel::host {
 namespace {
 
 constexpr std::size_t kCopyPiece = std::size_t{1} << 20;
-/// What a file that is being written may hold that is not on the disk.
-constexpr std::uint64_t kMostBehind = std::uint64_t{8} << 20;
 constexpr long kFuseMagic = 0x65735546;
 constexpr std::string_view kUserAttributes = "user.";
 
@@ -182,28 +180,6 @@ int copyStatus(const struct stat& status, int to) {
     if (::futimens(to, times.data()) != 0 && errno != EPERM && errno != ENOTSUP)
         return errno;
     return 0;
-}
-
-int WriteBehind::reached(std::uint64_t size) {
-    const auto sync = [&](std::uint64_t from, std::uint64_t to, unsigned flags) {
-        const int result = ::sync_file_range(m_file, static_cast<off_t>(from),
-                                             static_cast<off_t>(to - from), flags);
-        // A failed write is told once, here or by the last sync; a missing service is no failure.
-        return result != 0 && (errno == EIO || errno == ENOSPC || errno == EDQUOT) ? errno : 0;
-    };
-    if (size - m_started < kCopyPiece || size <= kMostBehind)
-        return 0;
-    if (const int error = sync(m_started, size, SYNC_FILE_RANGE_WRITE))
-        return error;
-    m_started = size;
-    const std::uint64_t due = size - kMostBehind;
-    if (due <= m_awaited)
-        return 0;
-    const int error =
-        sync(m_awaited, due,
-             SYNC_FILE_RANGE_WAIT_BEFORE | SYNC_FILE_RANGE_WRITE | SYNC_FILE_RANGE_WAIT_AFTER);
-    m_awaited = due;
-    return error;
 }
 
 }  // namespace parvel::host

@@ -30,19 +30,4 @@ using PieceReport = std::function<int(std::uint64_t copied)>;
 /// Gives it owner and group as far as allowed, the mode without set-id bits, and the times.
 [[nodiscard]] int copyStatus(const struct stat& status, int to);
 
-/// Has a file that is being written go to the disk while it grows, no more than a few pieces
-/// behind, so that neither its last sync nor a cancel has long to wait.
-class WriteBehind {
-public:
-    explicit WriteBehind(int file) : m_file(file) {}
-
-    /// Tells the size that the file has reached. 0, or the errno value of a failed write.
-    [[nodiscard]] int reached(std::uint64_t size);
-
-private:
-    int m_file;
-    std::uint64_t m_started = 0;
-    std::uint64_t m_awaited = 0;
-};
-
 }  // namespace parvel::host

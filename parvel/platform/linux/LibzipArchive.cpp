@@ -34,10 +34,12 @@ bool readFully(zip_file_t* entry, std::uint8_t* buffer, std::uint64_t size) {
 }  // namespace
 
 std::unique_ptr<LibzipArchive> LibzipArchive::open(int file, std::uint64_t fileSize,
-                                                   std::uint64_t budget) {
+                                                   std::uint64_t budget,
+                                                   LibzipSource::Interruption interruption) {
     if (fileSize < zip::endLength)  // libzip takes an empty file for an empty archive
         return nullptr;
-    std::unique_ptr<LibzipArchive> archive(new LibzipArchive(file, fileSize));
+    std::unique_ptr<LibzipArchive> archive(
+        new LibzipArchive(file, fileSize, std::move(interruption)));
     archive->m_archive = archive->m_source.open(budget);
     if (!archive->m_archive)
         return nullptr;

@@ -5,6 +5,7 @@
 #include <memory>
 #include <optional>
 #include <string_view>
+#include <utility>
 
 #include "parvel/foundation/Data.h"
 #include "parvel/platform/linux/LibzipSource.h"
@@ -23,9 +24,10 @@ public:
     static constexpr std::uint64_t readingBudget = 8ULL << 20;
 
     /// Borrows the descriptor. Null when the file is no archive, or one whose directory takes more
-    /// than the budget.
-    [[nodiscard]] static std::unique_ptr<LibzipArchive> open(int file, std::uint64_t fileSize,
-                                                             std::uint64_t budget = readingBudget);
+    /// than the budget, and where the opening is interrupted.
+    [[nodiscard]] static std::unique_ptr<LibzipArchive> open(
+        int file, std::uint64_t fileSize, std::uint64_t budget = readingBudget,
+        LibzipSource::Interruption interruption = nullptr);
 
     /// The first entry of exactly that name; none when it can't be delivered.
     [[nodiscard]] std::optional<Data> readEntry(std::string_view name, std::uint64_t limit);
@@ -40,8 +42,8 @@ public:
     [[nodiscard]] int deliver(std::uint64_t index, const ZipEntry& entry, const Sink& sink);
 
 private:
-    LibzipArchive(int file, std::uint64_t fileSize)
-        : m_fileSize(fileSize), m_source(file, fileSize) {}
+    LibzipArchive(int file, std::uint64_t fileSize, LibzipSource::Interruption interruption)
+        : m_fileSize(fileSize), m_source(file, fileSize, std::move(interruption)) {}
 
     [[nodiscard]] std::optional<std::uint64_t> find(std::string_view name) const;
     [[nodiscard]] std::optional<Data> readWhole(std::uint64_t index, const ZipEntry& entry);

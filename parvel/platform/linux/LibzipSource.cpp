@@ -150,6 +150,8 @@ zip_int64_t LibzipSource::readAhead() {
 
 zip_int64_t LibzipSource::readAt(std::uint64_t position, std::uint8_t* data, std::uint64_t length) {
     if (m_isOpening) {
+        if (const int error = m_interruption ? m_interruption() : 0)
+            return fail(ZIP_ER_READ, error);
         if (length > m_budget)
             return fail(ZIP_ER_MEMORY, 0);
         m_budget -= length;

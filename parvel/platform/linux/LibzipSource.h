@@ -5,7 +5,9 @@
 #include <array>
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <memory>
+#include <utility>
 
 namespace parvel::host {
 
@@ -19,7 +21,11 @@ using LibzipHandle = std::unique_ptr<zip_t, DiscardLibzip>;
 /// much of it, and weighs all that looks like one.
 class LibzipSource {
 public:
-    LibzipSource(int file, std::uint64_t fileSize) : m_file(file), m_fileSize(fileSize) {}
+    /// Asked while an archive is opened, which ends where it gives an errno value.
+    using Interruption = std::function<int()>;
+
+    LibzipSource(int file, std::uint64_t fileSize, Interruption interruption = nullptr)
+        : m_file(file), m_fileSize(fileSize), m_interruption(std::move(interruption)) {}
     LibzipSource(const LibzipSource&) = delete;
     LibzipSource& operator=(const LibzipSource&) = delete;
 
@@ -42,6 +48,7 @@ private:
 
     int m_file;
     std::uint64_t m_fileSize;
+    Interruption m_interruption;
     std::uint64_t m_position = 0;
     std::uint64_t m_budget = 0;
     bool m_isOpening = false;

@@ -15,6 +15,7 @@
 #include "parvel/platform/linux/FileDescriptor.h"
 #include "parvel/platform/linux/ItemContent.h"
 #include "parvel/platform/linux/ItemTree.h"
+#include "parvel/platform/linux/WriteBehind.h"
 
 namespace parvel::host {
 
@@ -79,6 +80,9 @@ public:
         return error == 0 ? 0 : m_reports.failed(path, error);
     }
 
+    /// Waits until the files' content is on the disk. 0 or the errno value, told already.
+    int awaitDisk() { return m_reports.awaited(m_disk); }
+
 private:
     int copyItem(const Item& item) {
         struct stat status {};
@@ -139,6 +143,8 @@ private:
 
         int error = fillFile(from.get(), status, to.get());
         if (error == 0)
+            error = m_disk.add(to.get(), static_cast<std::uint64_t>(status.st_size));
+        if (error == 0)
             error = to.close();
         if (error == 0) {
             m_reports.finished(item.path, ArchiveObjectType::File,
@@ -168,6 +174,7 @@ private:
 
     const struct stat& m_root;  ///< the copy's own folder
     const CopierReports& m_reports;
+    TreeBehind m_disk;
 };
 
 }  // namespace
@@ -212,7 +219,10 @@ int copyPackage(const std::string& source, const std::string& destination,
     struct stat made {};
     if (!to || ::fstat(to.get(), &made) != 0)
         return reports.fatal(errno);
-    return TreeCopy(made, reports).fillFolder(stream, status, to.get(), destination, 0);
+    TreeCopy copy(made, reports);
+    if (const int error = copy.fillFolder(stream, status, to.get(), destination, 0))
+        return error;
+    return copy.awaitDisk();
 }
 
 }  // namespace parvel::host

@@ -7,7 +7,9 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstddef>
 #include <cstring>
+#include <limits>
 #include <optional>
 #include <utility>
 
@@ -19,6 +21,9 @@
 namespace parvel::reader {
 
 namespace {
+
+/// The library counts a document's bytes as an int.
+constexpr std::size_t kLargestDocument = std::numeric_limits<int>::max();
 
 constexpr std::string_view smallestDocument =
     "%PDF-1.4\n1 0 obj<</Type/Catalog/Pages 2 0 R>>endobj "
@@ -140,7 +145,7 @@ Answer Document::open(const Received& received) {
     close();
     m_bytes = std::make_unique<InputMapping>(received);
     const std::span<const std::uint8_t> bytes = m_bytes->bytes();
-    if (!bytes.empty())
+    if (!bytes.empty() && bytes.size() <= kLargestDocument)
         m_document.reset(poppler::document::load_from_raw_data(
             reinterpret_cast<const char*>(bytes.data()), static_cast<int>(bytes.size())));
     if (m_document)

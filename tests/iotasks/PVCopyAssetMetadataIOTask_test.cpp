@@ -256,6 +256,16 @@ TEST_F(PlainCopies, ACancelInTheCopyLeavesItInPartAndIsNotLogged) {
     EXPECT_EQ(log.lines(), Lines{});
 }
 
+TEST_F(PlainCopies, ACancelledCopyThatNobodyAsksAboutIsNoneAndIsNotLogged) {
+    makeTask(asset("a.pdf"));
+    m_task->cancel();
+    RecordedLog log;
+
+    EXPECT_FALSE(m_task->executeWithTargetDirectory_error(m_target));
+
+    EXPECT_EQ(log.lines(), Lines{});
+}
+
 TEST_F(PlainCopies, ACancelBeforehandStopsTheCopyAtItsFirstReportWithoutAHandlerToo) {
     makeTask(asset("a.pdf"));
     m_task->cancel();

@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cmath>
 #include <filesystem>
@@ -118,6 +119,31 @@ TEST_F(CrateCopies, ProgressIsTheShareOfTheFilesFinished) {
     EXPECT_EQ(told->title(), "Title");
     EXPECT_EQ(told->url(), source->url());
     EXPECT_EQ(source->percentComplete(), 0);
+}
+
+TEST_F(CrateCopies, ProgressOfATreeIsTheShareOfTheFilesFinishedToo) {
+    m_folder.write("Tree.epub/a", std::string(10, 'a'));
+    m_folder.write("Tree.epub/OPS/b", std::string(10, 'b'));
+    m_folder.write("Tree.epub/OPS/c", std::string(20, 'c'));
+    makeTask(recordOf("Tree.epub"));
+    keepProgress();
+
+    ASSERT_TRUE(execute());
+
+    EXPECT_EQ(m_task->totalBytes(), 40U);
+    EXPECT_EQ(m_task->bytesSoFar(), 40U);
+    ASSERT_EQ(m_progress.size(), 3U);
+    EXPECT_TRUE(std::is_sorted(m_progress.begin(), m_progress.end()));
+    EXPECT_EQ(m_progress[2], 1.0);
+}
+
+TEST_F(CrateCopies, WithoutAPlaceForTheErrorACancelledAndAFailedCopyAreNoneAlone) {
+    makeTask(zippedBook());
+    m_task->setProgressHandler([this](const AssetPtr&) { m_task->cancel(); });
+    EXPECT_FALSE(m_task->executeWithTargetDirectory_error(m_target));
+
+    makeTask(recordOf("Book.epub"));
+    EXPECT_FALSE(m_task->executeWithTargetDirectory_error(m_target));
 }
 
 TEST_F(CrateCopies, BytesAreSummedWithoutAHandlerToo) {

@@ -1,8 +1,12 @@
+#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 
+#include <cerrno>
 #include <filesystem>
 
+#include "parvel/platform/linux/FileDescriptor.h"
+#include "parvel/platform/linux/LibzipArchive.h"
 #include "tests/support/ArchiveCopying.h"
 
 namespace parvel::testing {
@@ -126,6 +130,77 @@ TEST_F(ExpandingArchives, NamesAreTakenAsTheyAreStored) {
     EXPECT_EQ(expand(ZipBuilder{}.stored(name, "1")), 0);
 
     EXPECT_EQ(read(name), "1");
+}
+
+TEST_F(ExpandingArchives, WhatWasCountedIsExpanded) {
+    writeSource(ZipBuilder{}.stored("a", "1"));
+
+    EXPECT_EQ(m_copier->countArchive(sourcePath()).files, 1U);
+    EXPECT_EQ(expandSource(), 0);
+
+    EXPECT_EQ(read("a"), "1");
+}
+
+TEST_F(ExpandingArchives, AnArchiveThatWasReplacedAfterItWasCountedIsReadAnew) {
+    writeSource(ZipBuilder{}.stored("a", "1"));
+    EXPECT_EQ(m_copier->countArchive(sourcePath()).files, 1U);
+    m_folder.write("new", ZipBuilder{}.stored("b", "2").bytes());
+    std::filesystem::rename(m_folder / "new", sourcePath());
+
+    EXPECT_EQ(expandSource(), 0);
+
+    EXPECT_EQ(names(), Names{"b"});
+}
+
+TEST_F(ExpandingArchives, AnArchiveThatWasRewrittenAfterItWasCountedIsReadAnew) {
+    writeSource(ZipBuilder{}.stored("a", "1"));
+    EXPECT_EQ(m_copier->countArchive(sourcePath()).files, 1U);
+    writeSource(ZipBuilder{}.stored("b", "2").stored("c", "3"));
+
+    EXPECT_EQ(expandSource(), 0);
+
+    EXPECT_EQ(names(), (Names{"b", "c"}));
+}
+
+TEST_F(ExpandingArchives, AnArchiveThatIsGoneAfterItWasCountedIsFatal) {
+    writeSource(ZipBuilder{}.stored("a", "1"));
+    EXPECT_EQ(m_copier->countArchive(sourcePath()).files, 1U);
+    std::filesystem::remove(sourcePath());
+
+    EXPECT_EQ(expandSource(), ENOENT);
+
+    EXPECT_EQ(m_callbacks.fatal, std::vector{ENOENT});
+}
+
+TEST_F(ExpandingArchives, AnotherArchiveThanTheCountedOneIsReadItself) {
+    m_folder.write("other", ZipBuilder{}.stored("a", "1").bytes());
+    EXPECT_EQ(m_copier->countArchive(m_folder / "other").files, 1U);
+
+    EXPECT_EQ(expand(ZipBuilder{}.stored("b", "2")), 0);
+
+    EXPECT_EQ(names(), Names{"b"});
+}
+
+TEST_F(ExpandingArchives, MoreThanTheLastSyncIsLeftComesWholeToo) {
+    ZipBuilder archive;
+    for (int index = 0; index < 50; ++index)
+        archive.deflated(std::to_string(index), std::string(std::size_t{1} << 20, 'x'));
+
+    EXPECT_EQ(expand(archive), 0);
+
+    EXPECT_EQ(names().size(), 50U);
+    EXPECT_EQ(m_callbacks.finished.size(), 50U);
+    EXPECT_EQ(read("49"), std::string(std::size_t{1} << 20, 'x'));
+}
+
+TEST_F(ExpandingArchives, AnOpeningThatIsInterruptedGivesNoArchive) {
+    writeSource(ZipBuilder{}.stored("a", "1"));
+    const host::FileDescriptor file(::open(sourcePath().c_str(), O_RDONLY | O_CLOEXEC));
+    const std::uint64_t size = std::filesystem::file_size(sourcePath());
+    const std::uint64_t budget = host::LibzipArchive::readingBudget;
+
+    EXPECT_FALSE(host::LibzipArchive::open(file.get(), size, budget, [] { return ECANCELED; }));
+    EXPECT_TRUE(host::LibzipArchive::open(file.get(), size, budget, [] { return 0; }));
 }
 
 TEST_F(ExpandingArchives, AnExistingDestinationIsFatalAndStaysAsItIs) {

@@ -3,12 +3,15 @@
 #include <sys/xattr.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <cerrno>
 #include <filesystem>
+#include <thread>
 #include <vector>
 
 #include "parvel/platform/CopyService.h"
 #include "tests/support/TemporaryDirectory.h"
+#include "tests/support/TestRounds.h"
 
 namespace parvel::testing {
 namespace {
@@ -204,6 +207,50 @@ TEST_F(CopyServiceTest, AFileThatIsCutShortMeanwhileIsADataError) {
                   return CopyAnswer::Continue;
               }),
               EIO);
+}
+
+TEST_F(CopyServiceTest, AttributesThatAppearBeforeTheyAreCopiedAreCopied) {
+    const std::string source = m_folder.write("source", "content");
+    if (::setxattr(source.c_str(), "user.first", "1", 1, 0) != 0)
+        GTEST_SKIP() << "no extended attributes here";
+
+    EXPECT_EQ(copy([&](const CopyReport& report) {
+                  if (report.operation == CopyOperation::Attributes)
+                      ::setxattr(source.c_str(), "user.second", "2", 1, 0);
+                  return CopyAnswer::Continue;
+              }),
+              0);
+
+    char value = 0;
+    EXPECT_EQ(::getxattr((m_folder / "copy").c_str(), "user.second", &value, 1), 1);
+    EXPECT_EQ(value, '2');
+}
+
+TEST_F(CopyServiceTest, AttributesThatComeGoAndGrowMeanwhileDoNotFailTheCopy) {
+    const std::string source = m_folder.write("source", "content");
+    if (::setxattr(source.c_str(), "user.first", "1", 1, 0) != 0)
+        GTEST_SKIP() << "no extended attributes here";
+    std::atomic<bool> isOver = false;
+    std::thread other([&] {
+        const std::string large(900, 'x');
+        while (!isOver) {
+            ::setxattr(source.c_str(), "user.second", "2", 1, 0);
+            ::setxattr(source.c_str(), "user.third.with.a.longer.name", large.data(), large.size(),
+                       0);
+            ::setxattr(source.c_str(), "user.second", large.data(), large.size(), 0);
+            ::removexattr(source.c_str(), "user.third.with.a.longer.name");
+            ::removexattr(source.c_str(), "user.second");
+        }
+    });
+
+    for (std::size_t round = 0; round < testRounds(50); ++round) {
+        EXPECT_EQ(copy(nullptr), 0) << round;
+        char value = 0;
+        EXPECT_EQ(::getxattr((m_folder / "copy").c_str(), "user.first", &value, 1), 1);
+        std::filesystem::remove(m_folder / "copy");
+    }
+    isOver = true;
+    other.join();
 }
 
 TEST_F(CopyServiceTest, AFileThatHidesItsSizeIsNoEmptyFile) {

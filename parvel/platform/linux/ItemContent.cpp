@@ -22,6 +22,7 @@ namespace parvel::host {
 namespace {
 
 constexpr std::size_t kCopyPiece = std::size_t{1} << 20;
+constexpr int kMostTries = 100;
 constexpr long kFuseMagic = 0x65735546;
 constexpr std::string_view kUserAttributes = "user.";
 
@@ -78,19 +79,36 @@ private:
     std::unique_ptr<char[]> m_buffer;
 };
 
+/// What a call gives that tells the size where it has no room: asked again where the content has
+/// grown in between. None with errno set.
+template <class Call>
+std::optional<std::string> wholeContent(const Call& call) {
+    for (int tries = 0; tries < kMostTries; ++tries) {
+        const ssize_t size = call(nullptr, 0);
+        if (size == 0)
+            return std::string();
+        if (size < 0)
+            return std::nullopt;
+        std::string content(static_cast<std::size_t>(size), '\0');
+        const ssize_t length = call(content.data(), content.size());
+        if (length >= 0) {
+            content.resize(static_cast<std::size_t>(length));
+            return content;
+        }
+        if (errno != ERANGE)
+            return std::nullopt;
+    }
+    return std::nullopt;
+}
+
 std::optional<std::vector<std::string>> userAttributeNames(int file) {
-    const ssize_t size = ::flistxattr(file, nullptr, 0);
-    if (size < 0)
-        return std::nullopt;
-    if (size == 0)
-        return std::vector<std::string>();  // a call without room would tell the size again
-    std::string list(static_cast<std::size_t>(size), '\0');
-    const ssize_t length = ::flistxattr(file, list.data(), list.size());
-    if (length < 0)
+    const auto list = wholeContent(
+        [file](char* room, std::size_t size) { return ::flistxattr(file, room, size); });
+    if (!list)
         return std::nullopt;
     std::vector<std::string> names;
-    for (std::size_t at = 0; at < static_cast<std::size_t>(length);) {
-        const std::string name = list.c_str() + at;
+    for (std::size_t at = 0; at < list->size();) {
+        const std::string name = list->c_str() + at;
         at += name.size() + 1;
         if (name.starts_with(kUserAttributes))
             names.push_back(name);
@@ -111,16 +129,11 @@ bool isLossTolerated(int error, int file) {
 }
 
 int copyAttribute(int from, int to, const std::string& name, int flags) {
-    const ssize_t size = ::fgetxattr(from, name.c_str(), nullptr, 0);
-    if (size < 0)
+    const auto value = wholeContent(
+        [&](char* room, std::size_t size) { return ::fgetxattr(from, name.c_str(), room, size); });
+    if (!value)
         return errno == ENODATA ? 0 : errno;
-    std::string value(static_cast<std::size_t>(size), '\0');
-    // A call without room would tell the size again.
-    const ssize_t length =
-        size == 0 ? 0 : ::fgetxattr(from, name.c_str(), value.data(), value.size());
-    if (length < 0)
-        return errno == ENODATA ? 0 : errno;
-    if (::fsetxattr(to, name.c_str(), value.data(), static_cast<std::size_t>(length), flags) == 0)
+    if (::fsetxattr(to, name.c_str(), value->data(), value->size(), flags) == 0)
         return 0;
     const int error = errno;
     return isLossTolerated(error, to) ? 0 : error;

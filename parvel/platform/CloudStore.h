@@ -36,6 +36,9 @@ public:
     [[nodiscard]] virtual std::optional<URL> placeholderFile(const URL& url) = 0;
     /// Whether two items lie below the same root.
     [[nodiscard]] virtual bool lieBelowOneRoot(const URL& left, const URL& right) = 0;
+    /// Whether a rename within its root takes along what is still to come of the item. Syncthing
+    /// knows of files alone: it would tear a package apart, on all devices.
+    [[nodiscard]] virtual bool renamesWhole(const URL& item) = 0;
     /// Whether nothing of the item is still to come, so that moving it away moves the whole of it.
     /// A file is whole once it has its name; a package is not while its client gives no clear
     /// answer.

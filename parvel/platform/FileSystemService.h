@@ -32,7 +32,8 @@ public:
     /// Renames, or copies across file systems (synced before the source goes). Fails where anything
     /// stands at the destination, also against a competitor in the same instant. Within one trash
     /// folder the item's info file follows; it goes when the item leaves the trash. Within one
-    /// synchronised folder what stands for an item is renamed with no download.
+    /// synchronised folder what stands for an item is renamed with no download, where its client
+    /// takes that for a rename of the item.
     virtual bool moveItem(const URL& source, const URL& destination, ErrorOut error = nullptr) = 0;
     /// Puts the replacement at the existing item's place in one atomic step and removes the old
     /// item; moves it there when nothing stands there. The resulting URL is the existing item's.

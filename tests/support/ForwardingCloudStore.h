@@ -25,6 +25,7 @@ public:
     bool lieBelowOneRoot(const URL& left, const URL& right) override {
         return host().lieBelowOneRoot(left, right);
     }
+    bool renamesWhole(const URL& item) override { return host().renamesWhole(item); }
     bool isAllHere(const URL& url) override { return host().isAllHere(url); }
     bool fetchContent(const URL& url, ErrorOut error) override {
         return host().fetchContent(url, error);

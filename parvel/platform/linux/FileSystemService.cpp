@@ -40,12 +40,12 @@ CloudStore& cloud() {
 }
 
 /// Moving what only stands for a book out of its root does not move the book, so that it has to be
-/// here before.
-bool fetchBeforeLeaving(const URL& item, const URL& destination, ErrorOut error) {
-    if (host::parentFolderOf(item.path()) == host::parentFolderOf(destination.path()) ||
-        cloud().lieBelowOneRoot(item, destination))
-        return true;
-    return cloud().fetchContent(item, error);
+/// here before; within the root that depends on the client.
+bool fetchBeforeMove(const URL& item, const URL& destination, ErrorOut error) {
+    const bool staysInRoot =
+        host::parentFolderOf(item.path()) == host::parentFolderOf(destination.path()) ||
+        cloud().lieBelowOneRoot(item, destination);
+    return (staysInRoot && cloud().renamesWhole(item)) || cloud().fetchContent(item, error);
 }
 
 class LinuxFileSystemService : public FileSystemService {
@@ -59,7 +59,7 @@ public:
     }
 
     bool moveItem(const URL& source, const URL& destination, ErrorOut error) override {
-        if (!fetchBeforeLeaving(source, destination, error))
+        if (!fetchBeforeMove(source, destination, error))
             return false;
         const int failure =
             cloud().placeholderFile(destination) ? EEXIST : moveOrPlaceholder(source, destination);
@@ -68,7 +68,7 @@ public:
 
     bool replaceItem(const URL& existing, const URL& replacement, ReplaceOptions options,
                      std::optional<URL>* resulting, ErrorOut error) override {
-        if (!fetchBeforeLeaving(replacement, existing, error) ||
+        if (!fetchBeforeMove(replacement, existing, error) ||
             (itemExistsAtPath(existing.path()) && !cloud().fetchContent(existing, error)))
             return false;
         const int failure = m_items->replace(existing.path(), replacement.path(), options);

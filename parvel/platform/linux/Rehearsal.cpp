@@ -188,6 +188,7 @@ public:
     bool lieBelowOneRoot(const URL& left, const URL& right) override {
         return m_store.lieBelowOneRoot(left, right);
     }
+    bool renamesWhole(const URL& item) override { return m_store.renamesWhole(item); }
     bool isAllHere(const URL& url) override { return m_store.isAllHere(url); }
     bool fetchContent(const URL& url, ErrorOut error) override {
         return m_store.isAllHere(url) || fail(error, makePOSIXError(ETIMEDOUT, url));

@@ -169,6 +169,26 @@ TEST_F(CloudMoves, APackageWithPlaceholdersInItIsRenamedWithinItsRoot) {
     EXPECT_TRUE(exists("root/below/q.epub/mimetype.nextcloud"));
 }
 
+TEST_F(CloudMoves, SyncthingsPackageThatIsStillComingIsNotRenamed) {
+    m_folder.write("other/.stfolder/x", "");
+    m_folder.write("other/p.epub/.syncthing.mimetype.tmp", "half");
+
+    EXPECT_FALSE(move("other/p.epub", "other/q.epub"));
+
+    expectError(PVPOSIXErrorDomain, ETIMEDOUT, "other/p.epub");
+    EXPECT_TRUE(exists("other/p.epub"));
+    EXPECT_FALSE(exists("other/q.epub"));
+}
+
+TEST_F(CloudMoves, SyncthingsWholePackageIsRenamed) {
+    m_folder.write("other/.stfolder/x", "");
+    m_folder.write("other/p.epub/mimetype", "content");
+
+    EXPECT_TRUE(move("other/p.epub", "other/q.epub"));
+
+    EXPECT_TRUE(exists("other/q.epub/mimetype"));
+}
+
 TEST_F(CloudMoves, APackageWithPlaceholdersInItDoesNotLeaveItsRoot) {
     m_folder.write("root/p.epub/mimetype.nextcloud", " ");
 

@@ -216,6 +216,13 @@ bool HostCloudStore::lieBelowOneRoot(const URL& left, const URL& right) {
     return other && other->mark != SyncMark::None && isSameItem(place->root, other->root);
 }
 
+bool HostCloudStore::renamesWhole(const URL& item) {
+    if (!item.isFileURL() || isFileOrLink(item))
+        return true;
+    const std::optional<SyncedPlace> place = markedPlaceOf(item.path());
+    return !place || place->mark != SyncMark::Syncthing;
+}
+
 /// None for an item of which nothing is to come.
 std::optional<SyncedPlace> HostCloudStore::placeToFetch(const URL& url) {
     if (!url.isFileURL() || isFileOrLink(url))

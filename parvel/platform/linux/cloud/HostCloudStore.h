@@ -26,6 +26,7 @@ public:
                            ErrorOut error) override;
     std::optional<URL> placeholderFile(const URL& url) override;
     bool lieBelowOneRoot(const URL& left, const URL& right) override;
+    bool renamesWhole(const URL& item) override;
     bool isAllHere(const URL& url) override;
     bool fetchContent(const URL& url, ErrorOut error) override;
     std::optional<CloudReport> report(const URL& url, ErrorOut error) override;

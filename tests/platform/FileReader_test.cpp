@@ -4,7 +4,10 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <filesystem>
+#include <fstream>
+#include <iterator>
 
 #include "tests/support/TemporaryDirectory.h"
 
@@ -128,6 +131,18 @@ TEST_F(FileReaderTest, ReadsAFileThatSaysItIsEmptyToItsEnd) {
     EXPECT_NE(text->find("\nPid:"), std::string::npos);
 }
 
+TEST_F(FileReaderTest, ReadsAFileThatIsManyTimesWhatItSaysToItsEnd) {
+    const std::string path = "/proc/crypto";
+    std::ifstream file(path);
+    const std::string content(std::istreambuf_iterator<char>(file), {});
+    if (content.size() <= 8 * kilobyte)
+        GTEST_SKIP() << path << " is no long file here";
+
+    EXPECT_EQ(readFile(URL::fileURLWithPath(path), 1024 * kilobyte), content);
+    EXPECT_EQ(readFile(URL::fileURLWithPath(path), content.size()), content);
+    EXPECT_FALSE(readFile(URL::fileURLWithPath(path), content.size() - 1));
+}
+
 TEST_F(FileReaderTest, AFileThatSaysItIsEmptyHasTheLimitToo) {
     const URL url = URL::fileURLWithPath("/proc/self/status");
 
@@ -202,6 +217,22 @@ TEST_F(FileReaderTest, AMissingMemberIsNoSuchFile) {
 TEST_F(FileReaderTest, AMemberOfAMissingPackageIsNoSuchFile) {
     EXPECT_FALSE(readMember("a"));
     expectError(PVFileErrorDomain, 4, m_folder.url("book.epub/a"));
+}
+
+TEST_F(FileReaderTest, AMemberOfAPackageThatCanNotBeOpenedHasThatError) {
+    std::filesystem::create_symlink("book.epub", m_folder / "book.epub");
+
+    EXPECT_FALSE(readMember("a"));
+
+    expectError(PVPOSIXErrorDomain, ELOOP, m_folder.url("book.epub/a"));
+}
+
+TEST_F(FileReaderTest, AMemberOfAURLOfAnotherSchemeIsNoSuchFile) {
+    const URL url = *URL::fromString("https://example.com/book.epub");
+
+    EXPECT_FALSE(FileReader::host().readMember(url, "a", kilobyte, &m_error));
+
+    expectError(PVFileErrorDomain, 4, url.appendingPathComponent("a"));
 }
 
 TEST_F(FileReaderTest, ALinkInAPackageIsNotFollowed) {

@@ -90,6 +90,8 @@ TEST_F(AudioTags, TextInUTF16IsRead) {
     EXPECT_EQ(text(file(item(kSongName, 2, std::string("\0B\0\xFC\xD8\x3D\xDE\x00", 8))),
                    MediaTag::SongName),
               "Bü😀");
+    EXPECT_EQ(text(file(item(kSongName, 2, "\xD7\xFF\xE0\x01\xFF\x21")), MediaTag::SongName),
+              "\uD7FF\uE001\uFF21");
 }
 
 TEST_F(AudioTags, BrokenTextIsNone) {
@@ -116,6 +118,18 @@ TEST_F(AudioTags, TheFirstItemDecidesAlsoWhereItIsNoText) {
 TEST_F(AudioTags, TheFirstValueInAnItemWins) {
     EXPECT_EQ(text(file(atom(kArtist, dataAtom(1, "one") + dataAtom(1, "two"))), MediaTag::Artist),
               "one");
+}
+
+TEST_F(AudioTags, ItemsFarApartAreReadInAnyOrder) {
+    const std::string cover(300'000, 'x');
+    const auto asset = open(file(item("cnID", 21, number(42, 4)) + item("covr", 13, cover) +
+                                 item(kArtist, 1, "An Author")));
+
+    ASSERT_TRUE(asset);
+    EXPECT_EQ(asset->text(MediaTag::Artist), "An Author");
+    EXPECT_EQ(asset->text(MediaTag::SongID), "42");
+    EXPECT_EQ(bytesOf(asset->bytes(MediaTag::CoverArt, kLimit)), cover);
+    EXPECT_EQ(asset->text(MediaTag::Artist), "An Author");
 }
 
 TEST_F(AudioTags, AnItemsLeadingNameAtomIsPassedOver) {
@@ -153,6 +167,20 @@ TEST_F(AudioTags, ACoverThatClaimsMoreThanTheFileHasIsNone) {
         file(number(400 << 20, 4) + "covr" + number((400 << 20) - 8, 4) + "data" + "short");
 
     EXPECT_EQ(bytesOf(open(bytes)->bytes(MediaTag::CoverArt, 1ULL << 40)), "(none)");
+}
+
+TEST_F(AudioTags, AValueThatIsTooShortForItsHeadIsNone) {
+    for (std::size_t length = 0; length < 8; ++length) {
+        const std::string value = atom("data", std::string(length, '\1'));
+        EXPECT_EQ(text(file(atom("cnID", value)), MediaTag::SongID), std::nullopt) << length;
+    }
+    EXPECT_EQ(text(file(item(kArtist, 1, "")), MediaTag::Artist), "");
+}
+
+TEST_F(AudioTags, AValueThatClaimsMoreThanItsItemHasIsNone) {
+    const std::string claimed = number(100, 4) + "data" + number(1, 4) + number(0, 4) + "An Author";
+
+    EXPECT_EQ(text(file(atom(kArtist, claimed)), MediaTag::Artist), std::nullopt);
 }
 
 TEST_F(AudioTags, MetaWithoutVersionAndFlagsIsRead) {

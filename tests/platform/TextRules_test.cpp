@@ -35,6 +35,16 @@ TEST(IsValidUTF8, RefusesOverlongCutAndStrayBytes) {
         EXPECT_FALSE(isValidUTF8(text));
 }
 
+TEST(IsValidUTF8, RefusesALeadByteThatThereIsNotWhateverFollows) {
+    for (unsigned lead : {0x80U, 0x9FU, 0xBFU, 0xC0U, 0xC1U, 0xF5U, 0xF8U, 0xFFU}) {
+        std::string text(1, static_cast<char>(lead));
+        for (int following = 0; following < 4; ++following) {
+            EXPECT_FALSE(isValidUTF8(text)) << lead << " and " << following;
+            text += '\xA0';
+        }
+    }
+}
+
 TEST(IsValidUTF8, FindsABadByteAnywhereInALongText) {
     for (std::size_t position = 0; position < 40; ++position) {
         std::string text(40, 'a');

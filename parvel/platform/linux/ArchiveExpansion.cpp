@@ -225,13 +225,16 @@ std::uint64_t newFolders(std::string_view before, std::string_view name) {
 /// Entries that share their bytes make a small archive expand without end: together they must fit
 /// into the file. So do long names, by the folders that they ask for. What is made must fit on the
 /// disk.
-int checkClaims(SourceArchive& source, const std::string& destination) {
+int checkClaims(SourceArchive& source, const std::string& destination,
+                const CopierReports& reports) {
     std::uint64_t stored = 0;
     std::uint64_t content = 0;
     std::uint64_t folders = 0;
     std::string before;
     const std::uint64_t count = source.archive().entryCount();
     for (std::uint64_t index = 0; index < count; ++index) {
+        if (const int error = reports.cancellation())
+            return error;
         if (const char* name = source.archive().name(index)) {
             folders += newFolders(before, name);
             before = name;
@@ -302,7 +305,7 @@ ArchiveCopier::Count countArchiveEntries(SourceArchive& source, const CopierRepo
 
 int expandArchive(SourceArchive& source, const std::string& destination,
                   const CopierReports& reports) {
-    if (const int error = checkClaims(source, destination))
+    if (const int error = checkClaims(source, destination, reports))
         return reports.fatal(error);
     if (::mkdir(destination.c_str(), 0700) != 0)
         return reports.fatal(errno);

@@ -6,6 +6,7 @@ namespace parvel::testing {
 namespace {
 
 using cli::columns;
+using cli::cutText;
 using cli::safeText;
 using cli::wrapped;
 using Lines = std::vector<std::string>;
@@ -38,6 +39,13 @@ TEST(TerminalText, CountsWideCharactersTwiceAndCombiningOnesNot) {
     EXPECT_EQ(columns("abc"), 3U);
     EXPECT_EQ(columns("草枕"), 4U);
     EXPECT_EQ(columns("e\u0301"), 1U);
+}
+
+TEST(TerminalText, CutsAtWholeCharactersThatFit) {
+    EXPECT_EQ(cutText("草枕.epub", 3), "草");
+    EXPECT_EQ(cutText("ab\xff", 3), "ab\xff");
+    EXPECT_EQ(cutText("abc", 80), "abc");
+    EXPECT_EQ(cutText("abc", 0), "");
 }
 
 TEST(TerminalText, WrapsBetweenWords) {

@@ -37,6 +37,7 @@ public:
     virtual bool moveItem(const URL& source, const URL& destination, ErrorOut error = nullptr) = 0;
     /// Puts the replacement at the existing item's place in one atomic step and removes the old
     /// item; moves it there when nothing stands there. The resulting URL is the existing item's.
+    /// EINVAL for a link that leads to the existing item or into it, and would lead nowhere then.
     /// An existing item that is not on this device is downloaded before.
     virtual bool replaceItem(const URL& existing, const URL& replacement, ReplaceOptions options,
                              std::optional<URL>* resulting = nullptr, ErrorOut error = nullptr) = 0;

@@ -247,6 +247,38 @@ TEST_F(FileSystem, AFolderAndWhatLiesInItDontReplaceEachOther) {
     EXPECT_EQ(m_folder.read("a.epub/b.epub"), "1");
 }
 
+TEST_F(FileSystem, ALinkDoesNotReplaceWhatItLeadsTo) {
+    m_folder.write("a.epub", "book");
+    m_folder.write("b.epub/OPS/x", "x");
+    fs::create_symlink("a.epub", m_folder / "toFile");
+    fs::create_symlink("b.epub/OPS", m_folder / "intoFolder");
+    const auto isReplaced = [&](const char* existing, const char* link) {
+        return m_service->replaceItem(m_folder.url(existing), m_folder.url(link),
+                                      ReplaceOptions::NewMetadataOnly, nullptr, &m_error);
+    };
+
+    EXPECT_FALSE(isReplaced("a.epub", "toFile"));
+    EXPECT_EQ(m_error, makePOSIXError(EINVAL, m_folder.url("a.epub")));
+    EXPECT_FALSE(isReplaced("b.epub", "intoFolder"));
+    EXPECT_EQ(m_error, makePOSIXError(EINVAL, m_folder.url("b.epub")));
+
+    EXPECT_EQ(m_folder.read("a.epub"), "book");
+    EXPECT_EQ(m_folder.read("b.epub/OPS/x"), "x");
+    EXPECT_EQ(namesIn(m_folder.path()), (Names{"a.epub", "b.epub", "intoFolder", "toFile"}));
+}
+
+TEST_F(FileSystem, ALinkReplacesAnotherLinkToTheSameItem) {
+    m_folder.write("a.epub", "book");
+    fs::create_symlink("a.epub", m_folder / "old");
+    fs::create_symlink("./a.epub", m_folder / "new");
+
+    EXPECT_TRUE(m_service->replaceItem(m_folder.url("old"), m_folder.url("new"),
+                                       ReplaceOptions::NewMetadataOnly));
+
+    EXPECT_EQ(fs::read_symlink(m_folder / "old"), "./a.epub");
+    EXPECT_EQ(namesIn(m_folder.path()), (Names{"a.epub", "old"}));
+}
+
 TEST_F(FileSystem, AnotherNameOfTheSameFileGoesWhenItReplaces) {
     m_folder.write("old", "1");
     fs::create_hard_link(m_folder / "old", m_folder / "new");

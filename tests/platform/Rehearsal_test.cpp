@@ -189,6 +189,15 @@ TEST_F(RehearsedFolder, AReplacementByWhatLiesBelowOrAboveFails) {
     expectTheSame({replace("a.epub", "a.epub/inner.epub"), replace("a.epub/inner.epub", "a.epub")});
 }
 
+TEST_F(RehearsedFolder, ALinkDoesNotReplaceWhatItLeadsTo) {
+    m_folder.write("a.epub", "1");
+    fs::create_symlink("a.epub", m_folder.path() / "b.epub");
+    fs::create_symlink("a.epub", m_folder.path() / "c.epub");
+
+    expectTheSame({replace("a.epub", "b.epub"), exists("b.epub"), replace("c.epub", "b.epub"),
+                   exists("b.epub")});
+}
+
 TEST_F(RehearsedFolder, ACopyIsFoundBesideItsSource) {
     m_folder.write("a.pdf", "1");
 

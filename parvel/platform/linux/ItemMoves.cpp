@@ -103,15 +103,18 @@ struct StagedCopy {
     std::string path;
 };
 
+/// Whether the second path leads to the first one's item or below it.
+bool leadsInto(const std::string& item, const std::string& path) {
+    const auto relationship = Service<ResourceQueries>::current().relationship(
+        URL::fileURLWithPath(item), URL::fileURLWithPath(path));
+    return relationship == DirectoryRelationship::Contains ||
+           relationship == DirectoryRelationship::Same;
+}
+
 /// Whether a folder is the item or lies below it: a copy into it would copy itself.
 bool liesWithin(const std::string& folder, const std::string& item) {
     struct stat copied {};
-    if (status(item, copied) != 0 || !S_ISDIR(copied.st_mode))
-        return false;
-    const auto relationship = Service<ResourceQueries>::current().relationship(
-        URL::fileURLWithPath(item), URL::fileURLWithPath(folder));
-    return relationship == DirectoryRelationship::Contains ||
-           relationship == DirectoryRelationship::Same;
+    return status(item, copied) == 0 && S_ISDIR(copied.st_mode) && leadsInto(item, folder);
 }
 
 std::optional<StagedCopy> stageCopy(const std::string& source, const std::string& target,
@@ -322,6 +325,14 @@ int copyExclusively(const std::string& source, const std::string& destination) {
     return staged ? publish(*staged, destination) : error;
 }
 
+bool isLinkInto(const std::string& existing, const std::string& replacement) {
+    struct stat oldItem {};
+    struct stat newItem {};
+    return status(replacement, newItem) == 0 && S_ISLNK(newItem.st_mode) &&
+           status(existing, oldItem) == 0 && !S_ISLNK(oldItem.st_mode) &&
+           leadsInto(existing, replacement);
+}
+
 int replace(const std::string& existing, const std::string& replacement, ReplaceOptions options) {
     struct stat oldItem {};
     struct stat newItem {};
@@ -334,6 +345,8 @@ int replace(const std::string& existing, const std::string& replacement, Replace
         return existingError;
     if (isSameItem(oldItem, newItem))
         return replaceByOtherName(existing, replacement);
+    if (isLinkInto(existing, replacement))
+        return EINVAL;
 
     if (options == ReplaceOptions::Default && hasToInherit(existing, replacement))
         return replaceByCopy(existing, replacement, options);

@@ -18,7 +18,12 @@ namespace parvel::host {
 /// Copies to a name where nothing stands; the copy appears whole or not at all.
 [[nodiscard]] int copyExclusively(const std::string& source, const std::string& destination);
 
+/// Whether the replacement is a link that leads to the existing item or below it: in that place it
+/// would lead nowhere, and what it led to would be gone.
+[[nodiscard]] bool isLinkInto(const std::string& existing, const std::string& replacement);
+
 /// Puts the replacement in the existing item's place, and moves it there when nothing stands there.
+/// EINVAL for a link into the existing item.
 [[nodiscard]] int replace(const std::string& existing, const std::string& replacement,
                           ReplaceOptions options);
 

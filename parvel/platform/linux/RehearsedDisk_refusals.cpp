@@ -9,6 +9,7 @@
 #include <cstdint>
 
 #include "parvel/foundation/URL.h"
+#include "parvel/platform/linux/ItemMoves.h"
 #include "parvel/platform/linux/Paths.h"
 #include "parvel/platform/linux/RehearsedDisk.h"
 
@@ -155,11 +156,14 @@ int RehearsedDisk::moveError(const std::string& source, const std::string& desti
 int RehearsedDisk::replaceError(const std::string& existing, const std::string& replacement) const {
     if (isBelow(existing, replacement) || isBelow(replacement, existing))
         return EINVAL;
+    const Entry item = entryAt(replacement);
+    const Entry old = entryAt(existing);
+    if (item.kind == Kind::Real && old.kind == Kind::Real && isLinkInto(old.real, item.real))
+        return EINVAL;
     if (const int error = removalError(replacement))
         return error;
     if (const int error = removalError(existing))
         return error;
-    const Entry item = entryAt(replacement);
     if (item.kind != Kind::Real)
         return 0;
     if (!isSameMount(parentFolderOf(existing), parentFolderOf(replacement)))

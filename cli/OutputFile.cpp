@@ -11,6 +11,8 @@
 #include <unistd.h>
 
 #include "cli/Output.h"
+#include "cli/Result.h"
+#include "parvel/platform/StagingDirectory.h"
 
 namespace parvel::cli {
 namespace {
@@ -46,19 +48,24 @@ int fill(int descriptor, std::string_view bytes, std::optional<mode_t> mode) {
     return failure != 0 ? failure : closed;
 }
 
+/// Of an error that no folder to stage in could be made.
+int errnoOf(const Error& error) {
+    return error.domain() == PVPOSIXErrorDomain ? static_cast<int>(error.code()) : ENOENT;
+}
+
 int replace(const std::string& path, std::string_view bytes, std::optional<mode_t> mode) {
-    const std::string folder = path.substr(0, path.rfind('/') + 1);
-    const std::string staged = folder + ".parvel-output-" + std::to_string(getpid());
+    const URL target = urlOfPath(path);
+    std::optional<Error> error;
+    const auto staging = StagingDirectory::makeIn(target.deletingLastPathComponent(), &error);
+    if (!staging)
+        return errnoOf(*error);
+    const std::string staged = staging->url().appendingPathComponent("output").path();
     const int descriptor =
         open(staged.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0666);
     if (descriptor < 0)
         return errno;
-    int failure = fill(descriptor, bytes, mode);
-    if (failure == 0)
-        failure = errnoOf(std::rename(staged.c_str(), path.c_str()));
-    if (failure != 0)
-        unlink(staged.c_str());
-    return failure;
+    const int failure = fill(descriptor, bytes, mode);
+    return failure != 0 ? failure : errnoOf(std::rename(staged.c_str(), path.c_str()));
 }
 
 }  // namespace

@@ -14,11 +14,11 @@
 #include "cli/Output.h"
 #include "cli/OutputOptions.h"
 #include "cli/PathSource.h"
-#include "cli/Progress.h"
 #include "cli/PropertyListText.h"
 #include "cli/Reconciliation.h"
 #include "cli/RecordFile.h"
 #include "cli/TerminalText.h"
+#include "parvel/inspection/PVAssetMetadataInspector.h"
 #include "parvel/metadata/PVMutableAssetMetadata.h"
 
 namespace parvel::cli {
@@ -44,8 +44,7 @@ public:
 private:
     [[nodiscard]] std::vector<AssetPtr> readRecords() const;
     [[nodiscard]] std::vector<URL> findURLs(std::vector<std::string> operands);
-    void findMissing(PVAssetMetadataFileManager& manager, const std::vector<URL>& urls,
-                     const std::vector<AssetPtr>& records, Findings& findings);
+    void reportUninspected(const std::vector<URL>& urls, const std::optional<Error>& error);
     void reportFailure(const Result& result);
     [[nodiscard]] std::string textOf(const Findings& findings) const;
 
@@ -55,9 +54,6 @@ private:
     DryRun m_dryRun;
     PathOptions m_paths;
     OutputOptions m_output;
-    ProgressOption m_progress;
-
-    Progress::Form m_form = Progress::Form::Auto;
 };
 
 void CheckCommand::declare(CommandLine& line) {
@@ -67,7 +63,6 @@ void CheckCommand::declare(CommandLine& line) {
                 "inspect prints them (JSON, lines of JSON or a property list)",
                 m_records);
     line.flag("--exit-code", "end with status 4 where anything is found", m_hasExitCode);
-    m_progress.declare(line);
     m_dryRun.declare(line);
     m_paths.declareSources(line);
     m_output.declare(line);
@@ -141,28 +136,32 @@ void CheckCommand::reportFailure(const Result& result) {
     writeToStandardError(failureLine("check", result));
 }
 
-/// Asset by asset, so that an interrupt ends it after each; what was found so far is told.
-void CheckCommand::findMissing(PVAssetMetadataFileManager& manager, const std::vector<URL>& urls,
-                               const std::vector<AssetPtr>& records, Findings& findings) {
-    const std::vector<URL> unnamed = unnamedURLs(urls, records);
-    Progress progress(m_form, {});
-    for (std::size_t index = 0; index < unnamed.size() && !interrupted(); ++index) {
-        const URL& url = unnamed[index];
+/// The library leaves out what it can't inspect; here each is looked at once more for the reason.
+/// An error that none of them explains is that of attributes which could not be written.
+void CheckCommand::reportUninspected(const std::vector<URL>& urls,
+                                     const std::optional<Error>& error) {
+    bool isExplained = false;
+    std::optional<URL> inspected;
+    for (const URL& url : urls) {
         CallLog log;
         Result result = resultForPath(url.path());
-        const auto missing =
-            manager.assetsForURLs_missingFromAssets_error({url}, {}, &result.error);
-        // Of an asset that can't be inspected there is no record; one whose attributes can't be
-        // written has an error beside it.
+        if (PVAssetMetadataInspector::metadataForAssetAtURL_error(url, &result.error)) {
+            inspected = url;
+            continue;
+        }
         result.reason = log.reason();
-        if (!missing.empty() && missing.front()->url() != url)
-            result.advice = kSmallLettersAdvice;
-        if (missing.empty() || result.error)
-            reportFailure(result);
-        findings.missing.insert(findings.missing.end(), missing.begin(), missing.end());
-        progress.report(static_cast<double>(index + 1) / static_cast<double>(unnamed.size()),
-                        url.path());
+        reportFailure(result);
+        isExplained = true;
     }
+    if (!error || isExplained)
+        return;
+    // A record that names another place than its asset's is one to that asset.
+    const URL* const url = inspected ? &*inspected : error->url();
+    Result result = resultForPath(url ? url->path() : std::string());
+    result.error = error;
+    if (inspected)
+        result.advice = kSmallLettersAdvice;
+    reportFailure(result);
 }
 
 std::string pathOf(const AssetPtr& asset) {
@@ -225,13 +224,16 @@ std::string CheckCommand::textOf(const Findings& findings) const {
 int CheckCommand::run(std::vector<std::string> operands) {
     m_output.applyLog();
     m_dryRun.begin();
-    m_form = m_progress.form();
     const std::vector<AssetPtr> records = readRecords();
     const auto manager = m_dryRun.makeManager();
     Findings findings;
     findings.orphans = manager->orphanAssetsInAssets_error(records);
     const std::vector<URL> urls = findURLs(std::move(operands));
-    findMissing(*manager, urls, records, findings);
+    if (!interrupted()) {
+        std::optional<Error> error;
+        findings.missing = manager->assetsForURLs_missingFromAssets_error(urls, records, &error);
+        reportUninspected(uninspectedURLs(urls, records, findings.missing), error);
+    }
     findings.moved = movedAssets(findings.orphans, findings.missing);
 
     Output output(STDOUT_FILENO);

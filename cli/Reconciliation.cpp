@@ -72,19 +72,22 @@ std::vector<MovedAsset> movedAssets(const std::vector<AssetPtr>& orphans,
     return moved;
 }
 
-std::vector<URL> unnamedURLs(const std::vector<URL>& urls, const std::vector<AssetPtr>& records) {
-    std::unordered_set<std::string> named;
-    named.reserve(records.size());
-    for (const AssetPtr& record : records) {
-        if (const auto url = record->url())
-            named.insert(url->standardized().path());
+std::vector<URL> uninspectedURLs(const std::vector<URL>& urls, const std::vector<AssetPtr>& records,
+                                 const std::vector<AssetPtr>& missing) {
+    std::unordered_set<std::string> known;
+    known.reserve(records.size() + missing.size());
+    for (const std::vector<AssetPtr>* assets : {&records, &missing}) {
+        for (const AssetPtr& asset : *assets) {
+            if (const auto url = asset->url())
+                known.insert(url->standardized().path());
+        }
     }
-    std::vector<URL> unnamed;
+    std::vector<URL> uninspected;
     for (const URL& url : urls) {
-        if (!named.contains(url.standardized().path()))
-            unnamed.push_back(url);
+        if (!known.contains(url.standardized().path()))
+            uninspected.push_back(url);
     }
-    return unnamed;
+    return uninspected;
 }
 
 }  // namespace parvel::cli

@@ -20,7 +20,9 @@ struct MovedAsset {
 std::vector<MovedAsset> movedAssets(const std::vector<AssetPtr>& orphans,
                                     const std::vector<AssetPtr>& missing);
 
-/// Those of the URLs that none of the records names.
-std::vector<URL> unnamedURLs(const std::vector<URL>& urls, const std::vector<AssetPtr>& records);
+/// Those of the URLs that none of the records names and that no missing asset was made of: they
+/// could not be inspected.
+std::vector<URL> uninspectedURLs(const std::vector<URL>& urls, const std::vector<AssetPtr>& records,
+                                 const std::vector<AssetPtr>& missing);
 
 }  // namespace parvel::cli

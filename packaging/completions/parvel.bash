@@ -8,7 +8,7 @@ _parvel_options() {
                 --json --jsonl --plist --log --help -h'
             ;;
         check)
-            echo '--records --exit-code --progress --dry-run --files-from --null -0
+            echo '--records --exit-code --dry-run --files-from --null -0
                 --json --jsonl --plist --log --help -h'
             ;;
         cloud)

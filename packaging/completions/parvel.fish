@@ -115,7 +115,7 @@ complete -c parvel -n '__fish_seen_subcommand_from update' -l into -r -d 'The fo
 complete -c parvel -n '__fish_seen_subcommand_from update' -l existing -r -d 'The asset that it is a new version of'
 complete -c parvel -n '__fish_seen_subcommand_from update' -l force -d 'Replace another asset, too'
 
-for command in check edit inflate install pack update
+for command in edit inflate install pack update
     complete -c parvel -n "__fish_seen_subcommand_from $command" -l progress -x -a 'auto always never json' -d 'Show how far the work has come'
 end
 

@@ -89,6 +89,7 @@ std::string mimetypeOf(const fs::path& package, Failure& failure) {
     return text;
 }
 
+/// Where the archive's file system keeps no attributes, they stay behind.
 int copyAttributes(const std::string& from, int to) {
     std::string names(65536, '\0');
     const ssize_t length = listxattr(from.c_str(), names.data(), names.size());
@@ -100,8 +101,10 @@ int copyAttributes(const std::string& from, int to) {
         if (!std::string_view(name).starts_with("user."))
             continue;
         const ssize_t size = getxattr(from.c_str(), name, value.data(), value.size());
-        if (size < 0 || fsetxattr(to, name, value.data(), static_cast<std::size_t>(size), 0) != 0)
+        if (size < 0)
             return errno;
+        if (fsetxattr(to, name, value.data(), static_cast<std::size_t>(size), 0) != 0)
+            return errno == ENOTSUP ? 0 : errno;
     }
     return 0;
 }

@@ -15,6 +15,7 @@
     folder NAME
     link NAME TARGET
     pipe NAME
+    mountpoint NAME                a folder over which "unshare -rm" can mount
     attribute NAME KEY VALUE       the extended attribute KEY of the library
     many NUMBER NAME               copies of one book, %d in NAME counting from 1
 
@@ -28,6 +29,7 @@ import plistlib
 import shlex
 import shutil
 import struct
+import subprocess
 import urllib.parse
 import zipfile
 import zlib
@@ -156,6 +158,14 @@ def attribute(path, key, value):
         raise
 
 
+def mountpoint(path):
+    os.makedirs(path)
+    tried = subprocess.run(["unshare", "-rm", "mount", "-t", "ramfs", "none", path],
+                           capture_output=True, check=False)
+    if tried.returncode != 0:
+        raise Unsupported("no file system can be mounted")
+
+
 def make(directory, line):
     kind, name, *rest = shlex.split(line)
     if kind == "many":
@@ -182,6 +192,8 @@ def make(directory, line):
         os.symlink(rest[0], path)
     elif kind == "pipe":
         os.mkfifo(path)
+    elif kind == "mountpoint":
+        mountpoint(path)
     elif kind == "attribute":
         attribute(path, rest[0], rest[1])
     else:

@@ -16,6 +16,7 @@
 #include "parvel/metadata/PVMutableAssetMetadata.h"
 #include "parvel/platform/CloudReport.h"
 #include "parvel/platform/Rehearsal.h"
+#include "parvel/platform/StagingDirectory.h"
 #include "parvel/xattr/ExtendedAttributes.h"
 #include "parvel/xattr/PNMetadataXattr.h"
 
@@ -24,8 +25,9 @@ namespace {
 
 namespace fs = std::filesystem;
 
-/// What the names of items begin with that are on their way to a place.
-constexpr std::string_view kStagingPrefix = ".parvel-stage-";
+/// What the name of an item begins with that stepped aside for another, where two names can't be
+/// exchanged.
+constexpr std::string_view kAsidePrefix = ".parvel-aside-";
 
 /// What is written with the identity, which comes last.
 constexpr std::array kWrittenBeforeIdentity{PNMetadataXattrTitle, PNMetadataXattrAuthor,
@@ -109,7 +111,13 @@ std::optional<URL> assetStoodFor(const fs::path& path) {
 }
 
 std::optional<Remnant> remnantAt(const fs::path& path) {
-    if (path.filename().string().starts_with(kStagingPrefix)) {
+    const std::string name = path.filename().string();
+    if (name.starts_with(kAsidePrefix))
+        return Remnant{path.string(),
+                       {"steppedAside",
+                        "it was to be replaced by a run that was killed, and may be the only copy",
+                        "see whether the new one is there, else give it back its name"}};
+    if (name.starts_with(StagingDirectory::namePrefix)) {
         if (!isUnheld(path.string()))
             return std::nullopt;
         return Remnant{path.string(),

@@ -127,6 +127,7 @@ void DoctorCommand::examineFound(const FoundPath& found) {
 
 void DoctorCommand::report(Result result, const std::vector<Finding>& findings) {
     std::vector<Value> values;
+    values.reserve(findings.size());
     for (const Finding& finding : findings)
         values.emplace_back(Dictionary{{"kind", String(finding.kind)},
                                        {"message", finding.message},

@@ -16,6 +16,7 @@
 #include "cli/TransferAdvice.h"
 #include "cli/ZipWriter.h"
 #include "parvel/metadata/PVMutableAssetMetadata.h"
+#include "parvel/platform/StagingDirectory.h"
 
 namespace parvel::cli {
 namespace {
@@ -63,7 +64,12 @@ std::vector<std::string> membersOf(const fs::path& package, Failure& failure) {
     std::error_code error;
     fs::recursive_directory_iterator entries(package, error);
     for (; !error && entries != fs::recursive_directory_iterator(); entries.increment(error)) {
-        if (!entries->is_directory(error) || entries->is_symlink(error))
+        // Left behind by a killed run, and no part of the book.
+        const bool isStaged =
+            entries->path().filename().string().starts_with(StagingDirectory::namePrefix);
+        if (isStaged)
+            entries.disable_recursion_pending();
+        else if (!entries->is_directory(error) || entries->is_symlink(error))
             members.push_back(entries->path().lexically_relative(package).string());
     }
     if (error)

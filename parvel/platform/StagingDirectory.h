@@ -1,6 +1,7 @@
 #pragma once
 
 #include <memory>
+#include <string_view>
 
 #include "parvel/foundation/ErrorOut.h"
 #include "parvel/foundation/PVExport.h"
@@ -18,6 +19,9 @@ namespace parvel {
 ///         manager->inflateAsset_temporaryDirectory_error(book, staging->url(), &error);
 class PV_EXPORT StagingDirectory {
 public:
+    /// What its name begins with, as that of every item that the library is making.
+    static constexpr std::string_view namePrefix = ".parvel-stage-";
+
     virtual ~StagingDirectory() = default;
 
     [[nodiscard]] virtual const URL& url() const = 0;

@@ -14,6 +14,7 @@
 #include <vector>
 
 #include "parvel/foundation/URL.h"
+#include "parvel/platform/StagingDirectory.h"
 #include "parvel/platform/linux/DirectoryStream.h"
 #include "parvel/platform/linux/ItemTree.h"
 #include "parvel/platform/linux/Paths.h"
@@ -22,7 +23,6 @@ namespace parvel::host {
 
 namespace {
 
-constexpr std::string_view kStagingPrefix = ".parvel-stage-";
 constexpr int kStagingAttempts = 100;
 constexpr time_t kDay = 24 * 60 * 60;
 
@@ -45,7 +45,7 @@ FileDescriptor lockedItem(const std::string& path) {
 }
 
 std::string hiddenPathIn(const std::string& folder) {
-    return pathAppending(folder, randomName(kStagingPrefix));
+    return pathAppending(folder, randomName(StagingDirectory::namePrefix));
 }
 
 void clearIfStale(const std::string& path, bool isLockSeen) {
@@ -79,7 +79,7 @@ std::string randomName(std::string_view prefix) {
 }
 
 bool isStagingName(std::string_view name) {
-    return name.starts_with(kStagingPrefix);
+    return name.starts_with(StagingDirectory::namePrefix);
 }
 
 bool isLockSeenByAll(long fileSystemType) {

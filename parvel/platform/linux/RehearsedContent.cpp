@@ -274,7 +274,7 @@ public:
     using Rehearsed::Rehearsed;
 
     std::unique_ptr<StagingDirectory> makeIn(const URL& folder, ErrorOut error) override {
-        const URL url = folder.appendingPathComponent(randomName(".parvel-stage-"));
+        const URL url = folder.appendingPathComponent(randomName(StagingDirectory::namePrefix));
         const int failure = m_disk->makeFolder(url.path());
         if (failure != 0)
             return fail(error, makeServiceError(failure, folder));

@@ -31,8 +31,9 @@ public:
     /// written through to the disk, or -1 with errno set: EEXIST where anything has the name,
     /// ECANCELED for a quit, EIO for a file that grew or shrank meanwhile, EOPNOTSUPP for what is
     /// neither file nor folder. What was made stays. The callback, if any, hears of data (start,
-    /// progress after each piece of at most 1 MiB, finish), then of attributes, and of an error in
-    /// either, which ends the copy whatever it answers.
+    /// progress after each piece of at most 1 MiB, or 16 MiB where the file system shares them,
+    /// finish), then of attributes, and of an error in either, which ends the copy whatever it
+    /// answers.
     [[nodiscard]] virtual int copy(const std::string& source, const std::string& destination,
                                    const StatusCallback& callback) = 0;
 

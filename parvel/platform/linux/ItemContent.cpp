@@ -1,6 +1,8 @@
 #include "parvel/platform/linux/ItemContent.h"
 
 #include <fcntl.h>
+#include <linux/fs.h>
+#include <sys/ioctl.h>
 #include <sys/sendfile.h>
 #include <sys/vfs.h>
 #include <sys/xattr.h>
@@ -22,16 +24,19 @@ namespace parvel::host {
 namespace {
 
 constexpr std::size_t kCopyPiece = std::size_t{1} << 20;
+/// Shared in less time than a piece is copied.
+constexpr std::uint64_t kSharedPiece = std::uint64_t{16} << 20;
 constexpr int kMostTries = 100;
 constexpr long kFuseMagic = 0x65735546;
 constexpr std::string_view kUserAttributes = "user.";
 
-/// The ways to copy a piece, best first: the kernel may share the blocks, or copy without us.
-enum class PieceWay { Range, Sendfile, Buffer };
+/// The ways to copy a piece, best first: blocks are shared, or copied by the kernel, or by us.
+enum class PieceWay { Share, Range, Sendfile, Buffer };
 
+/// Copies a file of a given size, and what it has grown by.
 class PieceCopy {
 public:
-    PieceCopy(int from, int to) : m_from(from), m_to(to) {}
+    PieceCopy(int from, int to, std::uint64_t size) : m_from(from), m_to(to), m_size(size) {}
 
     /// The length copied; 0 at the end of the file, and negative with errno set.
     ssize_t next() {
@@ -39,6 +44,11 @@ public:
             const ssize_t length = retried([&] { return copyPiece(); });
             if (length > 0 || m_way == PieceWay::Buffer || (length < 0 && !canFallBack(errno)))
                 return length;
+            if (m_way == PieceWay::Share) {
+                if (!startBehindShared())
+                    return -1;
+                continue;
+            }
             // Some file systems answer 0 early, so reading alone shows the end.
             m_way = length < 0 && m_way == PieceWay::Range ? PieceWay::Sendfile : PieceWay::Buffer;
         }
@@ -47,11 +57,33 @@ public:
 private:
     static bool canFallBack(int error) {
         return error == EXDEV || error == EINVAL || error == ENOSYS || error == EOPNOTSUPP ||
-               error == EBADF;
+               error == EBADF || error == ENOTTY;
+    }
+
+    /// Sharing leaves the positions of the files where they are.
+    bool startBehindShared() {
+        m_way = PieceWay::Range;
+        const auto shared = static_cast<off_t>(m_shared);
+        return m_shared == 0 || (::lseek(m_from, shared, SEEK_SET) == shared &&
+                                 ::lseek(m_to, shared, SEEK_SET) == shared);
+    }
+
+    ssize_t sharePiece() {
+        const std::uint64_t length = std::min(kSharedPiece, m_size - m_shared);
+        file_clone_range range{};
+        range.src_fd = m_from;
+        range.src_offset = range.dest_offset = m_shared;
+        range.src_length = length;
+        if (length == 0 || ::ioctl(m_to, FICLONERANGE, &range) != 0)
+            return length == 0 ? 0 : -1;
+        m_shared += length;
+        return static_cast<ssize_t>(length);
     }
 
     ssize_t copyPiece() {
         switch (m_way) {
+            case PieceWay::Share:
+                return sharePiece();
             case PieceWay::Range:
                 return ::copy_file_range(m_from, nullptr, m_to, nullptr, kCopyPiece, 0);
             case PieceWay::Sendfile:
@@ -75,7 +107,9 @@ private:
 
     int m_from;
     int m_to;
-    PieceWay m_way = PieceWay::Range;
+    std::uint64_t m_size;
+    std::uint64_t m_shared = 0;
+    PieceWay m_way = PieceWay::Share;
     std::unique_ptr<char[]> m_buffer;
 };
 
@@ -142,7 +176,7 @@ int copyAttribute(int from, int to, const std::string& name, int flags) {
 }  // namespace
 
 int copyContent(int from, int to, std::uint64_t size, const PieceReport& report) {
-    PieceCopy pieces(from, to);
+    PieceCopy pieces(from, to, size);
     std::uint64_t copied = 0;
     for (;;) {
         const ssize_t length = pieces.next();

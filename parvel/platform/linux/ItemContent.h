@@ -10,8 +10,8 @@ namespace parvel::host {
 /// What makes up a single file or folder, copied from one open descriptor to another. Every
 /// function gives 0 or the errno value.
 
-/// Told how many bytes are copied after each piece of at most 1 MiB; ends the copy with anything
-/// but 0.
+/// Told how many bytes are copied after each piece of at most 1 MiB, or 16 where they are shared;
+/// ends the copy with anything but 0.
 using PieceReport = std::function<int(std::uint64_t copied)>;
 
 /// Copies a regular file to its end, into an empty one, sharing the bytes on disk where the file

@@ -9,7 +9,7 @@ namespace {
 
 using cli::MovedAsset;
 using cli::movedAssets;
-using cli::unnamedURLs;
+using cli::uninspectedURLs;
 
 /// A record of a path and an identity under the key.
 AssetPtr identified(const std::string& path, std::string_view identityKey, const Value& identity) {
@@ -61,12 +61,12 @@ TEST(MovedAssets, NeverAreThoseWithoutIdentity) {
               Pairs());
 }
 
-TEST(UnnamedURLs, AreThoseOfNoRecord) {
+TEST(UninspectedURLs, AreThoseOfNoRecordAndNoMissingAsset) {
     const auto url = [](std::string_view path) { return URL::fileURLWithPath(path); };
 
-    EXPECT_EQ(
-        unnamedURLs({url("/x/./a"), url("/b"), url("/d")}, {generated("/x/a", "1"), emptyRecord()}),
-        (std::vector<URL>{url("/b"), url("/d")}));
+    EXPECT_EQ(uninspectedURLs({url("/x/./a"), url("/b"), url("/c"), url("/d")},
+                              {generated("/x/a", "1"), emptyRecord()}, {generated("/c", "2")}),
+              (std::vector<URL>{url("/b"), url("/d")}));
 }
 
 }  // namespace

@@ -50,8 +50,8 @@ AssetPtr restoreOriginalCover(FileSystemService& fileManager, const PVAssetMetad
     if (!fileManager.removeItem(files.artwork, error))
         return nullptr;
 
-    // Deliberate: goes on without an original, which is what was asked for: the error of it passes
-    // out beside the record.
+    // Deliberate: goes on without an original. It was asked for, so the error passes out beside
+    // the record.
     ErrorSlot restoring(error);
     if (fileManager.moveItem(files.backup, files.artwork, restoring.out())) {
         PVParvelLog().debug("ReplaceCover: Restored existing URL -- Success");

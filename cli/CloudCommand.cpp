@@ -1,3 +1,5 @@
+#include <cerrno>
+
 #include "cli/AssetChanges.h"
 #include "cli/BookStaging.h"
 #include "cli/Command.h"
@@ -30,6 +32,12 @@ private:
     bool m_hasReplaced = false;
     std::optional<Error> m_error;
 };
+
+/// Whether the program itself refused: a folder that is no book would go, or what this run brought.
+bool isGuardsRefusal(const std::optional<Error>& error) {
+    return error && error->domain() == PVPOSIXErrorDomain &&
+           (error->code() == EISDIR || error->code() == EALREADY);
+}
 
 /// `cloud add`, `take`, `replace` and `status`.
 class CloudCommand : public Command {
@@ -143,19 +151,30 @@ void CloudCommand::replaceInto(PVAssetMetadataFileManager& manager, const AssetP
         manager.setUbiquitous_asset_intoDirectory_replace_error(
             /*ubiquitous=*/true, asset, *m_target, /*replace=*/true, &result.error);
     }
-    result.needsRecord = !witness->hasReplaced();
+    result.needsRecord = false;
     if (witness->hasReplaced()) {
         result.outcome = "moved into " + m_target->path();
         return;
     }
-    result.nothing = "still where it was";
     Result failed = result;
     failed.error = standsAt(*m_target)
                        ? witness->error()
                        : makeFileError(PVFileErrorCode::NoSuchFile,
                                        placeInFolder(asset, *m_target, /*takesAssetID=*/false));
-    result.reason = failed.error ? failed.error->message() : "nothing tells why";
-    result.advice = adviceForTransfer(failed, urlOfPath(result.path), "move that away first");
+    std::string reason = failed.error ? failed.error->message() : "nothing tells why";
+    if (reason.ends_with('.'))
+        reason.pop_back();
+    const std::string advice =
+        adviceForTransfer(failed, urlOfPath(result.path), "move that away first");
+    // What the library did not do is no failure of a call that reports none; a refusal is.
+    if (isGuardsRefusal(failed.error)) {
+        result.needsRecord = true;
+        result.nothing = "still where it was";
+        result.reason = reason;
+        result.advice = advice;
+        return;
+    }
+    result.outcome = "still where it was: " + reason + (advice.empty() ? "" : "; " + advice);
 }
 
 /// --record, where it is given, is the record of the new version.

@@ -3,6 +3,7 @@
 #include "cli/AssetChanges.h"
 #include "cli/BookStaging.h"
 #include "cli/Command.h"
+#include "cli/Messages.h"
 #include "cli/ServiceInPlace.h"
 #include "cli/TransferAdvice.h"
 #include "parvel/platform/CloudReport.h"
@@ -161,9 +162,8 @@ void CloudCommand::replaceInto(PVAssetMetadataFileManager& manager, const AssetP
                        ? witness->error()
                        : makeFileError(PVFileErrorCode::NoSuchFile,
                                        placeInFolder(asset, *m_target, /*takesAssetID=*/false));
-    std::string reason = failed.error ? failed.error->message() : "nothing tells why";
-    if (reason.ends_with('.'))
-        reason.pop_back();
+    const std::string reason =
+        failed.error ? withoutFullStop(failed.error->message()) : "nothing tells why";
     const std::string advice =
         adviceForTransfer(failed, urlOfPath(result.path), "move that away first");
     // What the library did not do is no failure of a call that reports none; a refusal is.

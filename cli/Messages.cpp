@@ -60,13 +60,13 @@ bool reasonTellsMore(const Result& result) {
            !result.error->userInfo().contains(PVLocalizedFailureReasonErrorKey);
 }
 
+}  // namespace
+
 std::string withoutFullStop(std::string words) {
     if (words.ends_with('.'))
         words.pop_back();
     return words;
 }
-
-}  // namespace
 
 std::string failureLine(std::string_view command, const Result& result) {
     std::string line = "parvel: " + std::string(command) + ": " + safeText(result.path) + ": ";

@@ -7,6 +7,9 @@
 
 namespace parvel::cli {
 
+/// A message as a part of a line.
+std::string withoutFullStop(std::string words);
+
 /// The one line for a result that failed:
 /// `parvel: COMMAND: PATH: what went wrong (DOMAIN CODE)`, and what to do about it where that is
 /// known.

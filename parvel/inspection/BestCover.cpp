@@ -23,9 +23,8 @@ constexpr int mostImagesOfPage = 8;
 
 bool isImage(const Data& bytes) {
     using namespace std::string_view_literals;
-    const std::vector<Data::Bytes> ranges = bytes.ranges();
-    const std::string_view text(reinterpret_cast<const char*>(ranges.front().data()),
-                                ranges.front().size());
+    std::vector<std::uint8_t> storage;
+    const std::string_view text = bytes.text(storage);
     return text.starts_with("\x89PNG\r\n\x1A\n"sv) || text.starts_with("\xFF\xD8\xFF"sv) ||
            text.starts_with("GIF8"sv) ||
            (text.starts_with("RIFF"sv) &&

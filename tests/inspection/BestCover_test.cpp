@@ -93,6 +93,17 @@ TEST_F(BestCoverSearch, FindsTheGuidesImage) {
     EXPECT_EQ(found(book), "2 OPS/c.png ");
 }
 
+TEST_F(BestCoverSearch, GoesOnPastAnEmptyImage) {
+    const EpubBuilder book =
+        EpubBuilder{}
+            .opf(opf("", R"(<item id="a" href="a.png" properties="cover-image"/>)",
+                     R"(<guide><reference type="cover" href="c.png"/></guide>)"))
+            .file("OPS/a.png", "")
+            .file("OPS/c.png", kImage);
+
+    EXPECT_EQ(found(book), "2 OPS/c.png ");
+}
+
 TEST_F(BestCoverSearch, FindsTheImageOfTheGuidesPage) {
     const EpubBuilder book =
         EpubBuilder{}
@@ -209,6 +220,17 @@ TEST_F(BestCoverSearch, IsForBooksAlone) {
                         .zip(m_folder / "a.m4a");
 
     EXPECT_FALSE(bestCoverForAssetAtURL(url, &m_error));
+}
+
+TEST_F(BestCoverSearch, GivesAnEmptyOwnCoverWhereNoRuleFindsAnImage) {
+    const EpubBuilder book =
+        EpubBuilder{}.opf(opf("", R"(<item id="cover" href="c.png"/>)")).file("OPS/c.png", "");
+
+    const auto cover = best(book);
+
+    ASSERT_TRUE(cover);
+    EXPECT_EQ(cover->rule, CoverRule::OwnImage);
+    EXPECT_TRUE(cover->bytes.empty());
 }
 
 TEST_F(BestCoverSearch, ComesToAnEndOverAnEndlessSpine) {

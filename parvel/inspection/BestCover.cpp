@@ -133,18 +133,13 @@ std::optional<BestCover> CoverSearch::onPage(CoverRule rule, const XmlDocument& 
     return std::nullopt;
 }
 
-bool isBook(const URL& url) {
-    const PVAssetType kind = PVAssetMetadata::assetTypeForAssetAtURL(url);
-    return kind == PVAssetTypeEPub || kind == PVAssetTypeKestrelPub;
-}
-
 }  // namespace
 
 std::optional<BestCover> bestCoverForAssetAtURL(const std::optional<URL>& url, ErrorOut error) {
     std::optional<Error> failure;
     std::optional<Data> own =
         PVAssetMetadataInspector::coverImageDataForAssetAtURL_error(url, &failure);
-    if (url && isBook(*url) && !(own && isImage(*own))) {
+    if (PVAssetMetadata::isBookURL(url) && !(own && isImage(*own))) {
         if (auto cover = CoverSearch(*url).run())
             return cover;
     }

@@ -1,5 +1,6 @@
 # Completion of parvel(1) for bash.
 
+# The options of a command; those before it for none.
 _parvel_options() {
     case $1 in
         '') echo '--log --version --json --help -h' ;;
@@ -72,50 +73,80 @@ _parvel_options() {
     esac
 }
 
+# What stands behind an option of a command: "file", "folder", "text" or the words it may be. Nothing
+# for an option that has no value.
+_parvel_value() {
+    case "$1 $2" in
+        *' --log') echo 'off fault error default debug' ;;
+        *' --flavor') echo 'full content-library store progress identity' ;;
+        *' --progress') echo 'auto always never json' ;;
+        *' --into' | *' --temporary') echo folder ;;
+        'edit --cover' | *' --apply' | *' --dump' | *' --existing' | *' --extra' | *' --files-from' | \
+            *' --output' | *' -o' | *' --record' | *' --records' | *' --to' | *' --updates' | \
+            *' --updating') echo file ;;
+        *' --display-name' | *' --jobs' | *' -j' | *' --key' | *' --set' | *' --size' | \
+            *' --update') echo text ;;
+    esac
+}
+
+# What an operand of a command is, by how many stand before it.
+_parvel_operand() {
+    case "$1 $2" in
+        ' 0') echo 'attributes check cloud cover doctor edit inflate inspect install match move
+            pack redact remove rename trash update' ;;
+        'cloud 0') echo 'add take replace status' ;;
+        'pack 0') echo folder ;;
+        'cover '[1-9]* | 'pack '[1-9]* | 'match '[2-9]*) echo text ;;
+        *) echo file ;;
+    esac
+}
+
+_parvel_offer() {
+    case $1 in
+        file) compopt -o default ;;
+        folder) compopt -o dirnames ;;
+        text) ;;
+        *) mapfile -t COMPREPLY < <(compgen -W "$1" -- "$2") ;;
+    esac
+}
+
 _parvel() {
-    local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
-    local command='' i
-    for ((i = 1; i < COMP_CWORD; i++)); do
-        case ${COMP_WORDS[i]} in
-            --log) ((i++)) ;;
-            -*) ;;
-            *)
-                command=${COMP_WORDS[i]}
-                break
-                ;;
-        esac
+    COMPREPLY=()
+    # A word that holds a "=" is split there; here it is whole.
+    local words=() i
+    for ((i = 1; i <= COMP_CWORD; i++)); do
+        if ((i > 1)) && [[ ${COMP_WORDS[i]} == = || ${COMP_WORDS[i - 1]} == = ]]; then
+            words[-1]+=${COMP_WORDS[i]}
+        else
+            words+=("${COMP_WORDS[i]}")
+        fi
+    done
+    local current=${words[-1]}
+    unset 'words[-1]'
+
+    local command='' operands=0 value='' options=yes word
+    for word in "${words[@]}"; do
+        if [[ -n $value ]]; then
+            value=''
+        elif [[ $word == -- ]]; then
+            options=''
+        elif [[ -n $options && $word == -* ]]; then
+            value=$(_parvel_value "$command" "$word")
+        elif [[ -z $command ]]; then
+            command=$word
+        else
+            ((operands++))
+        fi
     done
 
-    COMPREPLY=()
-    case $previous in
-        --log)
-            mapfile -t COMPREPLY < <(compgen -W 'off fault error default debug' -- "$current")
-            return
-            ;;
-        --flavor)
-            mapfile -t COMPREPLY < <(
-                compgen -W 'full content-library store progress identity' -- "$current")
-            return
-            ;;
-        --progress)
-            mapfile -t COMPREPLY < <(compgen -W 'auto always never json' -- "$current")
-            return
-            ;;
-        -j | --jobs | --set | --key | --size | --update | --display-name) return ;;
-        cloud)
-            mapfile -t COMPREPLY < <(compgen -W 'add take replace status' -- "$current")
-            return
-            ;;
-    esac
-    if [[ $current == -* ]]; then
-        mapfile -t COMPREPLY < <(compgen -W "$(_parvel_options "$command")" -- "$current")
-    elif [[ -z $command ]]; then
-        mapfile -t COMPREPLY < <(compgen -W \
-            'attributes check cloud cover doctor edit inflate inspect install match move
-                pack redact remove rename trash update' -- "$current")
+    if [[ -n $value ]]; then
+        _parvel_offer "$value" "$current"
+    elif [[ -z $options || $current != -* ]]; then
+        _parvel_offer "$(_parvel_operand "$command" "$operands")" "$current"
+    elif [[ $current == --*=* ]]; then
+        _parvel_offer "$(_parvel_value "$command" "${current%%=*}")" "${current#*=}"
     else
-        compopt -o filenames
-        mapfile -t COMPREPLY < <(compgen -f -- "$current")
+        _parvel_offer "$(_parvel_options "$command")" "$current"
     fi
 }
 

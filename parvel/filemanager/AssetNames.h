@@ -7,16 +7,17 @@
 
 namespace parvel {
 
-/// What names a record gives to the file manager. A null record gives none.
+// The names that a record gives to its item; none for a null record.
 
+/// The name that the item has; none without a URL.
 [[nodiscard]] std::optional<String> lastComponentOf(const AssetPtr& asset);
 
 /// Whether text can be the name of an item in a folder: not empty, `.` or `..`, no slash, no NUL.
 [[nodiscard]] bool isOneComponent(const String& name);
 
-/// The store ID, or else the generated ID, with the extension of the record's URL. None where that
-/// ID can't be one path component: the departure from "any text" keeps an asset within its
-/// directory.
+/// The store ID, or else the generated ID, with the extension of the record's URL, if it has one.
+/// None where that ID can't be one path component: no ID leads out of the directory that it names
+/// an asset in.
 [[nodiscard]] std::optional<String> assetIDFileName(const AssetPtr& asset);
 
 /// The title, or the item's name, without what synchronised storage does not take, cut to 254

@@ -20,7 +20,8 @@ class PVInstallAssetMetadataIOTask;
 /// Every file operation on an asset passes through here. It takes a record, which it leaves as it
 /// is, and gives a new one that says what became of the asset; none, with an error, where the
 /// operation failed. A null record, or one without URL, names no item: -1002 where nothing else is
-/// said.
+/// said. Codes below zero are those of PVParvelFoundationErrorDomain; the errors of the platform's
+/// services pass out as they are.
 ///
 /// A manager holds nothing but its two platform services, may be made freely, and is for one thread
 /// at a time. What a failed operation had completed is not undone; a file or package that the host
@@ -153,6 +154,7 @@ public:
     /// leaves it under the trash's own name. So does a display name without extension, of an item
     /// that has one. Deliberate. The record's `trashedURL` is its place.
     AssetPtr trashAsset_error(const AssetPtr& asset, ErrorOut error = nullptr);
+    /// Deletes the item for good, a folder with all that is in it; false where it can't.
     bool removeAsset_error(const AssetPtr& asset, ErrorOut error = nullptr);
     /// Moves the item aside into the directory; one of that name there fails it. The error is not
     /// written for a record without URL. Deliberate.

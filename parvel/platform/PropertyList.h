@@ -22,8 +22,9 @@ public:
                                                      ErrorOut error = nullptr) = 0;
 
     /// The XML form, keys sorted. None for a value that the form can't hold: the null marker, text
-    /// with control characters, a date outside the years 1 to 9999. Bytes of text
-    /// that are no UTF-8 are written as U+FFFD. Dates are cut to whole seconds (toward the past).
+    /// with control characters, a date outside the years 1 to 9999, and one nested deeper than 512.
+    /// Bytes of text that are no UTF-8 are written as U+FFFD. Dates are cut to whole seconds
+    /// (toward the past).
     [[nodiscard]] virtual std::optional<Data> writeXML(const Value& value) = 0;
 
     static PropertyListCodec& host();

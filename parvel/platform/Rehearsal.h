@@ -18,13 +18,13 @@ namespace parvel {
 ///
 ///     Rehearsal rehearsal;
 ///     const auto manager =
-///     PVAssetMetadataFileManager::initWithFileManager(rehearsal.fileManager());
+///         PVAssetMetadataFileManager::initWithFileManager(rehearsal.fileManager());
 ///     manager->setFileCoordinator(rehearsal.fileCoordinator());
 ///
 /// What only the act itself would tell stays unforeseen: a competitor, a failing disk. Nothing is
-/// downloaded, and what would have to be counts as not coming. A file's
-/// content is read where it lies, so an item that only would have been moved is to be inspected at
-/// its old place. One at a time in a process; its services may be called from any thread.
+/// downloaded, and what would have to be counts as not coming. A file's content is read where it
+/// lies, so an item that only would have been moved is to be inspected at its old place. One at a
+/// time in a process; its services may be called from any thread.
 class PV_EXPORT Rehearsal {
 public:
     Rehearsal();

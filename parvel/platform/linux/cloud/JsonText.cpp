@@ -6,28 +6,14 @@
 #include <utility>
 #include <vector>
 
+#include "parvel/platform/TextRules.h"
+
 namespace parvel::host {
 
 namespace {
 
 constexpr int kDeepest = 32;
 constexpr int kMostValues = 200'000;
-
-void appendUtf8(char32_t character, std::string& out) {
-    const auto continuation = [character](int shift) {
-        return static_cast<char>(0x80 | (character >> shift & 0x3F));
-    };
-    if (character < 0x80) {
-        out.push_back(static_cast<char>(character));
-    } else if (character < 0x800) {
-        out.append({static_cast<char>(0xC0 | character >> 6), continuation(0)});
-    } else if (character < 0x10000) {
-        out.append({static_cast<char>(0xE0 | character >> 12), continuation(6), continuation(0)});
-    } else {
-        out.append({static_cast<char>(0xF0 | character >> 18), continuation(12), continuation(6),
-                    continuation(0)});
-    }
-}
 
 bool isControl(char character) {
     return static_cast<unsigned char>(character) < 0x20;
@@ -161,13 +147,13 @@ private:
         if (!unit || (*unit >= 0xDC00 && *unit <= 0xDFFF))
             return false;
         if (*unit < 0xD800 || *unit > 0xDBFF) {
-            appendUtf8(*unit, text);
+            appendUTF8(text, *unit);
             return true;
         }
         const std::optional<char32_t> low = takeWord("\\u") ? readHexUnit() : std::nullopt;
         if (!low || *low < 0xDC00 || *low > 0xDFFF)
             return false;
-        appendUtf8(0x10000 + ((*unit & 0x3FF) << 10 | (*low & 0x3FF)), text);
+        appendUTF8(text, 0x10000 + ((*unit & 0x3FF) << 10 | (*low & 0x3FF)));
         return true;
     }
 

@@ -17,6 +17,7 @@
 #include "parvel/platform/FileCoordinator.h"
 #include "parvel/platform/Service.h"
 #include "parvel/platform/linux/FileDescriptor.h"
+#include "parvel/platform/linux/ItemTree.h"
 #include "parvel/platform/linux/Paths.h"
 #include "parvel/platform/linux/SystemCall.h"
 
@@ -89,10 +90,8 @@ std::string hexSHA256(std::string_view text) {
 /// One name an item, by whatever links its folder is reached.
 std::string lockName(const URL& url) {
     const std::string folder = host::parentFolderOf(url.path());
-    char* real = ::realpath(folder.c_str(), nullptr);
-    const std::string key = pathAppending(real ? real : folder, url.lastPathComponent());
-    ::free(real);
-    return hexSHA256(key);
+    return hexSHA256(
+        pathAppending(host::canonicalPath(folder).value_or(folder), url.lastPathComponent()));
 }
 
 std::string readNote(int lock) {
@@ -133,8 +132,7 @@ FileDescriptor lockFile(const std::string& path, bool& hasWaited) {
         if (::fstat(file.get(), &locked) != 0)
             return {};
         // A lock on a file that was cleared away meanwhile guards nothing.
-        if (::lstat(path.c_str(), &named) == 0 && named.st_ino == locked.st_ino &&
-            named.st_dev == locked.st_dev)
+        if (::lstat(path.c_str(), &named) == 0 && host::isSameItem(named, locked))
             return file;
     }
 }

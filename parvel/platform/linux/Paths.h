@@ -1,8 +1,12 @@
 #pragma once
 
+#include <stdlib.h>
 #include <sys/stat.h>
 
+#include <memory>
+#include <optional>
 #include <string>
+#include <string_view>
 
 #include "parvel/foundation/URL.h"
 
@@ -12,6 +16,13 @@ namespace parvel::host {
 inline std::string parentFolderOf(const std::string& path) {
     const std::string_view parent = pathWithoutLastComponent(path);
     return parent.empty() ? std::string(path.starts_with('/') ? "/" : ".") : std::string(parent);
+}
+
+/// The absolute path with every link on it resolved; none, with errno set, where nothing stands.
+inline std::optional<std::string> canonicalPath(const std::string& path) {
+    const std::unique_ptr<char, void (*)(void*)> canonical(::realpath(path.c_str(), nullptr),
+                                                           &::free);
+    return canonical ? std::optional<std::string>(canonical.get()) : std::nullopt;
 }
 
 /// Whether anything stands at the path, a dangling link included.

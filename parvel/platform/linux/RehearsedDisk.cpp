@@ -3,8 +3,6 @@
 #include <sys/stat.h>
 
 #include <cerrno>
-#include <cstdlib>
-#include <memory>
 
 #include "parvel/foundation/URL.h"
 #include "parvel/platform/linux/ItemTree.h"
@@ -15,17 +13,11 @@ namespace parvel::host {
 
 namespace {
 
-std::optional<std::string> resolved(const std::string& path) {
-    const std::unique_ptr<char, void (*)(void*)> real(::realpath(path.c_str(), nullptr),
-                                                      &std::free);
-    return real ? std::optional<std::string>(real.get()) : std::nullopt;
-}
-
 /// The path with its folder's links resolved, as far as the folder is there.
 std::string keyOf(const std::string& path) {
     const std::string folder = parentFolderOf(path);
-    if (const auto real = resolved(folder))
-        return pathAppending(*real, lastComponentOfPath(path));
+    if (const auto canonical = canonicalPath(folder))
+        return pathAppending(*canonical, lastComponentOfPath(path));
     if (folder == path)
         return path;
     return pathAppending(keyOf(folder), lastComponentOfPath(path));
@@ -302,7 +294,7 @@ std::string RehearsedDisk::attributeKey(const std::string& path) const {
     struct stat status {};
     if (entry.kind == Kind::Real && ::lstat(entry.real.c_str(), &status) == 0 &&
         S_ISLNK(status.st_mode))
-        return resolved(entry.real).value_or(key);
+        return canonicalPath(entry.real).value_or(key);
     return key;
 }
 

@@ -1,13 +1,14 @@
 #include "parvel/platform/ResourceQueries.h"
 
 #include <fcntl.h>
-#include <stdlib.h>
 #include <sys/stat.h>
 
-#include <memory>
 #include <string>
+#include <utility>
 
 #include "parvel/platform/linux/FileDescriptor.h"
+#include "parvel/platform/linux/ItemTree.h"
+#include "parvel/platform/linux/Paths.h"
 #include "parvel/platform/linux/SystemCall.h"
 
 namespace parvel {
@@ -15,7 +16,7 @@ namespace parvel {
 namespace {
 
 /// What st_blocks counts, whatever the file system's own blocks are.
-constexpr std::uint64_t bytesPerBlock = 512;
+constexpr std::uint64_t kBytesPerBlock = 512;
 
 /// A place on disk that is held open, so that it keeps its meaning whatever is renamed.
 struct HeldPlace {
@@ -29,18 +30,15 @@ struct HeldPlace {
         return descriptor && ::fstat(descriptor.get(), &status) == 0 ? 0 : errno;
     }
     [[nodiscard]] bool isSameAs(const HeldPlace& other) const {
-        return status.st_dev == other.status.st_dev && status.st_ino == other.status.st_ino;
+        return host::isSameItem(status, other.status);
     }
 };
 
 /// The folder that holds the file which the path leads to, its links followed. 0, or the errno
 /// value.
 int openFolderOf(const std::string& path, HeldPlace& folder) {
-    const std::unique_ptr<char, decltype(&::free)> real(::realpath(path.c_str(), nullptr), &::free);
-    if (!real)
-        return errno;
-    const std::string parent(real.get(), std::string_view(real.get()).rfind('/') + 1);
-    return folder.open(AT_FDCWD, parent.c_str(), O_DIRECTORY);
+    const auto file = host::canonicalPath(path);
+    return file ? folder.open(AT_FDCWD, host::parentFolderOf(*file).c_str(), O_DIRECTORY) : errno;
 }
 
 /// Walks up from the place to the root. 0, or the errno value.
@@ -86,7 +84,7 @@ public:
         const std::optional<struct stat> status = statusOf(url, error);
         if (!status)
             return std::nullopt;
-        return static_cast<std::uint64_t>(status->st_blocks) * bytesPerBlock;
+        return static_cast<std::uint64_t>(status->st_blocks) * kBytesPerBlock;
     }
 
     std::optional<DirectoryRelationship> relationship(const URL& directory, const URL& item,

@@ -81,12 +81,10 @@ std::vector<TrashFolder> volumeTrashes(const std::string& topDirectory) {
 
 /// The item's path with its folder's links resolved: what the info file names.
 std::optional<std::string> resolvedPath(const std::string& item) {
-    const std::string parent = parentFolderOf(item);
-    const std::unique_ptr<char, void (*)(void*)> real(::realpath(parent.c_str(), nullptr),
-                                                      &std::free);
-    if (!real)
+    const auto folder = canonicalPath(parentFolderOf(item));
+    if (!folder)
         return std::nullopt;
-    return pathAppending(real.get(), lastComponentOfPath(item));
+    return pathAppending(*folder, lastComponentOfPath(item));
 }
 
 /// Where file systems are mounted, each once. To look at one that mounts itself would mount it.

@@ -1,10 +1,9 @@
 #include "parvel/platform/linux/cloud/SyncedPlace.h"
 
 #include <fcntl.h>
-#include <stdlib.h>
 
-#include <memory>
 #include <string_view>
+#include <utility>
 
 #include "parvel/platform/linux/DirectoryStream.h"
 #include "parvel/platform/linux/ItemTree.h"
@@ -45,12 +44,11 @@ std::optional<std::string> nextcloudJournalIn(int folder) {
 
 /// Names the item by its folder's real path; the root lies that many levels above that folder.
 bool setItem(SyncedPlace& place, const std::string& path, int levels) {
-    const std::unique_ptr<char, void (*)(void*)> real(
-        ::realpath(parentFolderOf(path).c_str(), nullptr), &::free);
-    if (!real)
+    auto folder = canonicalPath(parentFolderOf(path));
+    if (!folder)
         return false;
     SyncedItem& item = place.item;
-    item.root = real.get();
+    item.root = std::move(*folder);
     item.relative = lastComponentOfPath(path);
     for (; levels > 0; --levels) {
         item.relative = std::string(lastComponentOfPath(item.root)) + "/" + item.relative;
@@ -135,12 +133,12 @@ std::optional<SyncedPlace> desktopPlaceOf(const std::string& path,
 }
 
 std::optional<std::string> markedRootAbove(const std::string& folder) {
-    const std::unique_ptr<char, void (*)(void*)> real(::realpath(folder.c_str(), nullptr), &::free);
     const Marks marks;
     std::optional<std::string> root;
     std::string name;
     struct stat status {};
-    for (std::string path = real ? real.get() : "/"; path != "/"; path = parentFolderOf(path)) {
+    for (std::string path = canonicalPath(folder).value_or("/"); path != "/";
+         path = parentFolderOf(path)) {
         const FileDescriptor opened = openFolder(AT_FDCWD, path.c_str(), O_PATH);
         if (opened && ::fstat(opened.get(), &status) == 0 &&
             marks.markOf(opened.get(), status, name) != SyncMark::None)

@@ -1,17 +1,16 @@
-#include <dirent.h>
+#include "parvel/platform/DirectoryEnumerator.h"
+
 #include <fcntl.h>
 #include <sys/stat.h>
 
-#include <memory>
+#include <utility>
 
-#include "parvel/platform/DirectoryEnumerator.h"
-#include "parvel/platform/linux/FileDescriptor.h"
+#include "parvel/platform/linux/DirectoryStream.h"
+#include "parvel/platform/linux/OpenFolder.h"
 
 namespace parvel {
 
 namespace {
-
-using host::FileDescriptor;
 
 constexpr int kMaximumEnumeratedDepth = 400;
 
@@ -45,23 +44,17 @@ private:
     bool m_isKnown;
 };
 
-void enumerateFolder(FileDescriptor folder, int depth,
+void enumerateFolder(host::FileDescriptor folder, int depth,
                      const std::function<void(const DirectoryEnumerator::Entry&)>& visit) {
-    DIR* opened = folder ? ::fdopendir(folder.get()) : nullptr;
-    if (!opened)
-        return;
-    (void)folder.release();
-    const std::unique_ptr<DIR, int (*)(DIR*)> listing(opened, &::closedir);
-    const int descriptor = ::dirfd(opened);
-    while (const dirent* found = ::readdir(opened)) {
-        if (found->d_name[0] == '.')
+    host::DirectoryStream entries(std::move(folder));
+    while (const dirent* listed = entries.isOpen() ? entries.next() : nullptr) {
+        if (listed->d_name[0] == '.')
             continue;
-        const EnumeratedEntry entry(descriptor, *found);
+        const EnumeratedEntry entry(entries.descriptor(), *listed);
         visit(entry);
         if (entry.isDirectory() == true && depth < kMaximumEnumeratedDepth)
             enumerateFolder(
-                FileDescriptor(::openat(descriptor, found->d_name,
-                                        O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC)),
+                host::openFolder(entries.descriptor(), listed->d_name, O_RDONLY | O_NOFOLLOW),
                 depth + 1, visit);
     }
 }
@@ -71,9 +64,7 @@ public:
     void enumerate(const URL& directory, const std::function<void(const Entry&)>& visit) override {
         if (!directory.isFileURL())
             return;
-        enumerateFolder(
-            FileDescriptor(::open(directory.path().c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC)), 0,
-            visit);
+        enumerateFolder(host::openFolder(AT_FDCWD, directory.path().c_str(), O_RDONLY), 0, visit);
     }
 };
 

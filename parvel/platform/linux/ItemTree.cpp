@@ -1,20 +1,19 @@
 #include "parvel/platform/linux/ItemTree.h"
 
-#include <dirent.h>
 #include <fcntl.h>
 
 #include <array>
 #include <climits>
-#include <memory>
 #include <optional>
-#include <string_view>
+#include <utility>
 #include <vector>
 
-#include "parvel/foundation/URL.h"
+#include "parvel/platform/linux/DirectoryStream.h"
 #include "parvel/platform/linux/FileDescriptor.h"
 #include "parvel/platform/linux/HiddenItem.h"
 #include "parvel/platform/linux/ItemContent.h"
-#include "parvel/platform/linux/Paths.h"
+#include "parvel/platform/linux/OpenFolder.h"
+#include "parvel/platform/linux/SystemCall.h"
 
 namespace parvel::host {
 
@@ -22,32 +21,10 @@ namespace {
 
 constexpr int kMaximumDepth = 200;  // three descriptors a level
 
-int lastError() {
-    return errno;
-}
-
-using Listing = std::unique_ptr<DIR, int (*)(DIR*)>;
-
-/// A listing over a descriptor of its own; null with errno set.
-Listing listFolder(int folder) {
-    FileDescriptor own(::openat(folder, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-    DIR* listing = own ? ::fdopendir(own.get()) : nullptr;
-    if (listing)
-        (void)own.release();
-    return {listing, &::closedir};
-}
-
-/// The next entry's name but `.` and `..`; none at the end or, with errno not 0, after a failure.
-const char* nextName(DIR* listing) {
-    for (;;) {
-        errno = 0;
-        const dirent* entry = ::readdir(listing);
-        if (!entry)
-            return nullptr;
-        const std::string_view name = entry->d_name;
-        if (name != "." && name != "..")
-            return entry->d_name;
-    }
+/// Opens a file or folder, and waits for nobody; none, with errno set, for a link.
+FileDescriptor openItem(int folder, const char* name) {
+    return FileDescriptor(retried(
+        [&] { return ::openat(folder, name, O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC); }));
 }
 
 // Copying
@@ -56,7 +33,7 @@ int copyFile(int from, const struct stat& status, int toFolder, const char* name
     FileDescriptor to(
         ::openat(toFolder, name, O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600));
     if (!to)
-        return lastError();
+        return errno;
     if (const int error = copyContent(from, to.get(), static_cast<std::uint64_t>(status.st_size)))
         return error;
     if (const int error = copyAttributes(from, to.get(), /*onlyMissing=*/false))
@@ -87,15 +64,14 @@ int copyFolder(int from, const struct stat& status, int toFolder, const char* na
         return ELOOP;
     if (::mkdirat(toFolder, name, 0700) != 0)
         return errno;
-    const FileDescriptor to(
-        ::openat(toFolder, name, O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+    const FileDescriptor to = openFolder(toFolder, name, O_RDONLY | O_NOFOLLOW);
     if (!to)
-        return lastError();
-    const Listing listing = listFolder(from);
-    if (!listing)
-        return lastError();
-    while (const char* entry = nextName(listing.get())) {
-        if (const int error = copyEntry(from, entry, to.get(), entry, depth + 1))
+        return errno;
+    DirectoryStream entries(openFolder(from, ".", O_RDONLY));
+    if (!entries.isOpen())
+        return errno;
+    while (const dirent* entry = entries.next()) {
+        if (const int error = copyEntry(from, entry->d_name, to.get(), entry->d_name, depth + 1))
             return error;
     }
     if (errno != 0)
@@ -113,10 +89,9 @@ int copyEntry(int fromFolder, const char* fromName, int toFolder, const char* to
         return copyLink(fromFolder, fromName, status, toFolder, toName);
     if (!S_ISREG(status.st_mode) && !S_ISDIR(status.st_mode))
         return EOPNOTSUPP;
-    const FileDescriptor from(
-        ::openat(fromFolder, fromName, O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
+    const FileDescriptor from = openItem(fromFolder, fromName);
     if (!from || ::fstat(from.get(), &status) != 0)
-        return lastError();
+        return errno;
     if (S_ISDIR(status.st_mode))
         return copyFolder(from.get(), status, toFolder, toName, depth);
     return S_ISREG(status.st_mode) ? copyFile(from.get(), status, toFolder, toName) : EOPNOTSUPP;
@@ -134,7 +109,7 @@ struct Descent {
 
 /// Steps back up to the folder that the descent came from; closed when that is another folder now.
 FileDescriptor folderAbove(int folder, const struct stat& expected) {
-    FileDescriptor above(::openat(folder, "..", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    FileDescriptor above = openFolder(folder, "..", O_RDONLY);
     struct stat status {};
     if (above && ::fstat(above.get(), &status) == 0 && !isSameItem(status, expected)) {
         errno = ENOENT;
@@ -163,8 +138,7 @@ int unlinkEntry(int folder, const char* name, int flags) {
 /// Opens a folder on the way down, made readable and searchable first where it is our own and was
 /// not; then `oldMode` is the mode that it had.
 FileDescriptor openForRemoval(int folder, const char* name, std::optional<mode_t>& oldMode) {
-    const int flags = O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
-    FileDescriptor below(::openat(folder, name, flags));
+    FileDescriptor below = openFolder(folder, name, O_RDONLY | O_NOFOLLOW);
     struct stat status {};
     const bool isUsable = below && ::faccessat(below.get(), ".", X_OK, AT_EACCESS) == 0;
     if (isUsable || errno != EACCES)
@@ -175,7 +149,7 @@ FileDescriptor openForRemoval(int folder, const char* name, std::optional<mode_t
         return {};
     }
     oldMode = status.st_mode & ALLPERMS;
-    below = FileDescriptor(::openat(folder, name, flags));
+    below = openFolder(folder, name, O_RDONLY | O_NOFOLLOW);
     if (!below) {
         const int error = errno;
         (void)::fchmodat(folder, name, *oldMode, AT_SYMLINK_NOFOLLOW);
@@ -199,10 +173,11 @@ void closeAgain(FileDescriptor folder, std::vector<Descent>& path) {
 /// Removes the entries of the folder up to one that is a folder itself, which is then the last of
 /// the path; at the end of the listing the path stays as it is.
 int removeEntries(FileDescriptor& folder, std::vector<Descent>& path, bool& removedAny) {
-    const Listing listing = listFolder(folder.get());
-    if (!listing)
-        return lastError();
-    while (const char* name = nextName(listing.get())) {
+    DirectoryStream entries(openFolder(folder.get(), ".", O_RDONLY));
+    if (!entries.isOpen())
+        return errno;
+    while (const dirent* entry = entries.next()) {
+        const char* name = entry->d_name;
         const int error = unlinkEntry(folder.get(), name, 0);
         if (error == 0) {
             removedAny = true;
@@ -236,7 +211,7 @@ int emptyFolder(FileDescriptor folder, bool& removedAny) {
             return 0;
         FileDescriptor above = folderAbove(folder.get(), path.back().above);
         if (!above) {
-            error = lastError();
+            error = errno;
             break;
         }
         folder = std::move(above);
@@ -266,7 +241,7 @@ int removeTree(const std::string& path, bool* removedAny) {
         return ::unlink(path.c_str()) == 0 ? 0 : errno;
     std::optional<mode_t> oldMode;
     FileDescriptor folder = openForRemoval(AT_FDCWD, path.c_str(), oldMode);
-    int error = folder ? emptyFolder(std::move(folder), any) : lastError();
+    int error = folder ? emptyFolder(std::move(folder), any) : errno;
     if (error == 0 && ::rmdir(path.c_str()) != 0)
         error = errno;
     if (error != 0 && !any && oldMode)
@@ -302,7 +277,7 @@ int syncItem(const std::string& path) {
         return errno;
     if (!S_ISREG(status.st_mode) && !S_ISDIR(status.st_mode))
         return 0;
-    const FileDescriptor item(::open(path.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
+    const FileDescriptor item = openItem(AT_FDCWD, path.c_str());
     if (!item)
         return errno == EACCES ? 0 : errno;  // a file that its owner may not read syncs by itself
     const int result = S_ISDIR(status.st_mode) ? ::syncfs(item.get()) : ::fsync(item.get());
@@ -310,17 +285,15 @@ int syncItem(const std::string& path) {
 }
 
 int syncFolder(const std::string& path) {
-    const FileDescriptor folder(
-        ::open(path.empty() ? "." : path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    const FileDescriptor folder = openFolder(AT_FDCWD, path.empty() ? "." : path.c_str(), O_RDONLY);
     if (!folder)
         return errno == EACCES ? 0 : errno;
     return ::fsync(folder.get()) == 0 || errno == EINVAL || errno == ENOSYS ? 0 : errno;
 }
 
 bool hasToInherit(const std::string& oldItem, const std::string& newItem) {
-    const int flags = O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
-    const FileDescriptor from(::open(oldItem.c_str(), flags));
-    const FileDescriptor to(::open(newItem.c_str(), flags));
+    const FileDescriptor from = openItem(AT_FDCWD, oldItem.c_str());
+    const FileDescriptor to = openItem(AT_FDCWD, newItem.c_str());
     struct stat oldStatus {};
     struct stat newStatus {};
     if (!from || !to || ::fstat(from.get(), &oldStatus) != 0 || ::fstat(to.get(), &newStatus) != 0)
@@ -332,9 +305,8 @@ bool hasToInherit(const std::string& oldItem, const std::string& newItem) {
 }
 
 int inheritMetadata(const std::string& oldItem, const std::string& newItem) {
-    const int flags = O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
-    const FileDescriptor from(::open(oldItem.c_str(), flags));
-    const FileDescriptor to(::open(newItem.c_str(), flags));
+    const FileDescriptor from = openItem(AT_FDCWD, oldItem.c_str());
+    const FileDescriptor to = openItem(AT_FDCWD, newItem.c_str());
     struct stat oldStatus {};
     struct stat newStatus {};
     if (!from || !to)

@@ -7,14 +7,17 @@
 
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
+
+#include "parvel/platform/linux/SystemCall.h"
 
 namespace parvel::host {
 
 namespace {
 
 /// A rename anywhere may disturb the kernel's walk over "..", which then asks to be called again.
-constexpr int openAttempts = 64;
+constexpr int kOpenAttempts = 64;
 
 FileDescriptor refused(int errnoValue) {
     errno = errnoValue;
@@ -28,7 +31,8 @@ bool isLinkAt(int directory, const char* name) {
 
 /// Opens one component that is neither "." nor "..".
 FileDescriptor openComponent(int directory, const std::string& name, int flags) {
-    FileDescriptor opened(::openat(directory, name.c_str(), flags | O_NOFOLLOW | O_CLOEXEC));
+    FileDescriptor opened(
+        retried([&] { return ::openat(directory, name.c_str(), flags | O_NOFOLLOW | O_CLOEXEC); }));
     if (!opened && errno == ENOTDIR)
         errno = isLinkAt(directory, name.c_str()) ? ELOOP : ENOTDIR;
     return opened;
@@ -53,7 +57,7 @@ FileDescriptor openBeneath(int directory, const char* path, int flags) {
     open_how how = {};
     how.flags = static_cast<unsigned>(flags | O_CLOEXEC);
     how.resolve = RESOLVE_BENEATH | RESOLVE_NO_SYMLINKS | RESOLVE_NO_MAGICLINKS;
-    for (int attempt = 0; attempt < openAttempts; ++attempt) {
+    for (int attempt = 0; attempt < kOpenAttempts; ++attempt) {
         FileDescriptor opened(
             static_cast<int>(::syscall(SYS_openat2, directory, path, &how, sizeof how)));
         if (opened)
@@ -98,7 +102,7 @@ FileDescriptor openBeneathByComponents(int directory, const char* path, int flag
     if (last == "..")
         way.pop_back();
     if (last == "." || last == "..")
-        return FileDescriptor(::openat(here(), ".", flags | O_CLOEXEC));
+        return FileDescriptor(retried([&] { return ::openat(here(), ".", flags | O_CLOEXEC); }));
     return openComponent(here(), last, flags);
 }
 

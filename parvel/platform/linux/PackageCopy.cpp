@@ -15,6 +15,8 @@
 #include "parvel/platform/linux/FileDescriptor.h"
 #include "parvel/platform/linux/ItemContent.h"
 #include "parvel/platform/linux/ItemTree.h"
+#include "parvel/platform/linux/OpenFolder.h"
+#include "parvel/platform/linux/SystemCall.h"
 #include "parvel/platform/linux/WriteBehind.h"
 
 namespace parvel::host {
@@ -24,7 +26,7 @@ namespace {
 constexpr int kDeepestFolder = 200;  // two descriptors a level
 
 FileDescriptor openFolderIn(int folder, const char* name) {
-    return FileDescriptor(::openat(folder, name, O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+    return openFolder(folder, name, O_RDONLY | O_NOFOLLOW);
 }
 
 void countFolder(FileDescriptor folder, int depth, const CopierReports& reports,
@@ -129,8 +131,10 @@ private:
     }
 
     int copyFile(const Item& item) {
-        const FileDescriptor from(::openat(
-            item.fromFolder, item.name, O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY | O_CLOEXEC));
+        const FileDescriptor from(retried([&] {
+            return ::openat(item.fromFolder, item.name,
+                            O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY | O_CLOEXEC);
+        }));
         struct stat status {};
         if (!from || ::fstat(from.get(), &status) != 0)
             return m_reports.failed(item.path, errno);
@@ -201,14 +205,13 @@ bool linkStaysInside(const std::string& target, int depth) {
 
 ArchiveCopier::Count countPackage(const std::string& folder, const CopierReports& reports) {
     ArchiveCopier::Count count;
-    countFolder(FileDescriptor(::open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC)), 0,
-                reports, count);
+    countFolder(openFolder(AT_FDCWD, folder.c_str(), O_RDONLY), 0, reports, count);
     return count;
 }
 
 int copyPackage(const std::string& source, const std::string& destination,
                 const CopierReports& reports) {
-    FileDescriptor from(::open(source.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    FileDescriptor from = openFolder(AT_FDCWD, source.c_str(), O_RDONLY);
     struct stat status {};
     if (!from || ::fstat(from.get(), &status) != 0)
         return reports.fatal(errno);

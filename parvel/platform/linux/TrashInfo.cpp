@@ -4,6 +4,7 @@
 #include <sys/stat.h>
 #include <time.h>
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <climits>

@@ -1,14 +1,15 @@
 #include "parvel/platform/TrashedItems.h"
 
-#include <dirent.h>
+#include <fcntl.h>
 #include <sys/stat.h>
 
 #include <algorithm>
 #include <cstdint>
-#include <memory>
 #include <string_view>
 #include <tuple>
 
+#include "parvel/platform/linux/DirectoryStream.h"
+#include "parvel/platform/linux/OpenFolder.h"
 #include "parvel/platform/linux/Paths.h"
 #include "parvel/platform/linux/TrashFolders.h"
 #include "parvel/platform/linux/TrashInfo.h"
@@ -32,15 +33,13 @@ struct Found {
 };
 
 void appendItemsOf(const host::TrashFolder& trash, std::vector<Found>& items) {
-    const std::unique_ptr<DIR, int (*)(DIR*)> listing(::opendir(trash.infoFolder().c_str()),
-                                                      &::closedir);
-    if (!listing)
-        return;
-    while (const dirent* entry = ::readdir(listing.get())) {
+    const std::string folder = trash.infoFolder();
+    host::DirectoryStream entries(host::openFolder(AT_FDCWD, folder.c_str(), O_RDONLY));
+    while (const dirent* entry = entries.isOpen() ? entries.next() : nullptr) {
         std::string_view name = entry->d_name;
         if (!name.ends_with(kInfoExtension))
             continue;
-        const std::string file = pathAppending(trash.infoFolder(), name);
+        const std::string file = pathAppending(folder, name);
         const auto info = host::readTrashInfo(file, trash);
         name.remove_suffix(kInfoExtension.size());
         const std::string place = pathAppending(trash.filesFolder(), name);

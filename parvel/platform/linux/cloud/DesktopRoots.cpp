@@ -14,6 +14,7 @@
 #include "parvel/foundation/URL.h"
 #include "parvel/platform/linux/DirectoryStream.h"
 #include "parvel/platform/linux/ItemTree.h"
+#include "parvel/platform/linux/OpenFolder.h"
 #include "parvel/platform/linux/SystemCall.h"
 
 namespace parvel::host {
@@ -80,8 +81,7 @@ std::optional<Provider> parsedProvider(std::string_view text) {
 }
 
 void addProvidersIn(const std::string& folder, std::set<Provider>& providers) {
-    DirectoryStream entries(FileDescriptor(
-        retried([&] { return ::open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC); })));
+    DirectoryStream entries(openFolder(AT_FDCWD, folder.c_str(), O_RDONLY));
     if (!entries.isOpen())
         return;
     std::size_t files = 0;

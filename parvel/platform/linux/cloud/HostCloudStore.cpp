@@ -1,8 +1,10 @@
-#include "parvel/platform/CloudStore.h"
+#include "parvel/platform/linux/cloud/HostCloudStore.h"
 
+#include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -11,8 +13,8 @@
 #include "parvel/platform/linux/DirectoryStream.h"
 #include "parvel/platform/linux/ItemTree.h"
 #include "parvel/platform/linux/OpenFolder.h"
+#include "parvel/platform/linux/SystemCall.h"
 #include "parvel/platform/linux/cloud/DesktopRoots.h"
-#include "parvel/platform/linux/cloud/HostCloudStore.h"
 
 namespace parvel {
 
@@ -20,8 +22,8 @@ namespace {
 
 /// A package with more entries or levels than these is taken for one that is not all there, as one
 /// that can't be looked through: nobody reads its content then.
-constexpr int mostEntries = 100'000;
-constexpr int mostLevels = 64;
+constexpr int kMostEntries = 100'000;
+constexpr int kMostLevels = 64;
 
 /// Whether a file of that name stands for another that is still to come: Nextcloud's placeholder,
 /// or what Syncthing has of a file that is on its way.
@@ -65,10 +67,10 @@ std::string placeholderPath(const std::string& path) {
 bool hasAllContent(const std::string& path) {
     if (!isThere(path))
         return false;
-    int entriesLeft = mostEntries;
+    int entriesLeft = kMostEntries;
     auto folder = host::openFolder(AT_FDCWD, path.c_str(), O_RDONLY);
     const bool isNoFolder = !folder && errno == ENOTDIR;
-    return isNoFolder || !holdsStandIn(std::move(folder), mostLevels, entriesLeft);
+    return isNoFolder || !holdsStandIn(std::move(folder), kMostLevels, entriesLeft);
 }
 
 std::string parentPath(const URL& url) {

@@ -7,6 +7,7 @@
 #include "parvel/foundation/PVParvelLog.h"
 #include "parvel/inspection/_PVxPubMetadataInspector.h"
 #include "parvel/metadata/PVMutableAssetMetadata.h"
+#include "parvel/platform/HeldItem.h"
 #include "parvel/platform/MalformedInput.h"
 #include "parvel/platform/ResourceQueries.h"
 #include "parvel/platform/Service.h"
@@ -80,6 +81,9 @@ AssetPtr PVAssetMetadataInspector::_metadataForAssetAtURL_includeCover_error(
     PVParvelLog().debug("Getting metadata: %@", url);
     AssetPtr asset;
     std::optional<Error> failure;
+    std::optional<HeldItem> held;
+    if (url && PVAssetMetadata::assetTypeForAssetAtURL(*url) != PVAssetTypeUnknown)
+        held.emplace(*url);
 
     if (!url) {
         PVParvelLog().info("URL is nil");

@@ -3,6 +3,7 @@
 #include "parvel/foundation/PVParvelLog.h"
 #include "parvel/inspection/PVAssetMetadataInspector.h"
 #include "parvel/platform/FileReader.h"
+#include "parvel/platform/HeldItem.h"
 #include "parvel/platform/ResourceQueries.h"
 #include "parvel/platform/Service.h"
 #include "parvel/platform/ZipArchive.h"
@@ -41,6 +42,9 @@ std::optional<Data> storeArtwork(const std::optional<URL>& url) {
 
 std::optional<Data> PVAssetMetadataInspector::coverImageDataForAssetAtURL_error(
     const std::optional<URL>& url, ErrorOut error) {
+    std::optional<HeldItem> held;
+    if (url)
+        held.emplace(*url);
     std::optional<Data> artwork = storeArtwork(url);
     if (artwork && !artwork->empty())
         return artwork;

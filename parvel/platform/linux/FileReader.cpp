@@ -7,8 +7,10 @@
 #include <cstring>
 #include <string>
 
+#include "parvel/platform/HeldItem.h"
 #include "parvel/platform/linux/FileDescriptor.h"
 #include "parvel/platform/linux/OpenBeneath.h"
+#include "parvel/platform/linux/OpenItem.h"
 #include "parvel/platform/linux/SystemCall.h"
 
 namespace parvel {
@@ -34,14 +36,14 @@ struct ReadBuffer {
     }
 };
 
-/// Reads to the end. 0, or the errno value; EBADMSG when there is more than the limit.
+/// Reads a regular file to the end. 0, or the errno value; EBADMSG when there is more than the
+/// limit.
 int readToEnd(int descriptor, std::uint64_t expected, std::uint64_t limit, ReadBuffer& buffer) {
     buffer.grow(std::max(expected, std::min(firstPiece, limit)) + 1);
     for (;;) {
-        const ssize_t count = host::retried([&] {
-            return ::read(descriptor, buffer.bytes.get() + buffer.size,
-                          buffer.capacity - buffer.size);
-        });
+        const std::size_t room = buffer.capacity - buffer.size;
+        const ssize_t count = host::retried(
+            [&] { return ::read(descriptor, buffer.bytes.get() + buffer.size, room); });
         if (count < 0)
             return errno;
         if (count == 0)
@@ -49,6 +51,9 @@ int readToEnd(int descriptor, std::uint64_t expected, std::uint64_t limit, ReadB
         buffer.size += static_cast<std::size_t>(count);
         if (buffer.size > limit)
             return EBADMSG;
+        // A short read that ends where the file is known to end needs no second one.
+        if (buffer.size == expected && static_cast<std::size_t>(count) < room)
+            return 0;
         if (buffer.size == buffer.capacity)
             buffer.grow(std::min<std::uint64_t>(buffer.size, limit - buffer.size) + buffer.size +
                         1);
@@ -87,6 +92,23 @@ int memberErrno(int errnoValue) {
     return fileErrno(errnoValue);
 }
 
+/// The folder whose members are read, as it is held, or opened for one read.
+class PackageFolder {
+public:
+    explicit PackageFolder(const std::string& path) : m_held(HeldItem::at(path)) {
+        if (!m_held)
+            m_opened = host::FileDescriptor(host::retried(
+                [&] { return ::open(path.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC); }));
+    }
+
+    [[nodiscard]] bool isOpen() const { return m_held || m_opened; }
+    [[nodiscard]] int get() const { return (m_held ? m_held->descriptor : m_opened).get(); }
+
+private:
+    const std::shared_ptr<const host::OpenItem>& m_held;
+    host::FileDescriptor m_opened;
+};
+
 class HostFileReader final : public FileReader {
 public:
     std::optional<Data> readFile(const URL& url, std::uint64_t limit, ErrorOut error) override {
@@ -118,10 +140,9 @@ private:
         errnoValue = ENOENT;
         if (!package.isFileURL())
             return std::nullopt;
-        const host::FileDescriptor folder(host::retried(
-            [&] { return ::open(package.path().c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC); }));
+        const PackageFolder folder(package.path());
         errnoValue = errno;
-        if (!folder)
+        if (!folder.isOpen())
             return std::nullopt;
 
         if (path.starts_with('/'))

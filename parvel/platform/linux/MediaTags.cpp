@@ -2,8 +2,6 @@
 // value in the item's first "data" atom. Only atom heads are read on the way there, through a small
 // window.
 
-#include <fcntl.h>
-#include <sys/stat.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -14,14 +12,12 @@
 
 #include "parvel/platform/MediaTags.h"
 #include "parvel/platform/TextRules.h"
-#include "parvel/platform/linux/FileDescriptor.h"
+#include "parvel/platform/linux/OpenItem.h"
 #include "parvel/platform/linux/SystemCall.h"
 
 namespace parvel {
 
 namespace {
-
-using host::FileDescriptor;
 
 constexpr std::uint64_t kTextLimit = 1ULL << 20;
 /// Titles and names are shorter.
@@ -72,9 +68,11 @@ std::optional<std::string> utf8FromUTF16(const std::string& bytes) {
 /// A file seen through a window that grows while it is read in order.
 class WindowedFile {
 public:
-    WindowedFile(FileDescriptor file, std::uint64_t size) : m_file(std::move(file)), m_size(size) {}
+    explicit WindowedFile(std::shared_ptr<const host::OpenItem> file) : m_file(std::move(file)) {}
 
-    [[nodiscard]] std::uint64_t size() const { return m_size; }
+    [[nodiscard]] std::uint64_t size() const {
+        return static_cast<std::uint64_t>(m_file->status.st_size);
+    }
 
     /// `length` bytes at an offset, at most a window's; null when the file has no such bytes. Good
     /// until the next call.
@@ -88,7 +86,7 @@ public:
     [[nodiscard]] bool read(std::uint64_t offset, std::uint8_t* bytes, std::uint64_t length) const {
         for (std::uint64_t at = 0; at < length;) {
             const ssize_t got = host::retried([&] {
-                return ::pread(m_file.get(), bytes + at, length - at,
+                return ::pread(m_file->descriptor.get(), bytes + at, length - at,
                                static_cast<off_t>(offset + at));
             });
             if (got <= 0)
@@ -113,13 +111,13 @@ private:
         }
         m_start = offset;
         const ssize_t got = host::retried([&] {
-            return ::pread(m_file.get(), m_window.get(), wanted, static_cast<off_t>(offset));
+            return ::pread(m_file->descriptor.get(), m_window.get(), wanted,
+                           static_cast<off_t>(offset));
         });
         m_length = got > 0 ? static_cast<std::size_t>(got) : 0;
     }
 
-    FileDescriptor m_file;
-    std::uint64_t m_size;
+    std::shared_ptr<const host::OpenItem> m_file;
     std::uint64_t m_start = 0;
     std::size_t m_length = 0;
     std::size_t m_nextWindow = kFirstWindow;
@@ -346,13 +344,10 @@ public:
     std::unique_ptr<MediaAsset> open(const URL& url) override {
         if (!url.isFileURL())
             return nullptr;
-        FileDescriptor file(host::retried([&] {
-            return ::open(url.path().c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY);
-        }));
-        struct stat status {};
-        if (!file || ::fstat(file.get(), &status) != 0 || !S_ISREG(status.st_mode))
+        auto file = host::openItem(url.path());
+        if (!file || !S_ISREG(file->status.st_mode))
             return nullptr;
-        WindowedFile window(std::move(file), static_cast<std::uint64_t>(status.st_size));
+        WindowedFile window(std::move(file));
         if (!beginsLikeMP4(window))
             return nullptr;
         return std::make_unique<MP4Asset>(std::move(window));

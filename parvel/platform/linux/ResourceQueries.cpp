@@ -6,8 +6,10 @@
 #include <string>
 #include <utility>
 
+#include "parvel/platform/HeldItem.h"
 #include "parvel/platform/linux/FileDescriptor.h"
 #include "parvel/platform/linux/ItemTree.h"
+#include "parvel/platform/linux/OpenItem.h"
 #include "parvel/platform/linux/Paths.h"
 #include "parvel/platform/linux/SystemCall.h"
 
@@ -59,9 +61,11 @@ int findAbove(HeldPlace place, const HeldPlace& wanted, bool& found) {
 }
 
 std::optional<struct stat> statusOf(const URL& url, ErrorOut error) {
-    struct stat status;
     if (!url.isFileURL())
         return fail(error, makeServiceError(ENOENT, url));
+    if (const auto& held = HeldItem::at(url.path()))
+        return held->status;
+    struct stat status;
     if (host::retried([&] { return ::stat(url.path().c_str(), &status); }) != 0)
         return fail(error, makeServiceError(errno, url));
     return status;

@@ -8,6 +8,9 @@
 #include <cstring>
 #include <string_view>
 
+#include "parvel/platform/HeldItem.h"
+#include "parvel/platform/linux/OpenItem.h"
+
 namespace parvel {
 
 namespace {
@@ -103,12 +106,12 @@ public:
     int list(const std::string& path, std::vector<std::string>& names) override {
         names.clear();
         std::array<char, usualList> usual;
-        ssize_t length = ::listxattr(path.c_str(), usual.data(), usual.size());
+        ssize_t length = readList(path, usual.data(), usual.size());
         if (length >= 0) {
             names = userNames({usual.data(), static_cast<std::size_t>(length)});
         } else if (errno == ERANGE) {
             std::string longest(longestList, '\0');
-            length = ::listxattr(path.c_str(), longest.data(), longest.size());
+            length = readList(path, longest.data(), longest.size());
             if (length >= 0)
                 names = userNames({longest.data(), static_cast<std::size_t>(length)});
         }
@@ -116,12 +119,21 @@ public:
     }
 
 private:
+    static ssize_t readList(const std::string& path, char* buffer, std::size_t capacity) {
+        if (const auto& held = HeldItem::at(path))
+            return ::flistxattr(held->descriptor.get(), buffer, capacity);
+        return ::listxattr(path.c_str(), buffer, capacity);
+    }
+
     static int read(const std::string& path, const std::string& name, void* buffer,
                     std::size_t capacity, std::size_t& length) {
         const HostName hostName(name);
         if (hostName.errnoValue() != 0)
             return hostName.errnoValue();
-        const ssize_t result = ::getxattr(path.c_str(), hostName.text(), buffer, capacity);
+        const auto& held = HeldItem::at(path);
+        const ssize_t result =
+            held ? ::fgetxattr(held->descriptor.get(), hostName.text(), buffer, capacity)
+                 : ::getxattr(path.c_str(), hostName.text(), buffer, capacity);
         if (result < 0)
             return errno;
         length = static_cast<std::size_t>(result);

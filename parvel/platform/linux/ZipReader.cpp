@@ -1,13 +1,10 @@
-#include <fcntl.h>
-#include <sys/stat.h>
-
+#include <cerrno>
 #include <optional>
 
 #include "parvel/platform/ZipArchive.h"
-#include "parvel/platform/linux/FileDescriptor.h"
 #include "parvel/platform/linux/LibzipArchive.h"
+#include "parvel/platform/linux/OpenItem.h"
 #include "parvel/platform/linux/PlainZip.h"
-#include "parvel/platform/linux/SystemCall.h"
 
 namespace parvel {
 
@@ -17,12 +14,11 @@ namespace {
 /// then on.
 class HostZipArchive final : public ZipArchive {
 public:
-    HostZipArchive(host::FileDescriptor file, std::uint64_t size)
-        : m_file(std::move(file)), m_size(size) {}
+    explicit HostZipArchive(std::shared_ptr<const host::OpenItem> file) : m_file(std::move(file)) {}
 
     /// False when neither way makes it an archive.
     [[nodiscard]] bool open() {
-        m_plain = host::PlainZip::open(m_file.get(), m_size);
+        m_plain = host::PlainZip::open(m_file->descriptor.get(), size());
         return m_plain || openFully();
     }
 
@@ -40,12 +36,15 @@ public:
 private:
     bool openFully() {
         m_plain.reset();
-        m_full = host::LibzipArchive::open(m_file.get(), m_size);
+        m_full = host::LibzipArchive::open(m_file->descriptor.get(), size());
         return m_full != nullptr;
     }
 
-    host::FileDescriptor m_file;
-    std::uint64_t m_size;
+    [[nodiscard]] std::uint64_t size() const {
+        return static_cast<std::uint64_t>(m_file->status.st_size);
+    }
+
+    std::shared_ptr<const host::OpenItem> m_file;
     std::unique_ptr<host::PlainZip> m_plain;
     std::unique_ptr<host::LibzipArchive> m_full;
 };
@@ -55,19 +54,15 @@ public:
     std::unique_ptr<ZipArchive> open(const URL& url, ErrorOut error) override {
         if (!url.isFileURL())
             return fail(error, makeServiceError(ENOENT, url));
-        host::FileDescriptor file(host::retried([&] {
-            return ::open(url.path().c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY);
-        }));
-        struct stat status;
-        if (!file || ::fstat(file.get(), &status) != 0)
+        auto file = host::openItem(url.path());
+        if (!file)
             return fail(error, makeServiceError(errno, url));
-        if (S_ISDIR(status.st_mode))
+        if (S_ISDIR(file->status.st_mode))
             return fail(error, makeServiceError(EISDIR, url));
-        if (!S_ISREG(status.st_mode))
+        if (!S_ISREG(file->status.st_mode))
             return fail(error, makeServiceError(EBADMSG, url));
 
-        auto archive = std::make_unique<HostZipArchive>(std::move(file),
-                                                        static_cast<std::uint64_t>(status.st_size));
+        auto archive = std::make_unique<HostZipArchive>(std::move(file));
         if (!archive->open())
             return fail(error, makeServiceError(EBADMSG, url));
         return archive;

@@ -27,9 +27,10 @@ bool isContinuation(std::string_view text, std::size_t index, unsigned least = 0
     return byte >= least && byte <= most;
 }
 
-/// The length of the code point at the front (RFC 3629, table 3-7 of the Unicode standard), 0 where
-/// none begins there. The text is not empty.
-std::size_t sequenceLength(std::string_view text) {
+}  // namespace
+
+// RFC 3629; table 3-7 of the Unicode standard.
+std::size_t utf8SequenceLength(std::string_view text) {
     const auto first = static_cast<unsigned char>(text.front());
     if (first < 0x80)
         return 1;
@@ -50,6 +51,8 @@ std::size_t sequenceLength(std::string_view text) {
     return 0;
 }
 
+namespace {
+
 /// The length of the valid UTF-8 that the text begins with.
 std::size_t validStretch(std::string_view text) {
     std::size_t length = 0;
@@ -57,7 +60,7 @@ std::size_t validStretch(std::string_view text) {
         length += asciiStretch(text.substr(length));
         if (length == text.size())
             break;
-        const std::size_t sequence = sequenceLength(text.substr(length));
+        const std::size_t sequence = utf8SequenceLength(text.substr(length));
         if (sequence == 0)
             break;
         length += sequence;
@@ -120,7 +123,7 @@ std::string utf16Prefix(std::string_view text, std::size_t units) {
     std::string prefix;
     std::size_t used = 0;
     for (std::size_t at = 0; at < text.size() && used < units;) {
-        const std::size_t length = std::max<std::size_t>(sequenceLength(text.substr(at)), 1);
+        const std::size_t length = std::max<std::size_t>(utf8SequenceLength(text.substr(at)), 1);
         const std::size_t taken = length == 4 ? 2 : 1;
         if (used + taken > units)
             return prefix + "\xEF\xBF\xBD";

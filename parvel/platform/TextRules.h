@@ -24,6 +24,9 @@ public:
 
 /// Appends the character; the code point is at most U+10FFFF and no surrogate.
 void appendUTF8(std::string& text, std::uint32_t codePoint);
+/// The length in bytes of the character at the front, 0 where none begins there; the text is not
+/// empty.
+[[nodiscard]] std::size_t utf8SequenceLength(std::string_view text);
 [[nodiscard]] bool isValidUTF8(std::string_view text);
 /// The text with U+FFFD for each byte that is no part of valid UTF-8.
 [[nodiscard]] std::string withReplacedInvalidUTF8(std::string_view text);

@@ -78,11 +78,11 @@ std::string randomPath(std::mt19937& random) {
 /// What a node found says of itself: its kind, its name and its string value.
 std::string answerOf(const XmlElementTree& tree, const void* node) {
     if (const auto* element = tree.elementAt(node))
-        return "element " + std::string(reinterpret_cast<const char*>(element->name)) + " " +
+        return "element " + std::string(element->name) + " " +
                std::to_string(tree.indexOf(*element)) + " " + std::string(tree.text(*element));
     if (const auto* attribute = tree.attributeAt(node))
         return "attribute " + std::to_string(tree.indexOf(tree.ownerOf(*attribute))) + " " +
-               std::string(tree.value(*attribute));
+               std::string(attribute->value);
     return "none";
 }
 

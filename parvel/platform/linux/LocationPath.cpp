@@ -32,10 +32,6 @@ bool isPlainText(std::string_view text) {
     return std::all_of(text.begin(), text.end(), [](char c) { return c >= ' ' && c <= '~'; });
 }
 
-bool isEqual(const xmlChar* name, std::string_view expected) {
-    return expected == reinterpret_cast<const char*>(name);
-}
-
 }  // namespace
 
 class LocationPath::Reader {
@@ -132,10 +128,7 @@ public:
 
 private:
     static bool hasName(const XmlElementTree::Element& element, const Step& step) {
-        if (!isEqual(element.name, step.name))
-            return false;
-        return element.namespaceName ? isEqual(element.namespaceName, step.namespaceName)
-                                     : step.namespaceName.empty();
+        return element.name == step.name && element.namespaceName == step.namespaceName;
     }
 
     /// A position counts the elements that passed the predicates before it.
@@ -150,7 +143,7 @@ private:
             }
             const XmlElementTree::Attribute* attribute =
                 m_tree.attribute(element, predicate.attribute);
-            if (!attribute || m_tree.value(*attribute) != predicate.value)
+            if (!attribute || attribute->value != predicate.value)
                 return false;
         }
         return true;

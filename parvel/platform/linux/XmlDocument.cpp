@@ -81,7 +81,7 @@ std::string HostXmlDocument::stringValue(const void* node) const {
     if (const Element* element = m_elements->elementAt(node))
         return std::string(m_elements->text(*element));
     if (const Attribute* attribute = m_elements->attributeAt(node))
-        return std::string(m_elements->value(*attribute));
+        return std::string(attribute->value);
     return XPathTree::stringValue(static_cast<const xmlNode*>(node));
 }
 
@@ -89,7 +89,7 @@ std::optional<std::string> HostXmlDocument::attribute(const void* element,
                                                       std::string_view name) const {
     if (const Element* own = m_elements->elementAt(element)) {
         const Attribute* found = m_elements->attribute(*own, name);
-        return found ? std::optional<std::string>(m_elements->value(*found)) : std::nullopt;
+        return found ? std::optional<std::string>(found->value) : std::nullopt;
     }
     if (!element || m_elements->attributeAt(element))
         return std::nullopt;
@@ -118,8 +118,8 @@ const xmlNode* HostXmlDocument::treeNodeFrom(const void* node) const {
         return m_tree->elementAt(m_elements->indexOf(*element));
     if (const Attribute* attribute = m_elements->attributeAt(node)) {
         const Element& owner = m_elements->ownerOf(*attribute);
-        const xmlAttr* found = XPathTree::attribute(m_tree->elementAt(m_elements->indexOf(owner)),
-                                                    reinterpret_cast<const char*>(attribute->name));
+        const xmlAttr* found =
+            XPathTree::attribute(m_tree->elementAt(m_elements->indexOf(owner)), attribute->name);
         return reinterpret_cast<const xmlNode*>(found);
     }
     return static_cast<const xmlNode*>(node);

@@ -4,6 +4,8 @@
 #include <functional>
 #include <utility>
 
+#include "parvel/platform/linux/PlainXmlParse.h"
+
 namespace parvel {
 namespace {
 
@@ -20,69 +22,129 @@ const T* itemOf(const std::vector<T>& items, const void* pointer) {
 
 }  // namespace
 
-class XmlElementTree::Parse : private GuardedXmlParse {
+/// Fills a tree's lists in document order.
+class XmlElementTree::Builder {
 public:
-    explicit Parse(const Data& bytes) : m_bytes(bytes), m_budget(bytes.size()) {
+    explicit Builder(std::size_t documentSize) {
         // About what a package document holds, so that the lists of most need not grow.
-        const std::size_t size = std::min(bytes.size(), kLargestForeseen);
-        m_tree.m_elements.reserve(size / 64);
-        m_tree.m_attributes.reserve(size / 32);
-        m_tree.m_values.reserve(size / 2);
+        const std::size_t size = std::min(documentSize, kLargestForeseen);
+        m_tree.m_elements.reserve(size / 32);
+        m_tree.m_attributes.reserve(size / 24);
         m_tree.m_text.reserve(size / 2);
         m_open.reserve(kUsualDepth);
     }
 
-    std::optional<XmlElementTree> run() {
-        if (!GuardedXmlParse::run(m_bytes, 0))
-            return std::nullopt;
-        xmlDictReference(parser()->dict);
-        m_tree.m_names.reset(parser()->dict);
-        m_tree.m_scope = m_budget.scope();
-        return std::move(m_tree);
-    }
-
-private:
-    void startElement(const StartTag& tag) override {
-        if (!m_budget.startElement(*parser(), tag))
-            return stop();
+    void begin(std::string_view name, std::string_view namespaceName) {
         m_open.push_back(static_cast<std::uint32_t>(m_tree.m_elements.size()));
         Element& element = m_tree.m_elements.emplace_back();
-        element.name = fullName(tag.name, tag.prefix, tag.namespaceName);
-        element.namespaceName = tag.namespaceName;
+        element.name = name;
+        element.namespaceName = namespaceName;
         element.textBegin = static_cast<std::uint32_t>(m_tree.m_text.size());
         element.attributesBegin = static_cast<std::uint32_t>(m_tree.m_attributes.size());
-        for (std::size_t slot = 0; slot < tag.attributes.size(); slot += 5)
-            addAttribute(tag.attributes.subspan(slot, 5));
-        element.attributesEnd = static_cast<std::uint32_t>(m_tree.m_attributes.size());
+        element.attributesEnd = element.attributesBegin;
     }
 
-    void addAttribute(std::span<const xmlChar*> slots) {
-        const auto begin = static_cast<std::uint32_t>(m_tree.m_values.size());
-        m_tree.m_values.append(reinterpret_cast<const char*>(slots[3]),
-                               static_cast<std::size_t>(slots[4] - slots[3]));
-        const auto end = static_cast<std::uint32_t>(m_tree.m_values.size());
-        m_tree.m_attributes.push_back(
-            {fullName(slots[0], slots[1], slots[2]), slots[2], begin, end});
+    /// Of the element that was begun last.
+    void add(const Attribute& attribute) {
+        m_tree.m_attributes.push_back(attribute);
+        ++m_tree.m_elements.back().attributesEnd;
     }
 
-    /// A prefix that is not declared stays part of the name, as in libxml2's tree.
-    const xmlChar* fullName(const xmlChar* name, const xmlChar* prefix,
-                            const xmlChar* namespaceName) const {
-        return prefix && !namespaceName ? xmlDictQLookup(parser()->dict, prefix, name) : name;
-    }
+    void add(std::string_view characters) { m_tree.m_text += characters; }
 
-    void endElement() override {
-        m_budget.endElement();
+    void end() {
         Element& element = m_tree.m_elements[m_open.back()];
         element.end = static_cast<std::uint32_t>(m_tree.m_elements.size());
         element.textEnd = static_cast<std::uint32_t>(m_tree.m_text.size());
         m_open.pop_back();
     }
 
+    XmlElementTree& tree() { return m_tree; }
+
+private:
+    XmlElementTree m_tree;
+    std::vector<std::uint32_t> m_open;
+};
+
+class XmlElementTree::PlainParse : private PlainXmlParse {
+public:
+    explicit PlainParse(const Data& bytes) : m_bytes(bytes), m_builder(bytes.size()) {}
+
+    std::optional<XmlElementTree> run() {
+        XmlElementTree& tree = m_builder.tree();
+        if (!PlainXmlParse::run(m_bytes.text(tree.m_joinedBytes)))
+            return std::nullopt;
+        tree.m_bytes = m_bytes;
+        tree.m_values = takeValues();
+        return std::move(tree);
+    }
+
+private:
+    void startElement(const StartTag& tag) override {
+        m_builder.begin(tag.name.local, tag.namespaceName);
+        for (const PlainXmlParse::Attribute& attribute : tag.attributes)
+            m_builder.add({attribute.name.local, attribute.namespaceName, attribute.value});
+    }
+    void endElement() override { m_builder.end(); }
+    void text(std::string_view characters) override { m_builder.add(characters); }
+
+    const Data& m_bytes;
+    Builder m_builder;
+};
+
+class XmlElementTree::GuardedParse : private GuardedXmlParse {
+public:
+    explicit GuardedParse(const Data& bytes)
+        : m_bytes(bytes), m_budget(bytes.size()), m_builder(bytes.size()) {}
+
+    std::optional<XmlElementTree> run() {
+        if (!GuardedXmlParse::run(m_bytes, 0))
+            return std::nullopt;
+        XmlElementTree& tree = m_builder.tree();
+        xmlDictReference(parser()->dict);
+        tree.m_names.reset(parser()->dict);
+        tree.m_values = std::move(m_values);
+        tree.m_scope = m_budget.scope();
+        return std::move(tree);
+    }
+
+private:
+    void startElement(const StartTag& tag) override {
+        if (!m_budget.startElement(*parser(), tag))
+            return stop();
+        m_builder.begin(fullName(tag.name, tag.prefix, tag.namespaceName),
+                        textOf(tag.namespaceName));
+        for (std::size_t slot = 0; slot < tag.attributes.size(); slot += 5)
+            addAttribute(tag.attributes.subspan(slot, 5));
+    }
+
+    void addAttribute(std::span<const xmlChar*> slots) {
+        const std::string_view value(reinterpret_cast<const char*>(slots[3]),
+                                     static_cast<std::size_t>(slots[4] - slots[3]));
+        m_builder.add(
+            {fullName(slots[0], slots[1], slots[2]), textOf(slots[2]), m_values.keep(value)});
+    }
+
+    /// A prefix that is not declared stays part of the name, as in libxml2's tree.
+    std::string_view fullName(const xmlChar* name, const xmlChar* prefix,
+                              const xmlChar* namespaceName) const {
+        return textOf(prefix && !namespaceName ? xmlDictQLookup(parser()->dict, prefix, name)
+                                               : name);
+    }
+
+    static std::string_view textOf(const xmlChar* text) {
+        return text ? reinterpret_cast<const char*>(text) : std::string_view();
+    }
+
+    void endElement() override {
+        m_budget.endElement();
+        m_builder.end();
+    }
+
     void text(std::string_view characters) override {
         if (!m_budget.text(*parser(), characters))
             return stop();
-        m_tree.m_text += characters;
+        m_builder.add(characters);
     }
 
     void comment(const xmlChar* text) override { remark(text); }
@@ -95,12 +157,23 @@ private:
 
     const Data& m_bytes;
     XmlTreeBudget m_budget;
-    XmlElementTree m_tree;
-    std::vector<std::uint32_t> m_open;
+    TextArena m_values;
+    Builder m_builder;
 };
 
 std::optional<XmlElementTree> XmlElementTree::parse(const Data& bytes) {
-    return Parse(bytes).run();
+    std::optional<XmlElementTree> tree = parsePlain(bytes);
+    return tree ? std::move(tree) : parseGuarded(bytes);
+}
+
+std::optional<XmlElementTree> XmlElementTree::parsePlain(const Data& bytes) {
+    if (bytes.size() > PlainXmlParse::kLargestDocument)
+        return std::nullopt;
+    return PlainParse(bytes).run();
+}
+
+std::optional<XmlElementTree> XmlElementTree::parseGuarded(const Data& bytes) {
+    return GuardedParse(bytes).run();
 }
 
 const XmlElementTree::Element* XmlElementTree::elementAt(const void* node) const {
@@ -126,15 +199,10 @@ const XmlElementTree::Attribute* XmlElementTree::attribute(const Element& elemen
                                                            std::string_view name) const {
     for (std::uint32_t index = element.attributesBegin; index < element.attributesEnd; ++index) {
         const Attribute& attribute = m_attributes[index];
-        if (!attribute.namespaceName && name == reinterpret_cast<const char*>(attribute.name))
+        if (attribute.namespaceName.empty() && attribute.name == name)
             return &attribute;
     }
     return nullptr;
-}
-
-std::string_view XmlElementTree::value(const Attribute& attribute) const {
-    return std::string_view(m_values).substr(attribute.valueBegin,
-                                             attribute.valueEnd - attribute.valueBegin);
 }
 
 std::string_view XmlElementTree::text(const Element& element) const {

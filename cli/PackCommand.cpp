@@ -165,8 +165,13 @@ public:
 
 private:
     void pack(PVAssetMetadataFileManager& manager, const AssetPtr& asset, Result& result) const;
+    [[nodiscard]] bool isRefused(PVAssetMetadataFileManager& manager, const URL& package,
+                                 Result& result) const;
+    [[nodiscard]] Failure writeStaged(const URL& package, const URL& staged,
+                                      const Result& result) const;
 
     std::optional<std::string> m_file;
+    std::optional<URL> m_target;
     ProgressOption m_progress;
     AssetChanges m_changes;
 
@@ -187,57 +192,71 @@ int PackCommand::run(std::vector<std::string> operands) {
         throw UsageError("say where to: -o FILE");
     if (!m_changes.hasOnePath(operands))
         throw UsageError("one PATH is packed into FILE");
-    if (!PVAssetMetadata::isBookURL(urlOfPath(*m_file)))
+    m_target = urlOfPath(*m_file);
+    if (!PVAssetMetadata::isBookURL(*m_target))
         throw UsageError("-o " + *m_file + ": a book ends in .epub or .folium");
     return m_changes.run("pack", std::move(operands),
                          [this](PVAssetMetadataFileManager& manager, const AssetPtr& asset,
                                 Result& result) { pack(manager, asset, result); });
 }
 
-void PackCommand::pack(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
-                       Result& result) const {
-    const URL target = urlOfPath(*m_file);
-    const URL package = *asset->url();
+/// The result says why.
+bool PackCommand::isRefused(PVAssetMetadataFileManager& manager, const URL& package,
+                            Result& result) const {
     std::error_code unknown;
-    result.nothing = "not packed";
     if (!standsAt(package)) {
         result.error = makeFileError(PVFileErrorCode::NoSuchFile, package);
-        return;
+        return true;
     }
     if (!fs::is_directory(package.path(), unknown)) {
         refuse(result, "it is no package folder", "a zipped book is packed already");
-        return;
+        return true;
     }
     if (!fs::exists(fs::path(package.path()) / kContainer, unknown)) {
         refuse(result, "it holds no book", "a book has a " + std::string(kContainer));
-        return;
+        return true;
     }
-    const URL folder = target.standardized().deletingLastPathComponent();
-    if (liesWithin(folder, package)) {
+    if (liesWithin(m_target->standardized().deletingLastPathComponent(), package)) {
         refuse(result, "the zipped book would be a part of itself", "choose a FILE elsewhere");
-        return;
+        return true;
     }
-    if (manager.fileManager()->itemExistsAtPath(target.path())) {
-        result.error = makeFileError(PVFileErrorCode::FileExists, target);
-        result.advice = "something stands at " + target.path() + ": choose another FILE";
-        return;
+    if (manager.fileManager()->itemExistsAtPath(m_target->path())) {
+        result.error = makeFileError(PVFileErrorCode::FileExists, *m_target);
+        result.advice = "something stands at " + m_target->path() + ": choose another FILE";
+        return true;
     }
+    return false;
+}
+
+/// A rehearsal writes into a file without a name.
+Failure PackCommand::writeStaged(const URL& package, const URL& staged,
+                                 const Result& result) const {
+    std::error_code unknown;
+    const bool isRehearsal = m_changes.isDryRun();
+    const fs::path temporary = fs::canonical(fs::temp_directory_path(unknown), unknown);
+    const OpenFile file(isRehearsal ? temporary.string() : staged.path(),
+                        O_RDWR | (isRehearsal ? O_TMPFILE : O_CREAT | O_EXCL));
+    if (file.get() < 0)
+        return {errno, staged.path()};
+    Progress progress(m_form, result.path);
+    return writeArchive(package.path(), file.get(), progress);
+}
+
+void PackCommand::pack(PVAssetMetadataFileManager& manager, const AssetPtr& asset,
+                       Result& result) const {
+    const URL package = *asset->url();
+    result.nothing = "not packed";
+    if (isRefused(manager, package, result))
+        return;
+    const URL folder = m_target->standardized().deletingLastPathComponent();
     const auto staging = StagingDirectory::makeIn(folder, &result.error);
     if (!staging) {
         result.advice = "there must be a folder " + folder.path() + " that can be written to";
         return;
     }
 
-    // A rehearsal writes into a file without a name.
-    const URL staged = staging->url().appendingPathComponent(target.lastPathComponent());
-    const bool isRehearsal = m_changes.isDryRun();
-    const OpenFile file(isRehearsal ? fs::temp_directory_path(unknown).string() : staged.path(),
-                        O_RDWR | (isRehearsal ? O_TMPFILE : O_CREAT | O_EXCL));
-    Failure failure{errno, staged.path()};
-    if (file.get() >= 0) {
-        Progress progress(m_form, result.path);
-        failure = writeArchive(package.path(), file.get(), progress);
-    }
+    const URL staged = staging->url().appendingPathComponent(m_target->lastPathComponent());
+    const Failure failure = writeStaged(package, staged, result);
     if (failure.errnoValue == ECANCELED) {
         result.error = makeCancelledError(package);
         return;
@@ -249,10 +268,12 @@ void PackCommand::pack(PVAssetMetadataFileManager& manager, const AssetPtr& asse
             result.advice = failure.path + " can't be packed";
         return;
     }
-    if (!isRehearsal && !manager.fileManager()->moveItem(staged, target, &result.error))
+    const bool isMoved =
+        m_changes.isDryRun() || manager.fileManager()->moveItem(staged, *m_target, &result.error);
+    if (!isMoved)
         return;
-    setRecord(result, asset->copyWithUpdatedURL(target), PVAssetMetadataFlavorFull);
-    result.outcome = "packed as " + target.path();
+    setRecord(result, asset->copyWithUpdatedURL(*m_target), PVAssetMetadataFlavorFull);
+    result.outcome = "packed as " + m_target->path();
 }
 
 }  // namespace

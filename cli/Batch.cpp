@@ -12,12 +12,8 @@
 #include <thread>
 #include <vector>
 
-#include <unistd.h>
-
-#include "cli/Command.h"
 #include "cli/Interrupt.h"
-#include "cli/Messages.h"
-#include "cli/Output.h"
+#include "cli/ResultPrinter.h"
 
 namespace parvel::cli {
 namespace {
@@ -38,8 +34,7 @@ public:
         : m_options(options),
           m_source(source),
           m_work(work),
-          m_format(ResultFormat::make(options.form, options.makeText)),
-          m_output(STDOUT_FILENO) {}
+          m_printer(options.command, options.form, options.makeText) {}
 
     int run();
 
@@ -48,40 +43,31 @@ private:
         std::size_t index;
         FoundPath found;
     };
-    struct Printed {
-        std::string text;
-        std::string failure;
-    };
 
     void workThrough();
     std::optional<Taken> take();
     void waitForRoom();
     [[nodiscard]] Result resultOf(const FoundPath& found, CallLog& log) const;
-    void deliver(std::size_t index, Printed printed);
-    void print(const Printed& printed);
+    void deliver(std::size_t index, PrintedResult printed);
 
     const BatchOptions& m_options;
     PathSource& m_source;
     const PathWork& m_work;
-    const std::unique_ptr<ResultFormat> m_format;
 
     std::mutex m_sourceMutex;
     std::size_t m_taken = 0;
 
     std::mutex m_outputMutex;
     std::condition_variable m_room;
-    Output m_output;
-    std::map<std::size_t, Printed> m_waiting;  ///< results behind one that is not known yet
+    ResultPrinter m_printer;
+    std::map<std::size_t, PrintedResult> m_waiting;  ///< results behind one that is not known yet
     std::size_t m_printed = 0;
-    bool m_hasResult = false;
-    bool m_hasFailure = false;
 
     std::atomic<unsigned> m_delivering{0};
     std::atomic<bool> m_stopped{false};
 };
 
 int Batch::run() {
-    m_output.append(m_format->opening());
     const std::size_t paths = m_source.count().value_or(m_options.jobs);
     std::vector<std::thread> threads;
     for (std::size_t i = 1; i < std::min<std::size_t>(m_options.jobs, paths); ++i) {
@@ -94,26 +80,19 @@ int Batch::run() {
     workThrough();
     for (std::thread& thread : threads)
         thread.join();
-    m_output.append(m_format->closing());
-    const bool delivered = m_output.finish(m_options.command);
-    return delivered && !m_hasFailure ? kSuccess : kFailure;
+    return m_printer.finish();
 }
 
 void Batch::workThrough() {
     CallLog log(m_options.reasonLevel);
     while (const std::optional<Taken> taken = take()) {
-        const Result result = resultOf(taken->found, log);
-        Printed printed;
-        m_format->append(result, printed.text);
-        if (!result.succeeded())
-            printed.failure = failureLine(m_options.command, result);
-        deliver(taken->index, std::move(printed));
+        deliver(taken->index, m_printer.inForm(resultOf(taken->found, log)));
     }
 }
 
 std::optional<Batch::Taken> Batch::take() {
     const std::lock_guard lock(m_sourceMutex);
-    if (m_format->keepsOrder())
+    if (m_printer.keepsOrder())
         waitForRoom();
     if (interrupted() || m_stopped)
         return std::nullopt;
@@ -142,16 +121,16 @@ Result Batch::resultOf(const FoundPath& found, CallLog& log) const {
     }
 }
 
-void Batch::deliver(std::size_t index, Printed printed) {
+void Batch::deliver(std::size_t index, PrintedResult printed) {
     ++m_delivering;
     const std::lock_guard lock(m_outputMutex);
     --m_delivering;
-    if (!m_format->keepsOrder()) {
-        print(printed);
+    if (!m_printer.keepsOrder()) {
+        m_printer.print(printed);
     } else {
         m_waiting.emplace(index, std::move(printed));
         while (!m_waiting.empty() && m_waiting.begin()->first == m_printed) {
-            print(m_waiting.begin()->second);
+            m_printer.print(m_waiting.begin()->second);
             m_waiting.erase(m_waiting.begin());
             ++m_printed;
         }
@@ -159,22 +138,8 @@ void Batch::deliver(std::size_t index, Printed printed) {
     }
     // The next thread in the queue flushes for this one too.
     if (m_delivering == 0)
-        m_output.flushForReader();
-    m_stopped = m_output.failed();
-}
-
-void Batch::print(const Printed& printed) {
-    if (!printed.text.empty()) {
-        if (m_hasResult)
-            m_output.append(m_format->separator());
-        m_hasResult = true;
-        m_output.append(printed.text);
-    }
-    if (!printed.failure.empty()) {
-        m_hasFailure = true;
-        m_output.flushForReader();
-        writeToStandardError(printed.failure);
-    }
+        m_printer.flushForReader();
+    m_stopped = m_printer.hasLostOutput();
 }
 
 }  // namespace

@@ -77,15 +77,6 @@ bool isSameFile(const std::string& path, const std::string& other) {
     return std::filesystem::equivalent(path, other, ignored);
 }
 
-bool printResult(OutputForm form, const Result& result) {
-    const std::unique_ptr<ResultFormat> format = ResultFormat::make(form);
-    std::string text(format->opening());
-    format->append(result, text);
-    Output output(STDOUT_FILENO);
-    output.append(text + std::string(format->closing()));
-    return output.finish("cover");
-}
-
 class CoverCommand : public Command {
 public:
     void declare(CommandLine& line) override;
@@ -194,17 +185,16 @@ bool CoverCommand::deliver(Result& result, const std::optional<Data>& cover) con
     std::vector<std::uint8_t> storage;
     const std::string_view bytes = cover ? cover->text(storage) : std::string_view();
     const bool isStored = !cover || !hasFile() || store(result, bytes);
-    if (m_output.form() == OutputForm::Text) {
-        Output output(STDOUT_FILENO);
-        if (!hasFile())
-            output.append(bytes);
-        return output.finish("cover") && isStored;
-    }
     if (hasFile())
         result.fields.push_back({"file", cover && isStored ? Value(*m_file) : Value()});
     else
         result.fields.push_back({"cover", cover ? Value(*cover) : Value()});
-    return printResult(m_output.form(), result) && isStored;
+    Output output(STDOUT_FILENO);
+    if (m_output.form() != OutputForm::Text)
+        output.append(listOfOne(m_output.form(), result));
+    else if (!hasFile())
+        output.append(bytes);
+    return output.finish("cover") && isStored;
 }
 
 bool CoverCommand::store(Result& result, std::string_view bytes) const {

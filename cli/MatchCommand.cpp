@@ -85,14 +85,10 @@ int MatchCommand::run(std::vector<std::string> operands) {
     side.result.fields.push_back({"matches", known ? Value(Number::boolean(matching)) : Value()});
 
     Output output(STDOUT_FILENO);
-    if (m_output.form() != OutputForm::Text) {
-        const std::unique_ptr<ResultFormat> format = ResultFormat::make(m_output.form());
-        std::string text(format->opening());
-        format->append(side.result, text);
-        output.append(text + std::string(format->closing()));
-    } else if (known) {
+    if (m_output.form() != OutputForm::Text)
+        output.append(listOfOne(m_output.form(), side.result));
+    else if (known)
         output.append(matching ? "true\n" : "false\n");
-    }
     if (!output.finish("match") || !known)
         return kNoRecord;
     return matching ? kSuccess : kFailure;

@@ -84,4 +84,12 @@ std::unique_ptr<ResultFormat> ResultFormat::make(OutputForm form, MakeResultForm
     return nullptr;
 }
 
+std::string listOfOne(OutputForm form, const Result& result) {
+    const std::unique_ptr<ResultFormat> format = ResultFormat::make(form);
+    std::string text(format->opening());
+    format->append(result, text);
+    text += format->closing();
+    return text;
+}
+
 }  // namespace parvel::cli

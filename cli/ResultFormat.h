@@ -39,4 +39,7 @@ public:
                                               MakeResultFormat makeText = makeTextFormat);
 };
 
+/// A list of that one result.
+std::string listOfOne(OutputForm form, const Result& result);
+
 }  // namespace parvel::cli

@@ -12,19 +12,25 @@ ResultPrinter::ResultPrinter(std::string_view command, OutputForm form, MakeResu
     m_output.append(m_format->opening());
 }
 
-void ResultPrinter::print(const Result& result) {
-    std::string text;
-    m_format->append(result, text);
-    if (!text.empty()) {
+PrintedResult ResultPrinter::inForm(const Result& result) const {
+    PrintedResult printed;
+    m_format->append(result, printed.text);
+    if (!result.succeeded())
+        printed.failure = failureLine(m_command, result);
+    return printed;
+}
+
+void ResultPrinter::print(const PrintedResult& printed) {
+    if (!printed.text.empty()) {
         if (m_hasResult)
             m_output.append(m_format->separator());
         m_hasResult = true;
-        m_output.append(text);
+        m_output.append(printed.text);
     }
-    if (!result.succeeded()) {
+    if (!printed.failure.empty()) {
         m_hasFailure = true;
         m_output.flushForReader();
-        writeToStandardError(failureLine(m_command, result));
+        writeToStandardError(printed.failure);
     }
 }
 

@@ -9,13 +9,28 @@
 
 namespace parvel::cli {
 
-/// Prints the results of a command that has them one by one: each on standard output, and a line
-/// for each failure on standard error.
+/// A result as it is printed: on standard output, and a line on standard error where it failed.
+struct PrintedResult {
+    std::string text;
+    std::string failure;
+};
+
+/// Prints the results of a command. One thread at a time, but for `inForm`.
 class ResultPrinter {
 public:
     ResultPrinter(std::string_view command, OutputForm form, MakeResultFormat makeText);
 
-    void print(const Result& result);
+    /// Whether results stand in the order of their PATHs.
+    [[nodiscard]] bool keepsOrder() const { return m_format->keepsOrder(); }
+    /// Callable from many threads at once.
+    [[nodiscard]] PrintedResult inForm(const Result& result) const;
+
+    void print(const PrintedResult& printed);
+    void print(const Result& result) { print(inForm(result)); }
+    /// Lets whoever reads along see what is printed.
+    void flushForReader() { m_output.flushForReader(); }
+    /// Whether nothing can be printed any more.
+    [[nodiscard]] bool hasLostOutput() const { return m_output.failed(); }
     /// Ends the list; the exit status.
     [[nodiscard]] int finish();
 

@@ -34,12 +34,11 @@ protected:
     Interface& m_service;
 };
 
-/// The same error about the URL that was asked for.
-bool failAbout(const URL& url, std::optional<Error> failure, ErrorOut error) {
-    if (!failure)
-        return false;
-    return fail(error,
-                Error(failure->domain(), failure->code(), {{std::string(PVURLErrorKey), url}}));
+/// Passes an error on, if there is one, as one about the URL that was asked for.
+void passOn(const std::optional<Error>& failure, const URL& url, ErrorOut error) {
+    if (failure)
+        assign(error, Error(failure->domain(), failure->code(),
+                            Error::UserInfo{{std::string(PVURLErrorKey), url}}));
 }
 
 class RehearsedReader final : public Rehearsed<FileReader> {
@@ -52,7 +51,7 @@ public:
             return fail(error, makeServiceError(ENOENT, url));
         std::optional<Error> failure;
         auto data = m_service.readFile(URL::fileURLWithPath(*place), limit, &failure);
-        (void)failAbout(url, failure, error);
+        passOn(failure, url, error);
         return data;
     }
 
@@ -65,7 +64,7 @@ public:
         std::optional<Error> failure;
         auto data = m_service.readMember(URL::fileURLWithPath(place->first), place->second, limit,
                                          &failure);
-        (void)failAbout(member, failure, error);
+        passOn(failure, member, error);
         return data;
     }
 
@@ -105,7 +104,7 @@ public:
         const auto place = realURL(url, error);
         std::optional<Error> failure;
         const bool reachable = place && m_service.isReachable(*place, &failure);
-        (void)failAbout(url, failure, error);
+        passOn(failure, url, error);
         return reachable;
     }
 
@@ -115,7 +114,7 @@ public:
         const auto place = realURL(url, error);
         std::optional<Error> failure;
         const auto directory = place ? m_service.isDirectory(*place, &failure) : std::nullopt;
-        (void)failAbout(url, failure, error);
+        passOn(failure, url, error);
         return directory;
     }
 
@@ -125,7 +124,7 @@ public:
         const auto place = realURL(url, error);
         std::optional<Error> failure;
         const auto size = place ? m_service.totalAllocatedSize(*place, &failure) : std::nullopt;
-        (void)failAbout(url, failure, error);
+        passOn(failure, url, error);
         return size;
     }
 

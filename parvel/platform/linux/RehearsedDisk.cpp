@@ -201,33 +201,45 @@ int RehearsedDisk::trash(const std::string& item, std::string& resulting) {
     if (const int error = lookUp(key))
         return error;
     const auto plan = planTrash(entryAt(key).real);
-    int error = plan ? 0 : errno;
-    for (const TrashFolder& trash : plan ? plan->folders : std::vector<TrashFolder>()) {
-        const bool isVolumes = !trash.topDirectory.empty();
-        error =
-            isVolumes && lookUp(keyOf(trash.path)) == 0 && !isOwnRealFolder(trash.path) ? EPERM : 0;
+    if (!plan)
+        return errno;
+    int error = 0;
+    for (const TrashFolder& trash : plan->folders) {
+        error = makeTrash(trash);
         if (error == 0)
-            error = makeFolders(trash.filesFolder());
+            error = moveIntoTrash(trash, item, resulting);
         if (error == 0)
-            error = makeFolders(trash.infoFolder());
-        for (int attempt = 1; error == 0 && attempt < kMaximumTrashNames; ++attempt) {
-            const std::string name = trashName(lastComponentOfPath(item), attempt);
-            const std::string info = keyOf(infoFileFor(trash.path, name));
-            if (lookUp(info) == 0)
-                continue;
-            resulting = pathAppending(trash.filesFolder(), name);
-            error = changeError(info);
-            if (error == 0)
-                error = moveByKey(key, keyOf(resulting));
-            if (error == 0) {
-                set(info, {Kind::MadeFile, {}});
-                return 0;
-            }
-            if (error == EEXIST)
-                error = 0;
-        }
+            return 0;
     }
     return error;
+}
+
+int RehearsedDisk::makeTrash(const TrashFolder& trash) {
+    const bool isVolumes = !trash.topDirectory.empty();
+    if (isVolumes && lookUp(keyOf(trash.path)) == 0 && !isOwnRealFolder(trash.path))
+        return EPERM;
+    if (const int error = makeFolders(trash.filesFolder()))
+        return error;
+    return makeFolders(trash.infoFolder());
+}
+
+int RehearsedDisk::moveIntoTrash(const TrashFolder& trash, const std::string& item,
+                                 std::string& resulting) {
+    for (int attempt = 1; attempt <= kMaximumTrashNames; ++attempt) {
+        const std::string name = trashName(lastComponentOfPath(item), attempt);
+        const std::string info = keyOf(infoFileFor(trash.path, name));
+        if (lookUp(info) == 0)
+            continue;
+        resulting = pathAppending(trash.filesFolder(), name);
+        int error = changeError(info);
+        if (error == 0)
+            error = moveByKey(keyOf(item), keyOf(resulting));
+        if (error == 0)
+            set(info, {Kind::MadeFile, {}});
+        if (error != EEXIST)
+            return error;
+    }
+    return EEXIST;
 }
 
 // What is made new

@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "parvel/platform/linux/ItemOperations.h"
+#include "parvel/platform/linux/TrashFolders.h"
 
 namespace parvel::host {
 
@@ -55,7 +56,7 @@ private:
         std::string real;  ///< where a Real one lies on the disk
     };
 
-    // By the name's key, its path with the folder's links resolved. The caller holds the lock.
+    // The caller holds the lock. A key is a path with its folder's links resolved.
     [[nodiscard]] Entry entryAt(const std::string& key) const;
     [[nodiscard]] int lookUp(const std::string& key) const;
     [[nodiscard]] bool isFolder(const std::string& key) const;
@@ -74,6 +75,9 @@ private:
     void set(const std::string& key, Entry entry);
     void relocate(const std::string& source, const std::string& destination);
     [[nodiscard]] int moveByKey(const std::string& source, const std::string& destination);
+    [[nodiscard]] int makeTrash(const TrashFolder& trash);
+    [[nodiscard]] int moveIntoTrash(const TrashFolder& trash, const std::string& item,
+                                    std::string& resulting);
 
     mutable std::mutex m_mutex;
     std::map<std::string, Entry, std::less<>> m_entries;

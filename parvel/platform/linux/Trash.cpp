@@ -41,7 +41,7 @@ int makeTrash(const TrashFolder& trash) {
 
 int moveInto(const TrashFolder& trash, const std::string& item, const std::string& absolute,
              std::string& resulting) {
-    for (int attempt = 1; attempt < kMaximumTrashNames; ++attempt) {
+    for (int attempt = 1; attempt <= kMaximumTrashNames; ++attempt) {
         const std::string name = trashName(lastComponentOfPath(item), attempt);
         const std::string info = infoFileFor(trash.path, name);
         int error = writeTrashInfo(info, trash, absolute);

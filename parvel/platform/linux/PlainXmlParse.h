@@ -6,7 +6,7 @@
 #include <string_view>
 #include <vector>
 
-#include "parvel/platform/linux/TextArena.h"
+#include "parvel/platform/linux/PlainXmlScanner.h"
 
 namespace parvel {
 
@@ -19,11 +19,7 @@ namespace parvel {
 /// plain one, well-formed or not: libxml2 tells which.
 class PlainXmlParse {
 public:
-    /// A name with its prefix apart.
-    struct Name {
-        std::string_view prefix;
-        std::string_view local;
-    };
+    using Name = PlainXmlScanner::Name;
     struct Attribute {
         Name name;
         std::string_view namespaceName;  ///< empty for none
@@ -53,7 +49,7 @@ protected:
     /// Ends the parse: the derived class doesn't take the document for a plain one.
     void refuse() { m_isRefused = true; }
     /// What holds the values that don't stand in the document as they read.
-    [[nodiscard]] TextArena takeValues() { return std::move(m_values); }
+    [[nodiscard]] TextArena takeValues() { return m_scanner.takeValues(); }
 
     virtual void startElement(const StartTag& tag) = 0;
     virtual void endElement() = 0;
@@ -70,43 +66,22 @@ private:
         std::size_t outerBindings;  ///< in scope around the element
     };
 
-    bool takeProlog();
-    bool takeDeclaration();
-    bool takeDoctype();
-    bool takeMisc();
-    bool takeComment();
     bool takeContent();
     bool takeStartTag();
     bool takeAttribute(const Open& element);
     bool takeNamespace(std::string_view prefix, const Open& element);
     bool takeEndTag();
     bool takeCharacters();
-    bool takeUnusualCharacter();
-    bool takeName(Name& name);
-    bool takeAssignment(std::string_view& value);
-    bool takeValue(std::string_view& value);
-    bool takeDecodedValue(const char* begin, char quote, std::string_view& value);
-    bool takeReference(std::string& decoded);
 
     bool bindNames(StartTag& tag);
     bool findNamespace(std::string_view prefix, std::string_view& namespaceName) const;
     void close();
 
-    [[nodiscard]] bool atEnd() const { return m_at == m_end; }
-    [[nodiscard]] std::string_view since(const char* begin) const {
-        return {begin, static_cast<std::size_t>(m_at - begin)};
-    }
-    bool take(char expected);
-    bool take(std::string_view expected);
-    bool takeSpace();
-
-    const char* m_at = nullptr;
-    const char* m_end = nullptr;
+    PlainXmlScanner m_scanner;
     std::vector<Open> m_open;
     std::vector<Binding> m_bindings;
     std::vector<Attribute> m_attributes;  ///< of the tag being read
     std::string m_decoded;
-    TextArena m_values;
     bool m_isRefused = false;
 };
 

@@ -18,6 +18,10 @@ inline constexpr std::size_t kMaximumPropertyListNodes = 500'000;
 /// says.
 [[nodiscard]] std::optional<Value> readXMLPropertyList(const Data& bytes);
 [[nodiscard]] std::optional<Value> readBinaryPropertyList(Data::Bytes bytes);
+/// The XML form in a document of the plain kind; none for any other.
+[[nodiscard]] std::optional<Value> readPlainXMLPropertyList(const Data& bytes);
+/// The XML form in any document, by libxml2.
+[[nodiscard]] std::optional<Value> readGuardedXMLPropertyList(const Data& bytes);
 
 /// None for a value that the form can't hold.
 [[nodiscard]] std::optional<Data> writeXMLPropertyList(const Value& value);

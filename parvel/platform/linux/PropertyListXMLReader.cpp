@@ -5,6 +5,7 @@
 
 #include "parvel/platform/MalformedInput.h"
 #include "parvel/platform/linux/GuardedXmlParse.h"
+#include "parvel/platform/linux/PlainXmlParse.h"
 #include "parvel/platform/linux/PropertyListForms.h"
 
 namespace parvel {
@@ -50,15 +51,48 @@ std::optional<Value> valueOf(std::optional<T> leaf) {
     return leaf ? std::optional<Value>(std::move(*leaf)) : std::nullopt;
 }
 
-/// Builds the values as their elements end. Whatever the form does not know ends the parse.
-class PropertyListXMLParse : private GuardedXmlParse {
+/// Builds the values as their elements end. Each step tells whether the form allows it.
+class PropertyListBuilder {
 public:
-    std::optional<Value> run(const Data& bytes) {
-        // The parser's own limits are below what a property list may have; this class keeps others.
-        if (!GuardedXmlParse::run(bytes, XML_PARSE_HUGE))
-            return std::nullopt;
-        return std::move(m_result);
+    [[nodiscard]] bool begin(std::string_view name) {
+        const std::optional<Tag> tag = tagNamed(name);
+        if (!tag || !mayStandHere(*tag))
+            return false;
+        if (*tag != Tag::Plist && ++m_nodes > kMaximumPropertyListNodes)
+            throw MalformedInput("a property list of too many values");
+        if (isContainer(*tag) && *tag != Tag::Plist && ++m_depth > kMaximumPropertyListDepth)
+            throw MalformedInput("a property list nested too deep");
+        m_open.push_back({*tag, {}, {}, std::nullopt});
+        m_text.clear();
+        return true;
     }
+
+    [[nodiscard]] bool end() {
+        Open ended = std::move(m_open.back());
+        m_open.pop_back();
+        if (ended.tag == Tag::Plist)
+            return true;
+        if (ended.tag == Tag::Key) {
+            m_open.back().key = std::move(m_text);
+            return true;
+        }
+        if (isContainer(ended.tag))
+            --m_depth;
+        std::optional<Value> value = valueOfElement(std::move(ended));
+        if (!value)
+            return false;
+        place(std::move(*value));
+        return true;
+    }
+
+    [[nodiscard]] bool add(std::string_view characters) {
+        if (m_open.empty() || isContainer(m_open.back().tag))
+            return isSpace(characters);
+        m_text += characters;
+        return true;
+    }
+
+    [[nodiscard]] std::optional<Value> takeResult() { return std::move(m_result); }
 
 private:
     struct Open {
@@ -67,45 +101,6 @@ private:
         std::vector<Dictionary::Entry> entries;  ///< of a dictionary
         std::optional<String> key;               ///< the dictionary's last one, without its value
     };
-
-    void startElement(const StartTag& start) override {
-        const std::optional<Tag> tag = tagNamed(reinterpret_cast<const char*>(start.name));
-        if (!tag || start.prefix || !mayStandHere(*tag) ||
-            xmlDictSize(parser()->dict) > kMaximumXMLNames)
-            return stop();
-        if (*tag != Tag::Plist && ++m_nodes > kMaximumPropertyListNodes)
-            throw MalformedInput("a property list of too many values");
-        if (isContainer(*tag) && *tag != Tag::Plist && ++m_depth > kMaximumPropertyListDepth)
-            throw MalformedInput("a property list nested too deep");
-        m_open.push_back({*tag, {}, {}, std::nullopt});
-        m_text.clear();
-    }
-
-    void endElement() override {
-        Open ended = std::move(m_open.back());
-        m_open.pop_back();
-        if (ended.tag == Tag::Plist)
-            return;
-        if (ended.tag == Tag::Key) {
-            m_open.back().key = std::move(m_text);
-            return;
-        }
-        if (isContainer(ended.tag))
-            --m_depth;
-        std::optional<Value> value = valueOfElement(std::move(ended));
-        if (!value)
-            return stop();
-        place(std::move(*value));
-    }
-
-    void text(std::string_view characters) override {
-        if (m_open.empty() || isContainer(m_open.back().tag)) {
-            if (!isSpace(characters))
-                stop();
-            return;
-        }
-        m_text += characters;
-    }
 
     bool mayStandHere(Tag tag) const {
         if (m_open.empty())
@@ -168,10 +163,69 @@ private:
     std::optional<Value> m_result;
 };
 
+class PlainPropertyListParse : private PlainXmlParse {
+public:
+    std::optional<Value> run(std::string_view list) {
+        return PlainXmlParse::run(list) ? m_builder.takeResult() : std::nullopt;
+    }
+
+private:
+    void startElement(const StartTag& tag) override {
+        // Attributes have a budget of their own, and only the root usually has any.
+        const bool isPlain = tag.attributes.empty() || tag.name.local == "plist";
+        take(isPlain && tag.name.prefix.empty() && m_builder.begin(tag.name.local));
+    }
+    void endElement() override { take(m_builder.end()); }
+    void text(std::string_view characters) override { take(m_builder.add(characters)); }
+
+    void take(bool isAllowed) {
+        if (!isAllowed)
+            refuse();
+    }
+
+    PropertyListBuilder m_builder;
+};
+
+class GuardedPropertyListParse : private GuardedXmlParse {
+public:
+    std::optional<Value> run(const Data& bytes) {
+        // The parser's own limits are below what a property list may have; the builder keeps
+        // others.
+        return GuardedXmlParse::run(bytes, XML_PARSE_HUGE) ? m_builder.takeResult() : std::nullopt;
+    }
+
+private:
+    void startElement(const StartTag& tag) override {
+        take(!tag.prefix && xmlDictSize(parser()->dict) <= kMaximumXMLNames &&
+             m_builder.begin(reinterpret_cast<const char*>(tag.name)));
+    }
+    void endElement() override { take(m_builder.end()); }
+    void text(std::string_view characters) override { take(m_builder.add(characters)); }
+
+    void take(bool isAllowed) {
+        if (!isAllowed)
+            stop();
+    }
+
+    PropertyListBuilder m_builder;
+};
+
 }  // namespace
 
 std::optional<Value> readXMLPropertyList(const Data& bytes) {
-    return PropertyListXMLParse().run(bytes);
+    std::optional<Value> list = readPlainXMLPropertyList(bytes);
+    return list ? std::move(list) : readGuardedXMLPropertyList(bytes);
+}
+
+std::optional<Value> readPlainXMLPropertyList(const Data& bytes) {
+    if (bytes.size() > PlainXmlParse::kLargestDocument)
+        return std::nullopt;
+    std::vector<std::uint8_t> storage;
+    return PlainPropertyListParse().run(bytes.text(storage));
+}
+
+std::optional<Value> readGuardedXMLPropertyList(const Data& bytes) {
+    return GuardedPropertyListParse().run(bytes);
 }
 
 }  // namespace parvel

@@ -47,6 +47,22 @@ TEST_F(CopyingTrees, CopiesAllThatIsInAFolderHiddenItemsToo) {
     EXPECT_EQ(read(".hidden/b"), "b");
 }
 
+TEST_F(CopyingTrees, WhatAnEditMadeForItselfInThePackageIsNeitherCountedNorCopied) {
+    source("mimetype", "123");
+    source(".parvel-stage-killed/file", "1");
+    source(".parvel-stage-name", "1");
+    source("OPS/.parvel-stage-name", "4");
+    source(".parvel-aside-name", "5");
+
+    const ArchiveCopier::Count count = m_copier->countTree(sourcePath());
+    EXPECT_EQ(copyTree(), 0);
+
+    EXPECT_EQ(count, (ArchiveCopier::Count{3, 5}));
+    EXPECT_EQ(names(), (Names{".parvel-aside-name", "OPS", "OPS/.parvel-stage-name", "mimetype"}));
+    EXPECT_EQ(m_callbacks.finished.size(), 3U);
+    EXPECT_TRUE(std::filesystem::exists(m_folder / "source/.parvel-stage-killed/file"));
+}
+
 TEST_F(CopyingTrees, TellsFilesAndLinksAndCountsThemAlike) {
     source("folder/a", "123");
     link("a", "folder/b");

@@ -1,5 +1,6 @@
 // Copies a package's folder by descriptors, following no link below it. Folders get their modes and
-// attributes last, so that one which forbids changes can be filled.
+// attributes last, so that one which forbids changes can be filled. What an edit keeps in the
+// package while it works, or left there when it was killed, is no part of it.
 
 #include "parvel/platform/linux/PackageCopy.h"
 
@@ -13,6 +14,7 @@
 #include "parvel/foundation/URL.h"
 #include "parvel/platform/linux/DirectoryStream.h"
 #include "parvel/platform/linux/FileDescriptor.h"
+#include "parvel/platform/linux/HiddenItem.h"
 #include "parvel/platform/linux/ItemContent.h"
 #include "parvel/platform/linux/ItemTree.h"
 #include "parvel/platform/linux/OpenFolder.h"
@@ -24,6 +26,12 @@ namespace parvel::host {
 namespace {
 
 constexpr int kDeepestFolder = 200;  // two descriptors a level
+
+/// Deliberate: a copy takes every item along but the hidden ones of the library's own. They stand
+/// where an edit writes, in the package's own folder.
+bool isLeftOut(const char* name, int depth) {
+    return depth == 0 && isStagingName(name);
+}
 
 FileDescriptor openFolderIn(int folder, const char* name) {
     return openFolder(folder, name, O_RDONLY | O_NOFOLLOW);
@@ -38,6 +46,8 @@ void countFolder(FileDescriptor folder, int depth, const CopierReports& reports,
         const dirent* entry = stream.next();
         if (!entry)
             return;
+        if (isLeftOut(entry->d_name, depth))
+            continue;
         struct stat status {};
         if (::fstatat(stream.descriptor(), entry->d_name, &status, AT_SYMLINK_NOFOLLOW) != 0)
             continue;
@@ -72,6 +82,8 @@ public:
         while (const dirent* entry = from.next()) {
             if (const int error = m_reports.cancellation())
                 return error;
+            if (isLeftOut(entry->d_name, depth))
+                continue;
             const std::string itemPath = pathAppending(path, entry->d_name);
             if (const int error = copyItem({from.descriptor(), entry->d_name, to, itemPath, depth}))
                 return error;

@@ -61,16 +61,20 @@ public:
     /// ECANCELED when cancelled. The destination must not exist (EEXIST, fatal). What was made
     /// stays after a failure.
     ///
-    /// A tree keeps its modes, times, attributes and the links that stay inside it. Refused are
-    /// other links and trees deeper than 200 folders (ELOOP), devices, pipes and sockets
-    /// (EOPNOTSUPP), and a file that grows or shrinks meanwhile (EIO).
+    /// A tree keeps its modes, access lists, times, attributes and the links that stay inside it,
+    /// and its owners as far as they may be given. Hidden staging items in the folder itself are no
+    /// part of it: they are neither counted nor copied. Refused are other links and trees deeper
+    /// than 200 folders (ELOOP), devices, pipes and sockets (EOPNOTSUPP), and a file that grows or
+    /// shrinks meanwhile (EIO).
     ///
-    /// An archive's files become 0600, its folders 0700. Refused are a file that is no archive, or
-    /// whose entries claim more than it can hold, or more than 100,000 folders (EBADMSG), or more
-    /// than the disk has room for (ENOSPC), all fatal; entries with an absolute name or an empty,
-    /// `.` or `..` component (EPERM), a name too long or too deep (ENAMETOOLONG), links (ELOOP),
-    /// devices and unknown methods (EOPNOTSUPP), encrypted ones (EACCES), a name's second one
-    /// (EEXIST), and those whose content is not of the size and checksum that they claim (EBADMSG).
+    /// An archive's files become 0600, its folders 0700; those that root makes belong to the
+    /// archive's owner and group, so that a book which root expands stays its owner's. Refused are
+    /// a file that is no archive, or whose entries claim more than it can hold, or more than
+    /// 100,000 folders (EBADMSG), or more than the disk has room for (ENOSPC), all fatal; entries
+    /// with an absolute name or an empty, `.` or `..` component (EPERM), a name too long or too
+    /// deep (ENAMETOOLONG), links (ELOOP), devices and unknown methods (EOPNOTSUPP), encrypted ones
+    /// (EACCES), a name's second one (EEXIST), and those whose content is not of the size and
+    /// checksum that they claim (EBADMSG).
     [[nodiscard]] virtual int copy(const std::string& source, const std::string& destination,
                                    const Dictionary& options) = 0;
     /// Ends a copy, running or to come, within its current piece.

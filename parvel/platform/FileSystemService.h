@@ -12,7 +12,8 @@ namespace parvel {
 
 /// What a replacement keeps of the item that it replaces.
 enum class ReplaceOptions {
-    Default = 0,          ///< its mode and those of its attributes that the new item lacks
+    /// Its owner, group, access list and mode, and those of its attributes that the new item lacks.
+    Default = 0,
     NewMetadataOnly = 1,  ///< nothing: the new item's metadata alone
 };
 

@@ -15,6 +15,7 @@
 #include <string_view>
 
 #include "parvel/foundation/URL.h"
+#include "parvel/platform/linux/ItemContent.h"
 #include "parvel/platform/linux/ItemTree.h"
 #include "parvel/platform/linux/OpenBeneath.h"
 #include "parvel/platform/linux/Paths.h"
@@ -78,10 +79,25 @@ int checkContent(const ZipEntry& entry) {
     return canBeDelivered(entry, std::numeric_limits<std::uint64_t>::max()) ? 0 : EBADMSG;
 }
 
+/// Gives what is made to the archive's owner and group, where this process is root's: everybody
+/// else's new items are his, in the group that new items have there.
+class ArchiveOwner {
+public:
+    explicit ArchiveOwner(const struct stat& archive) : m_archive(archive) {}
+
+    /// 0 or the errno value; a file system that refuses is no error.
+    [[nodiscard]] int give(int item) const { return m_isRoot ? copyOwner(m_archive, item) : 0; }
+
+private:
+    const struct stat& m_archive;
+    bool m_isRoot = ::geteuid() == 0;
+};
+
 /// The folders below one that holds all; the one used last stays open.
 class FoldersBelow {
 public:
-    explicit FoldersBelow(FileDescriptor root) : m_root(std::move(root)) {}
+    FoldersBelow(FileDescriptor root, const ArchiveOwner& owner)
+        : m_root(std::move(root)), m_owner(owner) {}
 
     /// The open folder of that path, made with those on the way to it; negative with errno set.
     [[nodiscard]] int open(std::string_view path) {
@@ -103,11 +119,16 @@ private:
             const std::size_t end = std::min(path.find('/', start), path.size());
             const std::string component = path.substr(start, end - start);
             const int above = folder ? folder.get() : m_root.get();
-            if (::mkdirat(above, component.c_str(), 0700) != 0 && errno != EEXIST)
+            const bool isMade = ::mkdirat(above, component.c_str(), 0700) == 0;
+            if (!isMade && errno != EEXIST)
                 return {};
             FileDescriptor next = openBeneath(above, component.c_str(), O_PATH | O_DIRECTORY);
             if (!next)
                 return {};
+            if (const int error = isMade ? m_owner.give(next.get()) : 0) {
+                errno = error;
+                return {};
+            }
             folder = std::move(next);
             start = end + 1;
         }
@@ -115,16 +136,18 @@ private:
     }
 
     FileDescriptor m_root;
+    const ArchiveOwner& m_owner;
     FileDescriptor m_last;
     std::string m_lastPath;
 };
 
 class Expansion {
 public:
-    Expansion(LibzipArchive& archive, FileDescriptor root, const std::string& destination,
-              const CopierReports& reports)
+    Expansion(LibzipArchive& archive, const ArchiveOwner& owner, FileDescriptor root,
+              const std::string& destination, const CopierReports& reports)
         : m_archive(archive),
-          m_folders(std::move(root)),
+          m_owner(owner),
+          m_folders(std::move(root), owner),
           m_destination(destination),
           m_reports(reports) {}
 
@@ -172,7 +195,9 @@ private:
         if (!file)
             return m_reports.failed(path, errno);
 
-        int error = deliver(index, entry, file.get());
+        int error = m_owner.give(file.get());
+        if (error == 0)
+            error = deliver(index, entry, file.get());
         if (error == 0)
             error = m_disk.add(file.get(), entry.size);
         if (error == 0)
@@ -209,6 +234,7 @@ private:
     }
 
     LibzipArchive& m_archive;
+    const ArchiveOwner& m_owner;
     FoldersBelow m_folders;
     const std::string& m_destination;
     const CopierReports& m_reports;
@@ -312,7 +338,10 @@ int expandArchive(SourceArchive& source, const std::string& destination,
     FileDescriptor root(::open(destination.c_str(), O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
     if (!root)
         return reports.fatal(errno);
-    return Expansion(source.archive(), std::move(root), destination, reports).run();
+    const ArchiveOwner owner(source.status());
+    if (const int error = owner.give(root.get()))
+        return reports.fatal(error);
+    return Expansion(source.archive(), owner, std::move(root), destination, reports).run();
 }
 
 }  // namespace parvel::host

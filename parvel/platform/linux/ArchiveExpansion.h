@@ -26,6 +26,7 @@ public:
     [[nodiscard]] std::uint64_t size() const {
         return static_cast<std::uint64_t>(m_status.st_size);
     }
+    [[nodiscard]] const struct stat& status() const { return m_status; }
     [[nodiscard]] LibzipArchive& archive() { return *m_archive; }
 
 private:

@@ -8,6 +8,7 @@
 #include <string>
 
 #include "parvel/platform/linux/FileDescriptor.h"
+#include "parvel/platform/linux/ItemInheritance.h"
 #include "parvel/platform/linux/ItemTree.h"
 #include "parvel/platform/linux/Paths.h"
 #include "parvel/platform/linux/StagingFolder.h"
@@ -43,7 +44,7 @@ int makeFile(const std::string& path, const Data& bytes) {
     return file.close();
 }
 
-/// Puts the mode and attributes of the file that goes on the one that comes. A link has none.
+/// Puts what the file that goes has on the one that comes. A link has nothing.
 int inheritFrom(const std::string& oldFile, const std::string& newFile) {
     struct stat status {};
     if (::lstat(oldFile.c_str(), &status) != 0)

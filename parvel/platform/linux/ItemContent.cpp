@@ -29,6 +29,7 @@ constexpr std::uint64_t kSharedPiece = std::uint64_t{16} << 20;
 constexpr int kMostTries = 100;
 constexpr long kFuseMagic = 0x65735546;
 constexpr std::string_view kUserAttributes = "user.";
+constexpr const char* kAccessList = "system.posix_acl_access";
 
 /// The ways to copy a piece, best first: blocks are shared, or copied by the kernel, or by us.
 enum class PieceWay { Share, Range, Sendfile, Buffer };
@@ -173,6 +174,54 @@ int copyAttribute(int from, int to, const std::string& name, int flags) {
     return isLossTolerated(error, to) ? 0 : error;
 }
 
+/// What a file has beyond its mode; empty where there is nothing. None with errno set.
+std::optional<std::string> accessListOf(int file) {
+    auto list = wholeContent([file](char* room, std::size_t size) {
+        return ::fgetxattr(file, kAccessList, room, size);
+    });
+    const int error = errno;
+    if (!list && (error == ENODATA || hasNoAttributes(error, file)))
+        return std::string();
+    errno = error;
+    return list;
+}
+
+/// `isKept` tells whether the list is the other's afterwards. One may also have come from the
+/// folder, as the default for what is made there. A list is not given to another group, which it
+/// would let in.
+int copyAccessList(int from, int to, bool hasGroup, bool& isKept) {
+    const auto wanted = accessListOf(from);
+    const auto present = wanted ? accessListOf(to) : std::nullopt;
+    if (!present)
+        return errno;
+    isKept = *wanted == *present;
+    if (isKept || (!hasGroup && !wanted->empty()))
+        return 0;
+    const int result = wanted->empty()
+                           ? ::fremovexattr(to, kAccessList)
+                           : ::fsetxattr(to, kAccessList, wanted->data(), wanted->size(), 0);
+    isKept = result == 0;
+    if (isKept)
+        return 0;
+    const int error = errno;
+    // A list of users that are unknown here is invalid.
+    return error == EINVAL || isLossTolerated(error, to) ? 0 : error;
+}
+
+/// Network and other foreign file systems have their own words for it.
+bool isOwnerRefused(int error) {
+    return error == EPERM || error == EACCES || error == EINVAL || error == ENOTSUP ||
+           error == ENOSYS;
+}
+
+/// What can be kept of a mode, so that it lets nobody in whom it kept out.
+mode_t modeWithout(mode_t mode, bool hasGroup, bool hasAccessList) {
+    if (!hasAccessList)
+        return mode & (S_ISVTX | S_IRWXU);
+    const mode_t both = mode & (mode >> 3) & S_IRWXO;
+    return hasGroup ? mode & 01777 : (mode & (S_ISVTX | S_IRWXU)) | (both << 3) | both;
+}
+
 }  // namespace
 
 int copyContent(int from, int to, std::uint64_t size, const PieceReport& report) {
@@ -216,13 +265,39 @@ bool hasAttributesOf(int from, int to) {
            });
 }
 
-/// Owner and group first, since a change of owner drops mode bits; times last.
-int copyStatus(const struct stat& status, int to) {
-    if (::fchown(to, status.st_uid, status.st_gid) != 0 &&
-        ::fchown(to, static_cast<uid_t>(-1), status.st_gid) != 0 && errno == EIO)
-        return EIO;
-    if (::fchmod(to, status.st_mode & 01777) != 0 && errno != EPERM && errno != ENOTSUP)
+bool haveSameAccessList(int left, int right) {
+    const auto list = accessListOf(left);
+    return list && accessListOf(right) == list;
+}
+
+int copyOwner(const struct stat& status, int to) {
+    const auto give = [&](uid_t owner) {
+        return ::fchownat(to, "", owner, status.st_gid, AT_EMPTY_PATH) == 0 ? 0 : errno;
+    };
+    int error = give(status.st_uid);
+    if (isOwnerRefused(error))
+        error = give(static_cast<uid_t>(-1));
+    return isOwnerRefused(error) ? 0 : error;
+}
+
+/// The owner first, whose change drops bits of the mode; the mode last, which opens it.
+int copyAccess(int from, const struct stat& status, int to) {
+    if (const int error = copyOwner(status, to))
+        return error;
+    struct stat given {};
+    if (::fstat(to, &given) != 0)
         return errno;
+    const bool hasGroup = given.st_gid == status.st_gid;
+    bool hasAccessList = false;
+    if (const int error = copyAccessList(from, to, hasGroup, hasAccessList))
+        return error;
+    const mode_t mode = modeWithout(status.st_mode, hasGroup, hasAccessList);
+    return ::fchmod(to, mode) == 0 || errno == EPERM || errno == ENOTSUP ? 0 : errno;
+}
+
+int copyStatus(int from, const struct stat& status, int to) {
+    if (const int error = copyAccess(from, status, to))
+        return error;
     const std::array<timespec, 2> times{status.st_atim, status.st_mtim};
     if (::futimens(to, times.data()) != 0 && errno != EPERM && errno != ENOTSUP)
         return errno;

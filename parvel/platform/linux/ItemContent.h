@@ -27,7 +27,20 @@ using PieceReport = std::function<int(std::uint64_t copied)>;
 /// be told.
 [[nodiscard]] bool hasAttributesOf(int from, int to);
 
-/// Gives it owner and group as far as allowed, the mode without set-id bits, and the times.
-[[nodiscard]] int copyStatus(const struct stat& status, int to);
+/// Gives it the owner and group, or the group alone, as far as this process may; a host that
+/// refuses is no error. The descriptor may be one for the path alone.
+[[nodiscard]] int copyOwner(const struct stat& status, int to);
+
+/// Gives it owner and group as copyOwner does, the access list, or none, and the mode without
+/// set-id bits. Nobody is let in whom the other kept out: without its group, the group and all
+/// others are left what both of them had; without its access list, or with one but without its
+/// group, the owner alone is left his.
+[[nodiscard]] int copyAccess(int from, const struct stat& status, int to);
+
+/// Whether both have the same access list, or none; false where that can't be told.
+[[nodiscard]] bool haveSameAccessList(int left, int right);
+
+/// Gives it what copyAccess does, and the times.
+[[nodiscard]] int copyStatus(int from, const struct stat& status, int to);
 
 }  // namespace parvel::host

@@ -19,6 +19,7 @@
 #include "parvel/platform/ResourceQueries.h"
 #include "parvel/platform/Service.h"
 #include "parvel/platform/linux/HiddenItem.h"
+#include "parvel/platform/linux/ItemInheritance.h"
 #include "parvel/platform/linux/ItemTree.h"
 #include "parvel/platform/linux/Paths.h"
 #include "parvel/platform/linux/StagingFolder.h"

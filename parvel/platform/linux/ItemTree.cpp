@@ -38,7 +38,7 @@ int copyFile(int from, const struct stat& status, int toFolder, const char* name
         return error;
     if (const int error = copyAttributes(from, to.get(), /*onlyMissing=*/false))
         return error;
-    if (const int error = copyStatus(status, to.get()))
+    if (const int error = copyStatus(from, status, to.get()))
         return error;
     return to.close();
 }
@@ -78,7 +78,7 @@ int copyFolder(int from, const struct stat& status, int toFolder, const char* na
         return errno;
     if (const int error = copyAttributes(from, to.get(), /*onlyMissing=*/false))
         return error;
-    return copyStatus(status, to.get());
+    return copyStatus(from, status, to.get());
 }
 
 int copyEntry(int fromFolder, const char* fromName, int toFolder, const char* toName, int depth) {
@@ -289,36 +289,6 @@ int syncFolder(const std::string& path) {
     if (!folder)
         return errno == EACCES ? 0 : errno;
     return ::fsync(folder.get()) == 0 || errno == EINVAL || errno == ENOSYS ? 0 : errno;
-}
-
-bool hasToInherit(const std::string& oldItem, const std::string& newItem) {
-    const FileDescriptor from = openItem(AT_FDCWD, oldItem.c_str());
-    const FileDescriptor to = openItem(AT_FDCWD, newItem.c_str());
-    struct stat oldStatus {};
-    struct stat newStatus {};
-    if (!from || !to || ::fstat(from.get(), &oldStatus) != 0 || ::fstat(to.get(), &newStatus) != 0)
-        return true;
-    const bool isSameKind = S_ISDIR(oldStatus.st_mode) == S_ISDIR(newStatus.st_mode);
-    if (isSameKind && oldStatus.st_mode != newStatus.st_mode)
-        return true;
-    return !hasAttributesOf(from.get(), to.get());
-}
-
-int inheritMetadata(const std::string& oldItem, const std::string& newItem) {
-    const FileDescriptor from = openItem(AT_FDCWD, oldItem.c_str());
-    const FileDescriptor to = openItem(AT_FDCWD, newItem.c_str());
-    struct stat oldStatus {};
-    struct stat newStatus {};
-    if (!from || !to)
-        return errno == ELOOP ? 0 : errno;  // a link carries no metadata of its own
-    if (::fstat(from.get(), &oldStatus) != 0 || ::fstat(to.get(), &newStatus) != 0)
-        return errno;
-    if (const int error = copyAttributes(from.get(), to.get(), /*onlyMissing=*/true))
-        return error;
-    // A file's mode on a folder would close it, a folder's on a file would open it to be run.
-    if (S_ISDIR(oldStatus.st_mode) != S_ISDIR(newStatus.st_mode))
-        return 0;
-    return ::fchmod(to.get(), oldStatus.st_mode & 01777) == 0 || errno == EPERM ? 0 : errno;
 }
 
 }  // namespace parvel::host

@@ -9,10 +9,9 @@ namespace parvel::host {
 /// Whole items, files, links and folder trees, by descriptors: no link is followed below the item.
 /// Every function gives 0 or the errno value.
 
-/// Copies an item to a name where nothing stands: data, `user.` attributes, mode without set-id
-/// bits, owner and group as far as allowed, times. A link is copied as a link. A device, pipe or
-/// socket is refused with EOPNOTSUPP, a tree deeper than 200 folders with ELOOP. What was made
-/// stays after a failure: copy into a staging folder.
+/// Copies an item to a name where nothing stands: data, `user.` attributes, what copyStatus gives.
+/// A link is copied as a link. A device, pipe or socket is refused with EOPNOTSUPP, a tree deeper
+/// than 200 folders with ELOOP. What was made stays after a failure: copy into a staging folder.
 [[nodiscard]] int copyTree(const std::string& source, const std::string& destination);
 
 /// Removes an item with all that is in it. `removedAny`, where given, tells whether anything went
@@ -28,13 +27,6 @@ namespace parvel::host {
 [[nodiscard]] int syncItem(const std::string& path);
 /// Writes a folder's entries through to the disk; a file system that can't is no error.
 [[nodiscard]] int syncFolder(const std::string& path);
-
-/// Whether an item that takes another's place lacks anything of what inheritMetadata gives it, or
-/// that can't be told.
-[[nodiscard]] bool hasToInherit(const std::string& oldItem, const std::string& newItem);
-/// Puts the mode of the old item, and those of its `user.` attributes that the new one lacks, on
-/// the new one.
-[[nodiscard]] int inheritMetadata(const std::string& oldItem, const std::string& newItem);
 
 /// Whether two results of stat are of one item.
 [[nodiscard]] inline bool isSameItem(const struct stat& left, const struct stat& right) {

@@ -185,7 +185,7 @@ private:
 
     static int copyMetadata(int from, const struct stat& status, int to) {
         const int error = copyAttributes(from, to);
-        return error != 0 ? error : copyStatus(status, to);
+        return error != 0 ? error : copyStatus(from, status, to);
     }
 
     const struct stat& m_root;  ///< the copy's own folder

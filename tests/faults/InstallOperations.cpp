@@ -54,6 +54,7 @@ std::vector<Layout> withoutModes(const Layout& layout, const std::string& place,
 std::vector<Operation> bookInstalls() {
     const Layout zip{{"from/a.epub", "zip 1"}};
     const Layout package{{"from/a.epub", "package 1"}};
+    const Layout closed{{"from/a.epub", "package 1 closed"}};
     const Layout zipOverPackage{{"from/a.epub", "zip 2"}, {"to/a.epub", "package 1"}};
     const Layout zipForPackage{{"from/a.epub", "zip 2"}, {"to/old.epub", "package 1"}};
     const Layout newZip{{"from/a.epub", "zip 2"}};
@@ -102,6 +103,12 @@ std::vector<Operation> bookInstalls() {
          .run = installing({.from = "from/a.epub"}),
          .succeeded = withoutModes(package, "to/a.epub", "package 1"),
          .alsoHolds = identityComesLast("to/a.epub")},
+        {.name = "InstallsAClosedPackage",
+         .before = closed,
+         .after = with(closed, "to/a.epub", "package 1 closed private"),
+         .run = installing({.from = "from/a.epub"}),
+         .killed = withEach(closed, "to/a.epub", {"package 1 closed but for modes"}),
+         .succeeded = withoutModes(closed, "to/a.epub", "package 1 closed")},
         {.name = "InstallsAPackageThroughAFolder",
          .before = package,
          .after = with(package, "to/a.epub", "package 1 private"),

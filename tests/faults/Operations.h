@@ -25,6 +25,9 @@ struct Operation {
     std::vector<Layout> failed = {};
     /// What else it may leave with success: a step failed whose failure it passes over.
     std::vector<Layout> succeeded = {};
+    /// What else it may leave where a name is held by an empty item that could not be removed: it
+    /// counted past that one.
+    std::vector<Layout> besideHeldNames = {};
     /// What more must hold whatever happened; what is wrong, or nothing.
     std::function<std::string(const TestLibrary& library)> alsoHolds = nullptr;
     /// Made ready before it runs, where a layout does not say all.

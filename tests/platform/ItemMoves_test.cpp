@@ -1,6 +1,5 @@
 // Moves as an ordinary user makes them, where modes and owners stand in the way.
 
-#include <sys/fsuid.h>
 #include <sys/stat.h>
 #include <sys/xattr.h>
 #include <unistd.h>
@@ -41,6 +40,10 @@ protected:
             ASSERT_EQ(lchown(path.c_str(), kOrdinaryUser, kOrdinaryUser), 0);
         }
     }
+    void makeFolder(const char* name) const {
+        fs::create_directory(m_folder / name);
+        own(m_folder / name);
+    }
     /// A package of one file in a folder of its own, whose folders have the mode.
     void makePackage(const fs::path& path, fs::perms mode) {
         fs::create_directories(path / "OPS");
@@ -52,9 +55,12 @@ protected:
     }
     template <class Act>
     bool asOrdinaryUser(Act act) {
-        setfsuid(geteuid() == 0 ? kOrdinaryUser : geteuid());
+        const uid_t user = geteuid();
+        if (user == 0) {
+            EXPECT_EQ(seteuid(kOrdinaryUser), 0);
+        }
         const bool result = act();
-        setfsuid(geteuid());
+        EXPECT_EQ(seteuid(user), 0);
         return result;
     }
     static fs::perms modeOf(const fs::path& path) { return fs::status(path).permissions(); }
@@ -88,6 +94,87 @@ TEST_F(OrdinaryUsersMoves, APackageThatForbidsChangesMovesAcrossFileSystems) {
     EXPECT_EQ(modeOf(m_other / "b.epub"), fs::perms{0555});
     EXPECT_EQ(modeOf(m_other / "b.epub/OPS"), fs::perms{0555});
     EXPECT_TRUE(fs::exists(m_other / "b.epub/OPS/text"));
+}
+
+TEST_F(OrdinaryUsersMoves, APackageThatForbidsChangesMovesToAnotherFolder) {
+    makePackage(m_folder.path() / "a.epub", fs::perms{0555});
+    makeFolder("to");
+
+    EXPECT_TRUE(asOrdinaryUser([&] {
+        return m_service->moveItem(m_folder.url("a.epub"), m_folder.url("to/b.epub"), &m_error);
+    }));
+
+    EXPECT_FALSE(m_error);
+    EXPECT_EQ(namesIn(m_folder.path()), Names{"to"});
+    EXPECT_EQ(namesIn(m_folder / "to"), Names{"b.epub"});
+    EXPECT_EQ(modeOf(m_folder / "to/b.epub"), fs::perms{0555});
+    EXPECT_TRUE(fs::exists(m_folder / "to/b.epub/OPS/text"));
+}
+
+TEST_F(OrdinaryUsersMoves, APackageThatForbidsChangesKeepsItsModeWhereItCannotMove) {
+    if (geteuid() != 0)
+        GTEST_SKIP() << "only root can make what its user can't change";
+    makePackage(m_folder.path() / "a.epub", fs::perms{0555});
+    fs::create_directory(m_folder / "to");
+
+    EXPECT_FALSE(asOrdinaryUser([&] {
+        return m_service->moveItem(m_folder.url("a.epub"), m_folder.url("to/a.epub"), &m_error);
+    }));
+
+    EXPECT_EQ(m_error, makePOSIXError(EACCES, m_folder.url("to/a.epub")));
+    EXPECT_EQ(namesIn(m_folder.path()), (Names{"a.epub", "to"}));
+    EXPECT_EQ(namesIn(m_folder / "to"), Names{});
+    EXPECT_EQ(modeOf(m_folder / "a.epub"), fs::perms{0555});
+}
+
+TEST_F(OrdinaryUsersMoves, AnothersPackageThatForbidsChangesStays) {
+    if (geteuid() != 0)
+        GTEST_SKIP() << "only root can make what its user can't change";
+    makePackage(m_folder.path() / "a.epub", fs::perms{0555});
+    ASSERT_EQ(chown((m_folder / "a.epub").c_str(), 0, 0), 0);
+    makeFolder("to");
+
+    EXPECT_FALSE(asOrdinaryUser([&] {
+        return m_service->moveItem(m_folder.url("a.epub"), m_folder.url("to/a.epub"), &m_error);
+    }));
+
+    EXPECT_EQ(m_error, makePOSIXError(EACCES, m_folder.url("to/a.epub")));
+    EXPECT_EQ(namesIn(m_folder.path()), (Names{"a.epub", "to"}));
+    EXPECT_EQ(modeOf(m_folder / "a.epub"), fs::perms{0555});
+}
+
+TEST_F(OrdinaryUsersMoves, APackageThatForbidsChangesReplacesAnotherInAnotherFolder) {
+    makePackage(m_folder.path() / "new", fs::perms{0555});
+    makeFolder("to");
+    makePackage(m_folder.path() / "to/old", fs::perms{0555});
+
+    EXPECT_TRUE(asOrdinaryUser([&] {
+        return m_service->replaceItem(m_folder.url("to/old"), m_folder.url("new"),
+                                      ReplaceOptions::NewMetadataOnly, nullptr, &m_error);
+    }));
+
+    EXPECT_FALSE(m_error);
+    EXPECT_EQ(namesIn(m_folder.path()), Names{"to"});
+    EXPECT_EQ(namesIn(m_folder / "to"), Names{"old"});
+    EXPECT_EQ(modeOf(m_folder / "to/old"), fs::perms{0555});
+    EXPECT_EQ(m_folder.read("to/old/OPS/text"), "new");
+}
+
+TEST_F(OrdinaryUsersMoves, APackageReplacesOneThatForbidsChangesInAnotherFolder) {
+    makePackage(m_folder.path() / "new", fs::perms{0755});
+    makeFolder("to");
+    makePackage(m_folder.path() / "to/old", fs::perms{0555});
+
+    EXPECT_TRUE(asOrdinaryUser([&] {
+        return m_service->replaceItem(m_folder.url("to/old"), m_folder.url("new"),
+                                      ReplaceOptions::NewMetadataOnly, nullptr, &m_error);
+    }));
+
+    EXPECT_FALSE(m_error);
+    EXPECT_EQ(namesIn(m_folder.path()), Names{"to"});
+    EXPECT_EQ(namesIn(m_folder / "to"), Names{"old"});
+    EXPECT_EQ(modeOf(m_folder / "to/old"), fs::perms{0755});
+    EXPECT_EQ(m_folder.read("to/old/OPS/text"), "new");
 }
 
 TEST_F(OrdinaryUsersMoves, APackageThatForbidsChangesReplacesAnotherAcrossFileSystems) {

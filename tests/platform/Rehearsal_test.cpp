@@ -293,7 +293,26 @@ TEST_F(RehearsedFolder, PermissionsThatForbidAChangeAreSeen) {
     expectTheSame({move("closed/a.pdf", "open/a.pdf"), move("open/b.pdf", "closed/b.pdf"),
                    remove("closed/a.pdf"), move("sticky/c.pdf", "open/c.pdf"),
                    remove("sticky/c.pdf"), replace("closed/a.pdf", "open/b.pdf"),
-                   trash("closed/a.pdf"), move("open/b.pdf", "sticky/b.pdf")});
+                   trash("closed/a.pdf"), move("open/b.pdf", "sticky/b.pdf"),
+                   move("open/own", "closed/own"), move("open/own", "sticky/own")});
+}
+
+TEST_F(RehearsedFolder, AFolderThatForbidsChangesMovesForItsOwnerAlone) {
+    m_folder.write("theirs/a/x", "1");
+    m_folder.write("to/b/x", "1");
+    for (const char* name : {"", "theirs", "to"})
+        ASSERT_EQ(chmod((m_folder.path() / name).c_str(), 0777), 0);
+    ASSERT_EQ(chmod((m_folder / "theirs/a").c_str(), 0555), 0);
+    const UnprivilegedUser user;
+    if (geteuid() == 0)
+        GTEST_SKIP() << "the user can't be changed";
+    for (const char* name : {"own/a", "own/b"}) {
+        m_folder.write(std::string(name) + "/x", "2");
+        ASSERT_EQ(chmod((m_folder / name).c_str(), 0555), 0);
+    }
+
+    expectTheSame({move("theirs/a", "to/a"), move("own/a", "to/a"), exists("own/a"),
+                   replace("to/a", "own/b"), exists("own/b"), replace("to/a", "theirs/a")});
 }
 
 TEST_F(RehearsedFolder, AMoveToAnotherFileSystemIsForeseen) {

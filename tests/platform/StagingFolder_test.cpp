@@ -85,6 +85,25 @@ TEST_F(Staging, WhatNobodyHoldsIsCleared) {
         EXPECT_EQ(entry.path().filename(), "synced");
 }
 
+TEST_F(Staging, WhatForbidsChangesIsClearedByAnOrdinaryUserToo) {
+    if (geteuid() != 0)
+        GTEST_SKIP() << "only root can become another user";
+    const std::string left = m_folder / ".parvel-stage-left";
+    m_folder.write(".parvel-stage-left/item/OPS/text", "1");
+    for (const char* name : {"", "/item", "/item/OPS", "/item/OPS/text"})
+        ASSERT_EQ(chown((left + name).c_str(), kOtherUser, kOtherUser), 0);
+    for (const char* name : {"/item/OPS", "/item", ""})
+        fs::permissions(left + name, fs::perms{0555});
+    ASSERT_EQ(chown(m_folder.path().c_str(), kOtherUser, kOtherUser), 0);
+    ASSERT_EQ(seteuid(kOtherUser), 0);
+
+    const std::string place = placeOfStagingFor(m_folder.path());
+    ASSERT_EQ(seteuid(0), 0);
+
+    EXPECT_EQ(place, m_folder.path());
+    EXPECT_FALSE(fs::exists(left));
+}
+
 TEST_F(Staging, WhatAnotherHoldsStays) {
     const std::string target = m_folder.path();
     const auto held = HiddenItem::makeFolderIn(target, m_error);

@@ -9,7 +9,6 @@
 #include "parvel/platform/linux/ItemMoves.h"
 
 #include <fcntl.h>
-#include <stdio.h>
 #include <sys/stat.h>
 
 #include <cerrno>
@@ -20,6 +19,7 @@
 #include "parvel/platform/Service.h"
 #include "parvel/platform/linux/HiddenItem.h"
 #include "parvel/platform/linux/ItemInheritance.h"
+#include "parvel/platform/linux/ItemRenames.h"
 #include "parvel/platform/linux/ItemTree.h"
 #include "parvel/platform/linux/Paths.h"
 #include "parvel/platform/linux/StagingFolder.h"
@@ -29,66 +29,6 @@ namespace parvel::host {
 namespace {
 
 constexpr std::string_view kAsidePrefix = ".parvel-aside-";
-
-int status(const std::string& path, struct stat& result) {
-    return ::lstat(path.c_str(), &result) == 0 ? 0 : errno;
-}
-
-int plainRename(const std::string& source, const std::string& destination) {
-    return ::rename(source.c_str(), destination.c_str()) == 0 ? 0 : errno;
-}
-
-int renameWithFlags(const std::string& source, const std::string& destination, unsigned flags) {
-    return ::renameat2(AT_FDCWD, source.c_str(), AT_FDCWD, destination.c_str(), flags) == 0 ? 0
-                                                                                            : errno;
-}
-
-bool isFlagUnsupported(int error) {
-    return error == EINVAL || error == ENOSYS || error == ENOTSUP;
-}
-
-bool isLinkUnsupported(int error) {
-    return error == EPERM || error == ENOTSUP || error == ENOSYS || error == EMLINK;
-}
-
-/// Takes a free name by an exclusively made file, which the rename then replaces in one step.
-int renameOntoPlaceholder(const std::string& source, const std::string& destination) {
-    struct stat made {};
-    struct stat named {};
-    const FileDescriptor placeholder(
-        ::open(destination.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600));
-    if (!placeholder)
-        return errno;
-    int error = ::fstat(placeholder.get(), &made) == 0 ? 0 : errno;
-    const bool isKnown = error == 0;
-    if (error == 0)
-        error = plainRename(source, destination);
-    if (error != 0 && (!isKnown || status(destination, named) != 0 || isSameItem(made, named)))
-        ::unlink(destination.c_str());
-    return error;
-}
-
-/// For file systems whose rename can't refuse a taken name.
-int renameExclusivelyWithoutFlag(const std::string& source, const std::string& destination) {
-    struct stat item {};
-    if (const int error = status(source, item))
-        return error;
-    if (S_ISDIR(item.st_mode)) {
-        if (::mkdir(destination.c_str(), 0700) != 0)
-            return errno;
-        const int error = plainRename(source, destination);
-        if (error != 0)
-            ::rmdir(destination.c_str());
-        return error;
-    }
-    if (::linkat(AT_FDCWD, source.c_str(), AT_FDCWD, destination.c_str(), 0) != 0)
-        return isLinkUnsupported(errno) ? renameOntoPlaceholder(source, destination) : errno;
-    if (::unlink(source.c_str()) == 0)
-        return 0;
-    const int error = errno;
-    ::unlink(destination.c_str());
-    return error;
-}
 
 int syncParents(const std::string& source, const std::string& destination) {
     const std::string from = parentFolderOf(source);
@@ -115,7 +55,7 @@ bool leadsInto(const std::string& item, const std::string& path) {
 /// Whether a folder is the item or lies below it: a copy into it would copy itself.
 bool liesWithin(const std::string& folder, const std::string& item) {
     struct stat copied {};
-    return status(item, copied) == 0 && S_ISDIR(copied.st_mode) && leadsInto(item, folder);
+    return itemStatus(item, copied) == 0 && S_ISDIR(copied.st_mode) && leadsInto(item, folder);
 }
 
 std::optional<StagedCopy> stageCopy(const std::string& source, const std::string& target,
@@ -137,12 +77,7 @@ std::optional<StagedCopy> stageCopy(const std::string& source, const std::string
     return StagedCopy{std::move(*folder), std::move(path)};
 }
 
-bool isFolder(const std::string& path) {
-    struct stat item {};
-    return status(path, item) == 0 && S_ISDIR(item.st_mode);
-}
-
-/// A folder that forbids changes can't be renamed into another parent, only within it.
+/// Closed again, and hidden still, before it gets its final name.
 int publishClosedFolder(const std::string& staged, const std::string& destination) {
     int error = 0;
     const auto beside = HiddenItem::bring(staged, parentFolderOf(destination), error);
@@ -150,9 +85,8 @@ int publishClosedFolder(const std::string& staged, const std::string& destinatio
 }
 
 int publish(const StagedCopy& staged, const std::string& destination) {
-    int error = renameExclusively(staged.path, destination);
-    if (error == EACCES && isFolder(staged.path))
-        error = publishClosedFolder(staged.path, destination);
+    int error = isClosedFolder(staged.path) ? publishClosedFolder(staged.path, destination)
+                                            : renameExclusively(staged.path, destination);
     if (error != 0)
         return error;
     error = syncFolder(parentFolderOf(destination));
@@ -229,7 +163,7 @@ int takePlaceByStepAside(const std::string& existing, const std::string& replace
 /// the old one is hidden in the next.
 int takePlaceByExchange(const std::string& existing, const std::string& replacement,
                         const LastStep& lastStep) {
-    int error = renameWithFlags(replacement, existing, RENAME_EXCHANGE);
+    int error = exchangeNames(replacement, existing);
     if (isFlagUnsupported(error)) {
         // The kernel says the same of a folder and what lies in it; that may not step aside.
         return liesWithin(parentFolderOf(replacement), existing) ||
@@ -241,13 +175,13 @@ int takePlaceByExchange(const std::string& existing, const std::string& replacem
         return error;
     auto old = HiddenItem::hide(replacement, error);
     if (!old) {
-        (void)renameWithFlags(replacement, existing, RENAME_EXCHANGE);
+        (void)exchangeNames(replacement, existing);
         return error;
     }
     error = settle(existing, lastStep);
     if (error != 0 && renameExclusively(old->path(), replacement) == 0) {
         old->release();
-        (void)renameWithFlags(replacement, existing, RENAME_EXCHANGE);
+        (void)exchangeNames(replacement, existing);
     }
     return error;
 }
@@ -261,7 +195,7 @@ int takePlace(const std::string& existing, const std::string& replacement,
 }
 
 /// Replaces by a staged copy: across file systems, and where the new item has to change before it
-/// takes the place.
+/// takes the place, or can't be moved there as it is.
 int replaceByCopy(const std::string& existing, const std::string& replacement,
                   ReplaceOptions options) {
     int error = 0;
@@ -292,7 +226,7 @@ int replaceByOtherName(const std::string& existing, const std::string& replaceme
     if (isSameName)
         return 0;
     struct stat item {};
-    if (const int error = status(replacement, item))
+    if (const int error = itemStatus(replacement, item))
         return error;
     // One name in two spellings, on a file system that ignores case: only its spelling changes.
     if (item.st_nlink < 2 || S_ISDIR(item.st_mode))
@@ -301,11 +235,6 @@ int replaceByOtherName(const std::string& existing, const std::string& replaceme
 }
 
 }  // namespace
-
-int renameExclusively(const std::string& source, const std::string& destination) {
-    const int error = renameWithFlags(source, destination, RENAME_NOREPLACE);
-    return isFlagUnsupported(error) ? renameExclusivelyWithoutFlag(source, destination) : error;
-}
 
 int moveExclusively(const std::string& source, const std::string& destination) {
     int error = renameExclusively(source, destination);
@@ -329,17 +258,17 @@ int copyExclusively(const std::string& source, const std::string& destination) {
 bool isLinkInto(const std::string& existing, const std::string& replacement) {
     struct stat oldItem {};
     struct stat newItem {};
-    return status(replacement, newItem) == 0 && S_ISLNK(newItem.st_mode) &&
-           status(existing, oldItem) == 0 && !S_ISLNK(oldItem.st_mode) &&
+    return itemStatus(replacement, newItem) == 0 && S_ISLNK(newItem.st_mode) &&
+           itemStatus(existing, oldItem) == 0 && !S_ISLNK(oldItem.st_mode) &&
            leadsInto(existing, replacement);
 }
 
 int replace(const std::string& existing, const std::string& replacement, ReplaceOptions options) {
     struct stat oldItem {};
     struct stat newItem {};
-    if (const int error = status(replacement, newItem))
+    if (const int error = itemStatus(replacement, newItem))
         return error;
-    const int existingError = status(existing, oldItem);
+    const int existingError = itemStatus(existing, oldItem);
     if (existingError == ENOENT)
         return moveExclusively(replacement, existing);
     if (existingError != 0)
@@ -358,7 +287,10 @@ int replace(const std::string& existing, const std::string& replacement, Replace
     const int error = takePlace(existing, replacement, [&] {
         return from == parentFolderOf(existing) ? 0 : syncFolder(from);
     });
-    return error == EXDEV ? replaceByCopy(existing, replacement, options) : error;
+    // Folders that forbid changes can't be exchanged between two parents.
+    const bool isRefused =
+        error == EACCES && (isClosedFolder(existing) || isClosedFolder(replacement));
+    return error == EXDEV || isRefused ? replaceByCopy(existing, replacement, options) : error;
 }
 
 }  // namespace parvel::host

@@ -12,9 +12,6 @@ namespace parvel::host {
 /// Moves to a name where nothing stands, EEXIST otherwise, whatever the two file systems can do.
 [[nodiscard]] int moveExclusively(const std::string& source, const std::string& destination);
 
-/// Only the rename of it: EXDEV where the two lie on different file systems.
-[[nodiscard]] int renameExclusively(const std::string& source, const std::string& destination);
-
 /// Copies to a name where nothing stands; the copy appears whole or not at all.
 [[nodiscard]] int copyExclusively(const std::string& source, const std::string& destination);
 
@@ -23,7 +20,9 @@ namespace parvel::host {
 [[nodiscard]] bool isLinkInto(const std::string& existing, const std::string& replacement);
 
 /// Puts the replacement in the existing item's place, and moves it there when nothing stands there.
-/// EINVAL for a link into the existing item.
+/// EINVAL for a link into the existing item. Where the file system can't exchange two names, the
+/// old item steps aside as `.parvel-aside-<random>`; it is left so, whole, by a kill in between,
+/// and where the step and then, twice, the way back fail.
 [[nodiscard]] int replace(const std::string& existing, const std::string& replacement,
                           ReplaceOptions options);
 

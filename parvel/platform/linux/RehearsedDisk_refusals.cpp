@@ -37,6 +37,17 @@ int readError(const std::string& path) {
     return accessError(path, S_ISDIR(status.st_mode) ? R_OK | X_OK : R_OK);
 }
 
+/// Whether an item could get another parent: a folder has it written into itself, for which its
+/// owner opens it.
+int parentingError(const std::string& path) {
+    struct stat status {};
+    const int error = accessError(path, W_OK);
+    if (error != EACCES || ::lstat(path.c_str(), &status) != 0)
+        return error;
+    const bool canBeOpened = status.st_uid == ::geteuid() && (status.st_mode & S_IWUSR) == 0;
+    return canBeOpened ? accessError(path, R_OK) : error;
+}
+
 /// In a folder with the sticky bit only the owners of the folder and of the item may take it away.
 bool isHeldByStickyBit(const std::string& folder, const std::string& item) {
     struct stat above {};
@@ -123,9 +134,8 @@ int RehearsedDisk::renameError(const std::string& source, const std::string& des
         return error;
     if (const int error = changeError(destination))
         return error;
-    // A folder that moves gets another parent written into it.
     const Entry item = entryAt(source);
-    return from != to && isFolder(source) && item.kind == Kind::Real ? accessError(item.real, W_OK)
+    return from != to && isFolder(source) && item.kind == Kind::Real ? parentingError(item.real)
                                                                      : 0;
 }
 
@@ -169,7 +179,11 @@ int RehearsedDisk::replaceError(const std::string& existing, const std::string& 
     if (!isSameMount(parentFolderOf(existing), parentFolderOf(replacement)))
         return readError(item.real);
     const bool changesParent = parentFolderOf(existing) != parentFolderOf(replacement);
-    return changesParent && isFolder(replacement) ? accessError(item.real, W_OK) : 0;
+    if (!changesParent || !isFolder(replacement))
+        return 0;
+    const int error = parentingError(item.real);
+    // What can't be moved there as it is, is copied.
+    return error == 0 && accessError(item.real, W_OK) != 0 ? readError(item.real) : error;
 }
 
 }  // namespace parvel::host

@@ -7,6 +7,7 @@
 
 #include "parvel/foundation/URL.h"
 #include "parvel/platform/linux/ItemMoves.h"
+#include "parvel/platform/linux/ItemRenames.h"
 #include "parvel/platform/linux/ItemTree.h"
 #include "parvel/platform/linux/Paths.h"
 #include "parvel/platform/linux/TrashFolders.h"

@@ -277,6 +277,30 @@ TEST_P(Faults, AKillCostsNothing) {
     });
 }
 
+/// Where an item has to step aside for another, and that one turns out to lie on another file
+/// system.
+class WaysBack : public Faults {};
+
+TEST_P(WaysBack, AnItemThatStepsAsideComesBackPastAFailedCall) {
+    const std::vector<const char*> calls = callsOfWholeRun();
+    // The name that was held for the other one is free again before the way back.
+    const auto freed = std::find(calls.begin(), calls.end(), std::string_view("rmdir"));
+    ASSERT_GE(calls.end() - freed, 4);
+
+    for (auto call = freed + 1; call != freed + 4; ++call)
+        tryTrap({Trap::Act::Fail, static_cast<std::size_t>(call - calls.begin()), EIO}, calls);
+}
+
+Operation operationOfName(std::string_view name) {
+    const auto isNamed = [&](const Operation& operation) { return operation.name == name; };
+    return *std::find_if(operations().begin(), operations().end(), isNamed);
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    WithoutRenameFlags, WaysBack,
+    ::testing::Combine(::testing::Values(operationOfName("ReplacesAPackageAcross")),
+                       ::testing::Values(kHosts[1])));
+
 INSTANTIATE_TEST_SUITE_P(Everywhere, Faults,
                          ::testing::Combine(::testing::ValuesIn(operations()),
                                             ::testing::ValuesIn(kHosts)),

@@ -137,8 +137,15 @@ int takePlaceOfFile(const std::string& existing, const std::string& replacement,
     return error;
 }
 
+/// Tried once more where a call fails, since until then the old item is hidden.
+int renameBack(const std::string& aside, const std::string& existing) {
+    const int error = renameExclusively(aside, existing);
+    return error == 0 ? 0 : renameExclusively(aside, existing);
+}
+
 /// For file systems that can't exchange two names: the old item steps aside, under a hidden name
-/// that nobody clears until the new one stands in its place, and comes back on a failure.
+/// that nobody clears until the new one stands in its place, and comes back on a failure. It stays
+/// hidden, whole, where the way back fails twice.
 int takePlaceByStepAside(const std::string& existing, const std::string& replacement,
                          const LastStep& lastStep) {
     const std::string aside = pathAppending(parentFolderOf(existing), randomName(kAsidePrefix));
@@ -146,7 +153,7 @@ int takePlaceByStepAside(const std::string& existing, const std::string& replace
     if (error != 0)
         return error;
     if ((error = renameExclusively(replacement, existing)) != 0) {
-        (void)renameExclusively(aside, existing);
+        (void)renameBack(aside, existing);
         return error;
     }
     auto old = HiddenItem::hide(aside, error);
@@ -154,7 +161,7 @@ int takePlaceByStepAside(const std::string& existing, const std::string& replace
         error = settle(existing, lastStep);
     if (error == 0 || renameExclusively(existing, replacement) != 0)
         return error;
-    if (renameExclusively(old ? old->path() : aside, existing) == 0 && old)
+    if (renameBack(old ? old->path() : aside, existing) == 0 && old)
         old->release();
     return error;
 }

@@ -51,7 +51,8 @@ MutableAssetPtr PVMutableAssetMetadata::initWithURL_dictionary_validate(
     record->setAssetType(PVAssetTypeUnknown);
 
     // With no URL set, the record's own is the one of the dictionary's "path".
-    const std::optional<URL> urlToUse = url ? url : record->url();
+    const std::optional<URL> ownURL = url ? std::nullopt : record->url();
+    const std::optional<URL>& urlToUse = url ? url : ownURL;
     if (urlToUse) {
         record->setUrl(urlToUse);
         if (!record->sourceURL())

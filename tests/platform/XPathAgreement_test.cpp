@@ -146,6 +146,22 @@ TEST(XPathAgreement, BothTreesAcceptTheSameDamagedDocuments) {
     EXPECT_GT(accepted, 10);
 }
 
+TEST(XPathSplitter, SplitsEachTextAsThoughItWereTheFirst) {
+    XPathSplitter splitter;
+    for (const std::string_view text :
+         {"a", "declare namespace o='urn:o'; /o:a", "declare namespace o='urn:o'; /o:b", "b",
+          "declare namespace o='urn:o'; declare namespace p='urn:p'; a",
+          "declare namespace o='urn:o'; declare namespace p='urn:q'; a",
+          "declare namespace o='urn:o';  declare namespace p", "declare namespace o='urn:o';", "",
+          "declare namespace o='urn:o';declare namespace p='urn:p';"}) {
+        const XPathText expected = splitPrologue(text);
+        const XPathText& split = splitter.split(text);
+        EXPECT_EQ(split.prologue, expected.prologue) << text;
+        EXPECT_EQ(split.bindings, expected.bindings) << text;
+        EXPECT_EQ(split.expression, expected.expression) << text;
+    }
+}
+
 TEST(LocationPath, LeavesEverythingElseToXPath) {
     const LocationPath::Bindings bindings{{"o", "urn:o"}, {"none", ""}};
     for (const std::string_view expression : {"",

@@ -17,14 +17,11 @@ bool isNameStart(char c) {
     return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || c == '_';
 }
 
-bool isAscii(char c) {
-    return static_cast<unsigned char>(c) < 0x80;
-}
-
 /// A name without a colon, of the characters that every edition of XML allows.
 bool isPlainName(std::string_view name) {
-    return !name.empty() && isNameStart(name[0]) && name.find(':') == std::string_view::npos &&
-           std::all_of(name.begin(), name.end(), isAscii);
+    return !name.empty() && isNameStart(name[0]) &&
+           std::all_of(name.begin(), name.end(),
+                       [](char c) { return static_cast<unsigned char>(c) < 0x80 && c != ':'; });
 }
 
 /// Others may be no characters of XML, which libxml2 tells.

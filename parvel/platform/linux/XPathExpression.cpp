@@ -8,6 +8,7 @@
 namespace parvel {
 namespace {
 
+constexpr std::string_view kDeclaration = "declare namespace ";
 constexpr std::size_t kMaximumLength = 4096;
 constexpr std::size_t kFreeOperations = 50'000'000;
 constexpr std::uint64_t kMaximumWork = 2'000'000'000;
@@ -59,10 +60,9 @@ bool searchesText(std::string_view expression) {
 
 XPathText splitPrologue(std::string_view text) {
     XPathText result;
-    result.bindings.reserve(2);
     XPathScanner scanner(text);
     std::string_view rest = text;
-    while (scanner.take("declare namespace ")) {
+    while (scanner.take(kDeclaration)) {
         const std::string_view prefix = scanner.takeName();
         std::string_view name;
         if (prefix.empty() || !scanner.take("=") || !scanner.takeLiteral(name) ||
@@ -74,6 +74,17 @@ XPathText splitPrologue(std::string_view text) {
     result.prologue = text.substr(0, text.size() - rest.size());
     result.expression = rest;
     return result;
+}
+
+const XPathText& XPathSplitter::split(std::string_view text) {
+    const bool isRepeated = text.starts_with(m_prologue) &&
+                            !XPathScanner(text.substr(m_prologue.size())).take(kDeclaration);
+    if (!isRepeated) {
+        m_prologue = splitPrologue(text).prologue;
+        m_text = splitPrologue(m_prologue);
+    }
+    m_text.expression = text.substr(m_prologue.size());
+    return m_text;
 }
 
 std::size_t xpathOperationLimit(std::string_view expression, const XPathScope& scope) {

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <string>
 #include <string_view>
 #include <utility>
 #include <vector>
@@ -10,12 +11,26 @@ namespace parvel {
 /// An expression with its prologue of `declare namespace p="name"; ` taken apart. The views are
 /// into the text that was split.
 struct XPathText {
+    using Bindings = std::vector<std::pair<std::string_view, std::string_view>>;
+
     std::string_view prologue;
-    std::vector<std::pair<std::string_view, std::string_view>> bindings;  ///< prefix and name
+    Bindings bindings;  ///< prefix and name
     std::string_view expression;
 };
 
 [[nodiscard]] XPathText splitPrologue(std::string_view text);
+
+/// Splits the texts that a document is asked for, most of which have the prologue of the one
+/// before.
+class XPathSplitter {
+public:
+    /// Valid until the next text is split.
+    const XPathText& split(std::string_view text);
+
+private:
+    std::string m_prologue;
+    XPathText m_text;
+};
 
 /// What an evaluation may cost over a document.
 struct XPathScope {

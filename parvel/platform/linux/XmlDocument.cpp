@@ -36,6 +36,7 @@ private:
 
     Data m_bytes;
     std::optional<XmlElementTree> m_elements;
+    mutable XPathSplitter m_splitter;
     mutable std::optional<XPathTree> m_tree;
 };
 
@@ -51,7 +52,7 @@ HostXmlDocument::~HostXmlDocument() {
 
 XPathResult HostXmlDocument::evaluate(const void* context, std::string_view expression,
                                       ErrorOut error) const {
-    const XPathText text = splitPrologue(expression);
+    const XPathText& text = m_splitter.split(expression);
     const Element* element = m_elements->elementAt(context);
     const void* first = nullptr;
     bool evaluated = false;

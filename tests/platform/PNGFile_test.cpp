@@ -47,6 +47,22 @@ TEST(PNGFile, LeavesTheGapsBetweenRowsOut) {
     EXPECT_THAT(decoded(fileOf(image))->pixels, ElementsAreArray(pixelsOf(image)));
 }
 
+TEST(PNGFile, OfRowsThatRepeatIsReadBackEqual) {
+    const std::vector<std::uint32_t> rows{0xFFFFFFFF, 0xFFFFFFFF, 0xFFFFFFFF, 0xFFFFFFFF,
+                                          0xFF123456, 0xFFFFFFFF, 0xFF123456, 0xFFFFFFFF,
+                                          0xFFFFFFFF, 0xFF123456, 0xFFFFFFFF, 0xFF123456};
+
+    EXPECT_THAT(decoded(fileOf(imageOf(2, rows)))->pixels, ElementsAreArray(rows));
+}
+
+TEST(PNGFile, OfRowsThatAreLongerThanWhatIsCompressedAtOnceIsReadBackEqual) {
+    std::vector<std::uint32_t> pixels;
+    for (std::uint32_t i = 0; i < 90'000; ++i)
+        pixels.push_back(0xFF000000 | i * i);
+
+    EXPECT_THAT(decoded(fileOf(imageOf(45'000, pixels)))->pixels, ElementsAreArray(pixels));
+}
+
 TEST(PNGFile, SaysThatItsColoursAreSRGB) {
     EXPECT_NE(fileOf(plainImage(1, 1, 0xFF102030)).find("sRGB"), std::string::npos);
 }

@@ -10,74 +10,74 @@
 #include <libdeflate.h>
 
 #include "parvel/platform/ImageCodec.h"
+#include "parvel/platform/linux/QuickDeflate.h"
 
 namespace parvel {
 
 namespace {
 
-/// The rows of a file, each behind the byte that names its filter.
-struct FilteredRows {
-    std::unique_ptr<std::uint8_t[]> bytes;
-    std::size_t size = 0;
-};
-
-struct CompressorFree {
-    void operator()(libdeflate_compressor* compressor) const {
-        libdeflate_free_compressor(compressor);
-    }
-};
-
 bool isOpaque(const Image& image) {
+    constexpr std::uint32_t opaque = 0xFF000000;
     for (std::uint32_t y = 0; y < image.height; ++y) {
         const std::uint32_t* row = image.row(y);
-        if (!std::all_of(row, row + image.width,
-                         [](std::uint32_t pixel) { return pixel >> 24 == 0xFF; }))
+        std::uint32_t all = opaque;
+        for (std::uint32_t x = 0; x < image.width; ++x)
+            all &= row[x];
+        if (all != opaque)
             return false;
     }
     return true;
 }
 
-std::uint8_t withoutAlpha(std::uint32_t color, std::uint32_t alpha) {
+std::uint32_t withoutAlpha(std::uint32_t color, std::uint32_t alpha) {
     if (alpha == 0)
         return 0;
-    return static_cast<std::uint8_t>(std::min((color * 255 + alpha / 2) / alpha, 255U));
+    return std::min((color * 255 + alpha / 2) / alpha, 255U);
 }
 
+/// A pixel's samples from the highest byte down.
 template <std::size_t channels>
-std::array<std::uint8_t, channels> samplesOf(std::uint32_t pixel) {
-    const std::uint32_t alpha = pixel >> 24;
-    const std::uint32_t red = pixel >> 16 & 0xFF;
-    const std::uint32_t green = pixel >> 8 & 0xFF;
-    const std::uint32_t blue = pixel & 0xFF;
+std::uint32_t samplesOf(std::uint32_t pixel) {
     if constexpr (channels == 3)
-        return {static_cast<std::uint8_t>(red), static_cast<std::uint8_t>(green),
-                static_cast<std::uint8_t>(blue)};
-    else
-        return {withoutAlpha(red, alpha), withoutAlpha(green, alpha), withoutAlpha(blue, alpha),
-                static_cast<std::uint8_t>(alpha)};
+        return pixel << 8;
+    const std::uint32_t alpha = pixel >> 24;
+    const std::uint32_t red = withoutAlpha(pixel >> 16 & 0xFF, alpha);
+    const std::uint32_t green = withoutAlpha(pixel >> 8 & 0xFF, alpha);
+    const std::uint32_t blue = withoutAlpha(pixel & 0xFF, alpha);
+    return red << 24 | green << 16 | blue << 8 | alpha;
 }
 
-/// Each sample as its difference from the one to its left.
-template <std::size_t channels>
-FilteredRows filteredRows(const Image& image) {
-    constexpr std::uint8_t filterSub = 1;
-    FilteredRows rows;
-    rows.size = (std::size_t{image.width} * channels + 1) * image.height;
-    rows.bytes = std::make_unique_for_overwrite<std::uint8_t[]>(rows.size);
+/// Four differences at once, each of two bytes.
+std::uint32_t differences(std::uint32_t from, std::uint32_t less) {
+    constexpr std::uint32_t highest = 0x80808080;
+    return ((from | highest) - (less & ~highest)) ^ ((from ^ ~less) & highest);
+}
 
-    std::uint8_t* out = rows.bytes.get();
+/// Compresses the rows, each behind the byte that names its filter: each sample as its difference
+/// from the one to its left.
+template <std::size_t channels>
+void compressRows(const Image& image, QuickDeflate& stream) {
+    constexpr std::uint8_t filterSub = 1;
+    const std::size_t size = std::size_t{image.width} * channels + 1;
+    // A pixel is written as four bytes, of which the next one takes back what is too much.
+    const auto filtered = std::make_unique_for_overwrite<std::uint8_t[]>(size + 1);
+    filtered[0] = filterSub;
     for (std::uint32_t y = 0; y < image.height; ++y) {
         const std::uint32_t* row = image.row(y);
-        std::array<std::uint8_t, channels> left{};
-        *out++ = filterSub;
-        for (std::uint32_t x = 0; x < image.width; ++x) {
-            const std::array<std::uint8_t, channels> samples = samplesOf<channels>(row[x]);
-            for (std::size_t i = 0; i < channels; ++i)
-                *out++ = static_cast<std::uint8_t>(samples[i] - left[i]);
+        // Much of a page is blank: such a row is that above again.
+        const bool isRepeated = y > 0 && std::equal(row, row + image.width, image.row(y - 1));
+        std::uint8_t* out = filtered.get() + 1;
+        std::uint32_t left = 0;
+        for (std::uint32_t x = 0; x < image.width && !isRepeated; ++x) {
+            const std::uint32_t samples = samplesOf<channels>(row[x]);
+            const std::uint32_t difference = differences(samples, left);
+            for (int i = 0; i < 4; ++i)
+                out[i] = static_cast<std::uint8_t>(difference >> (24 - 8 * i));
+            out += channels;
             left = samples;
         }
+        stream.add({filtered.get(), size});
     }
-    return rows;
 }
 
 /// Writes a file's chunks into a buffer that is large enough.
@@ -129,7 +129,6 @@ std::array<std::uint8_t, 13> header(const Image& image, bool opaque) {
 }  // namespace
 
 std::optional<Data> pngFileOfImage(const Image& image) {
-    constexpr int fastest = 1;
     constexpr std::size_t signatureSize = 8;
     constexpr std::size_t chunkSize = 12;  // beside its content
     constexpr std::array<std::uint8_t, 1> perceptual{0};
@@ -138,27 +137,22 @@ std::optional<Data> pngFileOfImage(const Image& image) {
         return std::nullopt;
 
     const bool opaque = isOpaque(image);
-    const FilteredRows rows = opaque ? filteredRows<3>(image) : filteredRows<4>(image);
-    const std::unique_ptr<libdeflate_compressor, CompressorFree> compressor(
-        libdeflate_alloc_compressor(fastest));
-    if (!compressor)
-        return std::nullopt;
-    const std::size_t bound = libdeflate_zlib_compress_bound(compressor.get(), rows.size);
-    const auto compressed = std::make_unique_for_overwrite<std::uint8_t[]>(bound);
-    const std::size_t compressedSize = libdeflate_zlib_compress(compressor.get(), rows.bytes.get(),
-                                                                rows.size, compressed.get(), bound);
-    if (compressedSize == 0)
-        return std::nullopt;
+    QuickDeflate stream;
+    if (opaque)
+        compressRows<3>(image, stream);
+    else
+        compressRows<4>(image, stream);
+    const std::span<const std::uint8_t> compressed = stream.finish();
 
     const std::array<std::uint8_t, 13> head = header(image, opaque);
     const std::size_t size =
-        signatureSize + 4 * chunkSize + head.size() + perceptual.size() + compressedSize;
+        signatureSize + 4 * chunkSize + head.size() + perceptual.size() + compressed.size();
     auto file = std::make_unique_for_overwrite<std::uint8_t[]>(size);
     ChunkWriter writer(file.get());
     writer.signature();
     writer.chunk("IHDR", head);
     writer.chunk("sRGB", perceptual);
-    writer.chunk("IDAT", {compressed.get(), compressedSize});
+    writer.chunk("IDAT", compressed);
     writer.chunk("IEND", {});
     return Data::adopt(std::move(file), size);
 }

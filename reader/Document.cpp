@@ -25,6 +25,8 @@ namespace {
 /// The library counts a document's bytes as an int.
 constexpr std::size_t kLargestDocument = std::numeric_limits<int>::max();
 
+constexpr int pixelSize = 4;
+
 constexpr std::string_view smallestDocument =
     "%PDF-1.4\n1 0 obj<</Type/Catalog/Pages 2 0 R>>endobj "
     "2 0 obj<</Type/Pages/Kids[]/Count 0>>endobj trailer<</Root 1 0 R>>";
@@ -107,28 +109,38 @@ Answer informationOf(const poppler::document& document) {
     return answer;
 }
 
-/// The page in the given place of an opaque white bitmap, as 32-bit pixels. False when it can't be
-/// drawn.
-bool drawInto(std::uint8_t* pixels, std::size_t stride, const poppler::page& page, double pageWidth,
-              double pageHeight, const Placement& placement) {
+/// The page as large as its place; not valid when it can't be drawn.
+poppler::image drawnPage(const poppler::page& page, double pageWidth, double pageHeight,
+                         const Placement& placement) {
     constexpr double pointsAnInch = 72;
-    constexpr std::size_t pixelSize = 4;
     poppler::page_renderer renderer;
     renderer.set_render_hints(poppler::page_renderer::antialiasing |
                               poppler::page_renderer::text_antialiasing);
-    const poppler::image image = renderer.render_page(
-        &page, pointsAnInch * placement.width / pageWidth,
-        pointsAnInch * placement.height / pageHeight, 0, 0, placement.width, placement.height);
-    if (image.width() != placement.width || image.height() != placement.height ||
-        image.format() != poppler::image::format_argb32)
-        return false;
-    for (int row = 0; row < placement.height; ++row) {
-        const char* from = image.const_data() + std::ptrdiff_t{row} * image.bytes_per_row();
-        std::uint8_t* to = pixels + (static_cast<std::size_t>(placement.y) + row) * stride +
-                           static_cast<std::size_t>(placement.x) * pixelSize;
-        std::memcpy(to, from, static_cast<std::size_t>(placement.width) * pixelSize);
-    }
-    return true;
+    poppler::image image = renderer.render_page(&page, pointsAnInch * placement.width / pageWidth,
+                                                pointsAnInch * placement.height / pageHeight, 0, 0,
+                                                placement.width, placement.height);
+    const bool isAsWanted = image.width() == placement.width &&
+                            image.height() == placement.height &&
+                            image.bytes_per_row() == placement.width * pixelSize &&
+                            image.format() == poppler::image::format_argb32;
+    return isAsWanted ? image : poppler::image();
+}
+
+std::span<const std::uint8_t> bytesOf(const poppler::image& image) {
+    return {reinterpret_cast<const std::uint8_t*>(image.const_data()),
+            static_cast<std::size_t>(image.bytes_per_row()) * image.height()};
+}
+
+/// The drawn page in its place of an opaque white bitmap.
+std::vector<std::uint8_t> placedOnWhite(const poppler::image& drawn, const Placement& placement,
+                                        const Reply& bitmap) {
+    std::vector<std::uint8_t> pixels(bitmap.size, 0xFF);
+    const std::span<const std::uint8_t> from = bytesOf(drawn);
+    const auto rowSize = static_cast<std::size_t>(drawn.bytes_per_row());
+    std::size_t to = std::size_t{bitmap.stride} * placement.y + placement.x * pixelSize;
+    for (std::size_t row = 0; row < from.size(); row += rowSize, to += bitmap.stride)
+        std::memcpy(pixels.data() + to, from.data() + row, rowSize);
+    return pixels;
 }
 
 }  // namespace
@@ -193,17 +205,19 @@ Answer Document::drawPage(const Request& request) const {
     Reply& reply = answer.reply;
     reply.width = request.width;
     reply.height = request.height;
-    reply.stride = request.width * 4;
+    reply.stride = request.width * pixelSize;
     reply.size = std::uint64_t{reply.stride} * reply.height;
-    MemoryFile pixels(reply.size);
-    if (!pixels.isOpen())
+    if (reply.size > addressSpace)
         return refusal();
-    std::memset(pixels.bytes().data(), 0xFF, pixels.bytes().size());
     const Placement placement = placePage(pageWidth, pageHeight, static_cast<int>(request.width),
                                           static_cast<int>(request.height));
-    if (!drawInto(pixels.bytes().data(), reply.stride, *page, pageWidth, pageHeight, placement))
+    const poppler::image drawn = drawnPage(*page, pageWidth, pageHeight, placement);
+    if (!drawn.is_valid())
         return refusal();
-    answer.file = pixels.seal();
+    if (bytesOf(drawn).size() == reply.size)
+        answer.file = sealedFileOf(bytesOf(drawn));
+    else
+        answer.file = sealedFileOf(placedOnWhite(drawn, placement, reply));
     reply.outcome = answer.file ? Outcome::Done : Outcome::Refused;
     return answer;
 }

@@ -7,6 +7,10 @@
 
 namespace parvel::reader {
 
+/// A file of memory that holds these bytes, sealed as a MemoryFile is; not open when it can't be
+/// had.
+[[nodiscard]] host::FileDescriptor sealedFileOf(std::span<const std::uint8_t> bytes);
+
 /// A file in memory, written through a mapping and then sealed against any change, to be handed to
 /// the library.
 class MemoryFile {

@@ -5,6 +5,8 @@
 //   2. the walls go up, and Hello says which stand;
 //   3. requests are answered one after the other, until the library closes its end.
 
+#include <malloc.h>
+
 #include <algorithm>
 #include <cstdlib>
 #include <ctime>
@@ -32,6 +34,14 @@ int drawingTime(const Request& request) {
 void readyHostFiles() {
     readyFonts();
     keepHostFolder(tablesFolder);
+}
+
+/// What one document needed serves the next: to hand it back to the system and have it again, page
+/// by page, would cost more than the drawing of a simple page.
+void keepFreedMemory() {
+    constexpr int mostKept = 32 << 20;
+    ::mallopt(M_MMAP_THRESHOLD, mostKept);
+    ::mallopt(M_TRIM_THRESHOLD, mostKept);
 }
 
 class Reader {
@@ -82,6 +92,7 @@ private:
 };
 
 int run(std::uint64_t inputBytes, bool hasFonts) {
+    keepFreedMemory();
     // The C library looks a time zone up in the host's files, once.
     ::setenv("TZ", "UTC0", 1);
     ::tzset();

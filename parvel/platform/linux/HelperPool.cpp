@@ -106,7 +106,7 @@ std::shared_ptr<const std::uint8_t[]> sealedBytes(const FileDescriptor& file, st
     if (seals < 0 || (seals & neededSeals) != neededSeals)
         return nullptr;
     // Nothing can change or cut short what is sealed, so it need not be copied.
-    void* bytes = ::mmap(nullptr, size, PROT_READ, MAP_SHARED, file.get(), 0);
+    void* bytes = ::mmap(nullptr, size, PROT_READ, MAP_SHARED | MAP_POPULATE, file.get(), 0);
     if (bytes == MAP_FAILED)
         return nullptr;
     return {static_cast<const std::uint8_t*>(bytes),

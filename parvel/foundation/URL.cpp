@@ -37,15 +37,17 @@ constexpr std::array<bool, 256> kPlainInPath = [] {
 
 void appendEncoded(std::string& text, std::string_view path) {
     constexpr std::string_view kHexDigits = "0123456789ABCDEF";
-    for (char character : path) {
-        const auto byte = static_cast<unsigned char>(character);
-        if (kPlainInPath[byte]) {
-            text += character;
-            continue;
-        }
+    const auto isPlain = [](char c) { return kPlainInPath[static_cast<unsigned char>(c)]; };
+    for (auto next = path.begin(); next != path.end(); ++next) {
+        const auto special = std::find_if_not(next, path.end(), isPlain);
+        text.append(next, special);
+        if (special == path.end())
+            return;
+        const auto byte = static_cast<unsigned char>(*special);
         text += '%';
         text += kHexDigits[byte >> 4];
         text += kHexDigits[byte & 15];
+        next = special;
     }
 }
 
@@ -186,51 +188,52 @@ std::optional<URL> URL::fromString(std::string_view text) {
 }
 
 std::string_view URL::lastPathComponent() const {
-    return lastComponentOfPath(m_path);
+    return lastComponentOfPath(path());
 }
 
 std::string_view URL::pathExtension() const {
-    return extensionOfPath(m_path);
+    return extensionOfPath(path());
 }
 
 URL URL::deletingLastPathComponent() const {
-    const std::string_view path = pathWithoutLastComponent(m_path);
-    if (m_isFile)
-        return fileURLWithPath(path);
-    return {replacingPath(m_text, path), std::string(path), /*isFile=*/false};
+    const std::string_view parent = pathWithoutLastComponent(path());
+    if (isFileURL())
+        return fileURLWithPath(parent);
+    return {replacingPath(absoluteString(), parent), std::string(parent), /*isFile=*/false};
 }
 
 URL URL::appendingPathComponent(std::string_view component) const {
-    if (m_isFile)
-        return fileURLWithPath(pathAppending(m_path, component));
+    if (isFileURL())
+        return fileURLWithPath(pathAppending(path(), component));
     std::string encoded;
     appendEncoded(encoded, component);
-    std::string path = pathAppending(m_path.empty() ? "/" : m_path, encoded);
-    std::string text = replacingPath(m_text, path);
-    return {std::move(text), std::move(path), /*isFile=*/false};
+    std::string appended = pathAppending(path().empty() ? "/" : path(), encoded);
+    std::string text = replacingPath(absoluteString(), appended);
+    return {std::move(text), std::move(appended), /*isFile=*/false};
 }
 
 URL URL::standardized() const {
-    const bool isAbsolute = m_path.starts_with('/');
-    const bool isStandard = isAbsolute && m_path.find("//") == std::string::npos &&
-                            m_path.find("/.") == std::string::npos;
-    if (!m_isFile || isStandard)
+    const bool isAbsolute = path().starts_with('/');
+    const bool isStandard = isAbsolute && path().find("//") == std::string::npos &&
+                            path().find("/.") == std::string::npos;
+    if (!isFileURL() || isStandard)
         return *this;
     if (isAbsolute)
-        return fileURLWithPath(standardizedPath(m_path));
+        return fileURLWithPath(standardizedPath(path()));
     std::error_code ignored;  // without a current directory the path starts at the root
     const std::string directory = std::filesystem::current_path(ignored).string();
-    return fileURLWithPath(standardizedPath(pathAppending(directory, m_path)));
+    return fileURLWithPath(standardizedPath(pathAppending(directory, path())));
 }
 
 std::size_t URL::hash() const {
-    return std::hash<std::string>{}(m_isFile ? m_path : m_text);
+    return std::hash<std::string>{}(isFileURL() ? path() : absoluteString());
 }
 
 bool operator==(const URL& left, const URL& right) {
-    if (left.m_isFile != right.m_isFile)
+    if (left.isFileURL() != right.isFileURL())
         return false;
-    return left.m_isFile ? left.m_path == right.m_path : left.m_text == right.m_text;
+    return left.isFileURL() ? left.path() == right.path()
+                            : left.absoluteString() == right.absoluteString();
 }
 
 std::string_view lastComponentOfPath(std::string_view path) {

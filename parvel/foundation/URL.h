@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -14,6 +15,11 @@ namespace parvel {
 /// URL's path is bytes and need not be valid UTF-8. No operation asks the disk.
 class PV_EXPORT URL {
 public:
+    // Not moved, which would leave one without text behind: a copy costs as little.
+    URL(const URL&) = default;
+    URL& operator=(const URL&) = default;
+    ~URL() = default;
+
     /// The URL of a path as it stands; a trailing slash is dropped. A NUL, which no path can hold,
     /// becomes U+FFFD. A relative path stays relative.
     static URL fileURLWithPath(std::string_view path);
@@ -24,10 +30,10 @@ public:
 
     /// The text that the URL was made from; for one made from a path, "file://" and the path with
     /// all but `A-Z a-z 0-9 - . _ ~ ! $ & ' ( ) * + , ; = : @ /` percent-encoded.
-    [[nodiscard]] const std::string& absoluteString() const { return m_text; }
-    [[nodiscard]] bool isFileURL() const { return m_isFile; }
+    [[nodiscard]] const std::string& absoluteString() const { return m_parts->text; }
+    [[nodiscard]] bool isFileURL() const { return m_parts->isFile; }
     /// A file URL's decoded path; another URL's path component as it stands.
-    [[nodiscard]] const std::string& path() const { return m_path; }
+    [[nodiscard]] const std::string& path() const { return m_parts->path; }
 
     /// The last component of the path; "/" for the root.
     [[nodiscard]] std::string_view lastPathComponent() const;
@@ -49,12 +55,16 @@ public:
     PV_EXPORT friend bool operator==(const URL& left, const URL& right);
 
 private:
-    URL(std::string text, std::string path, bool isFile)
-        : m_text(std::move(text)), m_path(std::move(path)), m_isFile(isFile) {}
+    struct Parts {
+        std::string text;
+        std::string path;
+        bool isFile;
+    };
 
-    std::string m_text;
-    std::string m_path;
-    bool m_isFile;
+    URL(std::string text, std::string path, bool isFile)
+        : m_parts(std::make_shared<const Parts>(Parts{std::move(text), std::move(path), isFile})) {}
+
+    std::shared_ptr<const Parts> m_parts;  ///< shared by all copies, never null
 };
 
 /// The same rules over the text of a path or file name.

@@ -288,9 +288,16 @@ void Dictionary::merge(const Dictionary& other) {
     for (const Entry& theirs : other) {
         while (own != m_entries.end() && own->key < theirs.key)
             merged.push_back(std::move(*own++));
-        if (own != m_entries.end() && own->key == theirs.key)
+        const bool isInBoth = own != m_entries.end() && own->key == theirs.key;
+        const String* text = isInBoth ? own->value.as<String>() : nullptr;
+        const String* theirText = theirs.value.as<String>();
+        // The same text need not be copied.
+        if (text && theirText && *text == *theirText)
+            merged.push_back(std::move(*own));
+        else
+            merged.push_back(theirs);
+        if (isInBoth)
             ++own;
-        merged.push_back(theirs);
     }
     std::move(own, m_entries.end(), std::back_inserter(merged));
     m_entries = std::move(merged);

@@ -1,3 +1,6 @@
+#include <array>
+#include <string_view>
+
 #include "parvel/foundation/PVCasts.h"
 #include "parvel/foundation/ValueReadings.h"
 #include "parvel/inspection/PVAssetMetadataInspector.h"
@@ -12,45 +15,51 @@ namespace parvel {
 
 namespace {
 
-/// The texts of an attribute dictionary; none for an attribute that is not there.
-class AttributeTexts {
-public:
-    explicit AttributeTexts(const Dictionary& attributes) : m_attributes(attributes) {}
-
-    [[nodiscard]] std::optional<String> operator[](std::string_view name) const {
-        const String* text = PVDynamicCast(classOf<String>, m_attributes.find(name));
-        return text ? std::optional(*text) : std::nullopt;
-    }
-
-private:
-    const Dictionary& m_attributes;
+struct TextProperty {
+    std::string_view attribute;
+    void (PVMutableAssetMetadata::*set)(std::optional<String>);
 };
+
+constexpr std::array textProperties = {
+    TextProperty{PNMetadataXattrAssetID, &PVMutableAssetMetadata::setGeneratedID},
+    TextProperty{PNMetadataXattrTitle, &PVMutableAssetMetadata::setTitle},
+    TextProperty{PNMetadataXattrSortTitle, &PVMutableAssetMetadata::setSortTitle},
+    TextProperty{PNMetadataXattrAuthor, &PVMutableAssetMetadata::setAuthor},
+    TextProperty{PNMetadataXattrSortAuthor, &PVMutableAssetMetadata::setSortAuthor},
+    TextProperty{PNMetadataXattrGenre, &PVMutableAssetMetadata::setGenre},
+    TextProperty{PNMetadataXattrComments, &PVMutableAssetMetadata::setComments},
+    TextProperty{PNMetadataXattrBookDescription, &PVMutableAssetMetadata::setBookDescription},
+    TextProperty{PNMetadataXattrYear, &PVMutableAssetMetadata::setYear},
+};
+
+/// Empty for an attribute that is not there.
+std::string_view textIn(const Dictionary& attributes, std::string_view name) {
+    const String* text = PVDynamicCast(classOf<String>, attributes.find(name));
+    return text ? std::string_view(*text) : std::string_view();
+}
 
 std::optional<Date> dateFrom(std::string_view text) {
     return Service<DateText>::current().dateFromString(text);
 }
 
-void setFromAttributes(PVMutableAssetMetadata& record, const AttributeTexts& texts) {
-    record.setGeneratedID(texts[PNMetadataXattrAssetID]);
-    record.setTitle(texts[PNMetadataXattrTitle]);
-    record.setSortTitle(texts[PNMetadataXattrSortTitle]);
-    record.setAuthor(texts[PNMetadataXattrAuthor]);
-    record.setSortAuthor(texts[PNMetadataXattrSortAuthor]);
-    record.setGenre(texts[PNMetadataXattrGenre]);
-    record.setComments(texts[PNMetadataXattrComments]);
-    record.setBookDescription(texts[PNMetadataXattrBookDescription]);
-    record.setYear(texts[PNMetadataXattrYear]);
+/// Into a record of the URL alone, which has nothing that an absent attribute would take away.
+void setFromAttributes(PVMutableAssetMetadata& record, const Dictionary& attributes) {
+    for (const TextProperty& property : textProperties) {
+        if (const String* text =
+                PVDynamicCast(classOf<String>, attributes.find(property.attribute)))
+            (record.*property.set)(*text);
+    }
 
     // Deliberate: set in any case, so that the attributes' answer goes over the content's.
-    record.setExplicit(boolReading(texts[PNMetadataXattrExplicit].value_or("")));
+    record.setExplicit(boolReading(textIn(attributes, PNMetadataXattrExplicit)));
 
-    const String lastOpened = texts[PNMetadataXattrLastOpened].value_or("");
+    const std::string_view lastOpened = textIn(attributes, PNMetadataXattrLastOpened);
     if (!lastOpened.empty())
         record.setLastOpened(dateFrom(lastOpened));
-    const String firstOpened = texts[PNMetadataXattrFirstOpened].value_or("");
+    const std::string_view firstOpened = textIn(attributes, PNMetadataXattrFirstOpened);
     if (!firstOpened.empty())
         record.setFirstOpened(dateFrom(firstOpened));
-    const String rating = texts[PNMetadataXattrRating].value_or("");
+    const std::string_view rating = textIn(attributes, PNMetadataXattrRating);
     if (!rating.empty())
         record.setRating(Number::signedInteger(int64Reading(rating)));
 }
@@ -64,8 +73,7 @@ MutableAssetPtr PVAssetMetadataInspector::_xAttrMetadataForAssetAtURL_error(
 
     // The record has the URL, so the one error of this read that is handed out can't arise.
     MutableAssetPtr record = PVAssetMetadata::metadataWithURL_dictionary(url, nullptr);
-    const Dictionary attributes = readableAttributesAtURL(url);
-    setFromAttributes(*record, AttributeTexts(attributes));
+    setFromAttributes(*record, readableAttributesAtURL(url));
     return record;
 }
 

@@ -54,11 +54,11 @@ MutableAssetPtr PVMutableAssetMetadata::initWithURL_dictionary_validate(
     const std::optional<URL> ownURL = url ? std::nullopt : record->url();
     const std::optional<URL>& urlToUse = url ? url : ownURL;
     if (urlToUse) {
+        if (!record->displayName())
+            record->setDisplayName(withReplacedInvalidUTF8(urlToUse->lastPathComponent()));
         record->setUrl(urlToUse);
         if (!record->sourceURL())
             record->setSourceURL(urlToUse);
-        if (!record->displayName())
-            record->setDisplayName(withReplacedInvalidUTF8(urlToUse->lastPathComponent()));
     } else if (!record->storeID() && !record->generatedID()) {
         PVParvelLog().error(
             "Initializing headless metadata -- May need to support for the metadata update case but I don't like it...");

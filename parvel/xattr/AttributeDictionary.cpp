@@ -38,6 +38,7 @@ public:
     }
 
     [[nodiscard]] bool isListed() const { return m_isListed; }
+    [[nodiscard]] bool isListedEmpty() const { return m_isListed && m_listed.empty(); }
 
     /// Whether asking for the attribute could give anything but its absence.
     [[nodiscard]] bool mayHold(std::string_view name) {
@@ -107,7 +108,10 @@ std::optional<Dictionary> attributeDictionaryAtURL(const URL& url) {
 }
 
 Dictionary readableAttributesAtURL(const URL& url) {
-    return attributesByReader(readerAtURL(url), /*alwaysAsksForFirst=*/false)
+    AttributeReader reader = readerAtURL(url);
+    if (reader.isListedEmpty())
+        return {};
+    return attributesByReader(std::move(reader), /*alwaysAsksForFirst=*/false)
         .value_or(Dictionary());
 }
 

@@ -125,7 +125,7 @@ TEST_F(HeldItemTest, AScopeWithinAnotherOfItsPathHoldsTheSameFile) {
     EXPECT_EQ(entryOf(url), Data::copyOf("first"));
 }
 
-TEST_F(HeldItemTest, AScopeOfAnotherPathEndsWithItsOwnFile) {
+TEST_F(HeldItemTest, ScopesOfTwoPathsHoldTwoFiles) {
     const URL url = bookSaying("first", "book.epub");
     const URL other = bookSaying("second", "other.epub");
     const HeldItem outer(url);
@@ -134,6 +134,7 @@ TEST_F(HeldItemTest, AScopeOfAnotherPathEndsWithItsOwnFile) {
         const HeldItem inner(other);
         std::filesystem::remove(other.path());
         EXPECT_EQ(entryOf(other), Data::copyOf("second"));
+        EXPECT_EQ(entryOf(url), Data::copyOf("first"));
     }
     EXPECT_EQ(entryOf(url), Data::copyOf("first"));
     EXPECT_EQ(entryOf(other), std::nullopt);

@@ -35,7 +35,11 @@ HeldItem::~HeldItem() {
 
 const std::shared_ptr<const host::OpenItem>& HeldItem::at(const std::string& path) {
     static const std::shared_ptr<const host::OpenItem> nothing;
-    return innermost && innermost->m_url.path() == path ? innermost->m_item : nothing;
+    for (const HeldItem* scope = innermost; scope; scope = scope->m_outer) {
+        if (scope->m_url.path() == path)
+            return scope->m_item;
+    }
+    return nothing;
 }
 
 std::shared_ptr<const host::OpenItem> host::openItem(const std::string& path) {

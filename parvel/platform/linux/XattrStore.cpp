@@ -55,7 +55,8 @@ private:
 /// Cuts the kernel's list at its NULs and keeps the names of our namespace.
 std::vector<std::string> userNames(std::string_view list) {
     std::vector<std::string> names;
-    names.reserve(usualNames);
+    if (!list.empty())
+        names.reserve(usualNames);
     while (!list.empty()) {
         const std::string_view name = list.substr(0, list.find('\0'));
         if (name.starts_with(userPrefix))

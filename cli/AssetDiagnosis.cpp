@@ -25,10 +25,6 @@ namespace {
 
 namespace fs = std::filesystem;
 
-/// What the name of an item begins with that stepped aside for another, where two names can't be
-/// exchanged.
-constexpr std::string_view kAsidePrefix = ".parvel-aside-";
-
 /// What is written with the identity, which comes last.
 constexpr std::array kWrittenBeforeIdentity{PNMetadataXattrTitle, PNMetadataXattrAuthor,
                                             PNMetadataXattrGenre, PNMetadataXattrExplicit};
@@ -112,7 +108,7 @@ std::optional<URL> assetStoodFor(const fs::path& path) {
 
 std::optional<Remnant> remnantAt(const fs::path& path) {
     const std::string name = path.filename().string();
-    if (name.starts_with(kAsidePrefix))
+    if (name.starts_with(StagingDirectory::asidePrefix))
         return Remnant{path.string(),
                        {"steppedAside",
                         "it was to be replaced by a run that was killed, and may be the only copy",

@@ -21,6 +21,9 @@ class PV_EXPORT StagingDirectory {
 public:
     /// What its name begins with, as that of every item that the library is making.
     static constexpr std::string_view namePrefix = ".parvel-stage-";
+    /// What the name of an item begins with that has stepped aside for another, where the file
+    /// system can't exchange two names. One that a killed process left may be the only copy.
+    static constexpr std::string_view asidePrefix = ".parvel-aside-";
 
     virtual ~StagingDirectory() = default;
 

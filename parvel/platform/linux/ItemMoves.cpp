@@ -17,6 +17,7 @@
 #include "parvel/foundation/URL.h"
 #include "parvel/platform/ResourceQueries.h"
 #include "parvel/platform/Service.h"
+#include "parvel/platform/StagingDirectory.h"
 #include "parvel/platform/linux/HiddenItem.h"
 #include "parvel/platform/linux/ItemInheritance.h"
 #include "parvel/platform/linux/ItemRenames.h"
@@ -27,8 +28,6 @@
 namespace parvel::host {
 
 namespace {
-
-constexpr std::string_view kAsidePrefix = ".parvel-aside-";
 
 int syncParents(const std::string& source, const std::string& destination) {
     const std::string from = parentFolderOf(source);
@@ -148,7 +147,8 @@ int renameBack(const std::string& aside, const std::string& existing) {
 /// hidden, whole, where the way back fails twice.
 int takePlaceByStepAside(const std::string& existing, const std::string& replacement,
                          const LastStep& lastStep) {
-    const std::string aside = pathAppending(parentFolderOf(existing), randomName(kAsidePrefix));
+    const std::string aside =
+        pathAppending(parentFolderOf(existing), randomName(StagingDirectory::asidePrefix));
     int error = renameExclusively(existing, aside);
     if (error != 0)
         return error;

@@ -4,16 +4,20 @@
 
 namespace parvel::cli {
 
+void declareLogOption(CommandLine& line, std::optional<std::string>& target) {
+    line.option("--log", "LEVEL",
+                "print the library's log lines to standard error:\n"
+                "off, fault, error, default or debug",
+                target);
+}
+
 void OutputOptions::declare(CommandLine& line) {
     line.group("What is printed");
     line.flag("--json", "print one JSON array with a result for each PATH", json);
     line.flag("--jsonl", "print a line of JSON for each PATH as soon as it is known", jsonLines);
     line.flag("--plist", "print one XML property list", propertyList);
     line.exclusive({"--json", "--jsonl", "--plist"});
-    line.option("--log", "LEVEL",
-                "print the library's log lines to standard error:\n"
-                "off, fault, error, default or debug",
-                log);
+    declareLogOption(line, log);
 }
 
 OutputForm OutputOptions::form() const {

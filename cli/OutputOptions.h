@@ -8,6 +8,9 @@
 
 namespace parvel::cli {
 
+/// Declares --log, which the program has before its command and each command has among its own.
+void declareLogOption(CommandLine& line, std::optional<std::string>& target);
+
 /// The options that every command has for what it prints.
 struct OutputOptions {
     bool json = false;

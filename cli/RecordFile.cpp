@@ -12,7 +12,7 @@ namespace parvel::cli {
 namespace {
 
 /// No record's file is this long; a device that has no end would be.
-constexpr std::size_t longestRecordFile = std::size_t{256} << 20;
+constexpr std::size_t kLongestRecordFile = std::size_t{256} << 20;
 
 /// A property list of either form begins with what JSON can't begin with.
 bool looksLikePropertyList(std::string_view text) {
@@ -90,7 +90,7 @@ std::optional<std::vector<Value>> valuesOf(const std::string& contents, std::str
 }  // namespace
 
 std::optional<std::vector<Value>> valuesFromFile(const std::string& path, std::string& problem) {
-    const auto contents = contentsOfFile(path, longestRecordFile, problem);
+    const auto contents = contentsOfFile(path, kLongestRecordFile, problem);
     return contents ? valuesOf(*contents, problem) : std::nullopt;
 }
 
@@ -121,7 +121,7 @@ std::optional<std::vector<StoredRecord>> recordsFromFile(const std::string& path
 
 std::shared_ptr<const Dictionary> dictionaryFromFile(const std::string& path,
                                                      std::string& problem) {
-    const auto contents = contentsOfFile(path, longestRecordFile, problem);
+    const auto contents = contentsOfFile(path, kLongestRecordFile, problem);
     if (!contents)
         return nullptr;
     const std::optional<Value> value = valueOf(*contents, problem);

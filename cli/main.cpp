@@ -9,6 +9,7 @@
 #include "cli/Interrupt.h"
 #include "cli/Messages.h"
 #include "cli/Output.h"
+#include "cli/OutputOptions.h"
 #include "parvel/platform/ReaderProgram.h"
 
 namespace parvel::cli {
@@ -24,10 +25,7 @@ struct ProgramOptions {
 
     void declare(CommandLine& line) {
         line.group("Options");
-        line.option("--log", "LEVEL",
-                    "print the library's log lines to standard error:\n"
-                    "off, fault, error, default or debug",
-                    log);
+        declareLogOption(line, log);
         line.flag("--version", "print the version", version);
         line.flag("--json", "with --version: print it as JSON", json);
     }

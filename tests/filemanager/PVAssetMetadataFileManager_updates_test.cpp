@@ -3,8 +3,7 @@
 #include "parvel/inspection/PVAssetMetadataInspector.h"
 #include "parvel/platform/PropertyList.h"
 #include "parvel/xattr/PNMetadataXattr.h"
-#include "tests/support/EpubBuilder.h"
-#include "tests/support/ManagedFolder.h"
+#include "tests/support/EditedLibrary.h"
 #include "tests/support/RecordedLog.h"
 #include "tests/support/Records.h"
 #include "tests/support/RefusingServices.h"
@@ -15,40 +14,12 @@ namespace {
 using Lines = std::vector<std::string>;
 using Act = RefusingFileSystem::Act;
 
-/// A library of one book that is edited, and a folder to expand it in.
-class UpdatingAssets : public ManagedFolder {
+/// The library with updates of its book, and what they left on the disk.
+class UpdatingAssets : public EditedLibrary {
 protected:
-    void SetUp() override {
-        makeFolder("library");
-        makeFolder("temporary");
-    }
-
-    static EpubBuilder builder() {
-        return EpubBuilder{}
-            .opf(opfText("<dc:title>Old</dc:title><dc:creator>Author</dc:creator>"))
-            .file("OPS/text.xhtml", "text");
-    }
-    /// The inspected record, with its identity on disk.
-    AssetPtr inspected(const URL& url) {
-        const AssetPtr record =
-            PVAssetMetadataInspector::metadataForAssetAtURL_error(url, &m_error);
-        if (record)
-            (void)m_manager->setExtendedAttributesForAsset_error(record);
-        return record;
-    }
-    AssetPtr zippedBook() { return inspected(builder().zip(m_folder / "library/a.epub")); }
-    AssetPtr expandedBook() { return inspected(builder().expand(m_folder / "library/a.epub")); }
-    MutableAssetPtr pdf(const std::string& name, Dictionary entries = {}) {
-        return PVAssetMetadata::metadataWithURL_dictionary(asset(name)->url(), &entries);
-    }
-
     AssetPtr update(const AssetPtr& updated, const Dictionary& updates, bool inflate = true) {
         return m_manager->updateAsset_withUpdates_temporaryDirectory_inflateIfNeeded_error(
             updated, &updates, m_folder.url("temporary"), inflate, &m_error);
-    }
-    AssetPtr inflate(const AssetPtr& inflated) {
-        return m_manager->inflateAsset_temporaryDirectory_error(inflated, m_folder.url("temporary"),
-                                                                &m_error);
     }
     void refuse(Act act, const std::string& name) {
         m_manager->setFileManager(
@@ -73,9 +44,6 @@ protected:
     /// Whether the file system keeps attributes.
     [[nodiscard]] bool hasIdentity() const {
         return attribute("library/a.epub", PNMetadataXattrAssetID).has_value();
-    }
-    [[nodiscard]] bool isFolder(const std::string& name) const {
-        return std::filesystem::is_directory(m_folder / name);
     }
     /// The lines of the update itself, without those of its steps.
     static Lines ofUpdate(const RecordedLog& log) {
@@ -470,120 +438,6 @@ TEST_F(UpdatingAssets, ABookInAnUpperCaseExtensionIsLookedForInLowerCase) {
 
     EXPECT_EQ(names("library"), Names{"a.EPUB"});
     EXPECT_EQ(ofUpdate(log), Lines{"error updateMetadata: Inflate failed -- Bailing Out"});
-}
-
-TEST_F(UpdatingAssets, InflatingReplacesTheZipFileByItsPackage) {
-    const AssetPtr book = zippedBook();
-    ASSERT_TRUE(book);
-    RecordedLog log;
-
-    const AssetPtr inflated = inflate(book);
-
-    ASSERT_TRUE(inflated);
-    EXPECT_EQ(inflated->url(), m_folder.url("library/a.epub"));
-    EXPECT_TRUE(isFolder("library/a.epub"));
-    EXPECT_EQ(names("library/a.epub"), (Names{"META-INF", "OPS", "mimetype"}));
-    EXPECT_EQ(names("temporary"), Names{});
-    EXPECT_EQ(log.lines().front(),
-              "default inflateMetadata: start {asset: 1, temporaryDirectory: 1");
-    EXPECT_FALSE(m_error);
-}
-
-TEST_F(UpdatingAssets, InflatingExpandsTheBookOfTheSourceURLUnderItsOwnName) {
-    const AssetPtr book = zippedBook();
-    ASSERT_TRUE(book);
-    const std::string zip = m_folder.read("library/a.epub");
-    const URL imported = EpubBuilder{}.file("imported", "x").zip(m_folder / "imported.epub");
-    const AssetPtr elsewhere =
-        book->copyWithUpdates([&](PVMutableAssetMetadata& copy) { copy.setSourceURL(imported); });
-
-    const AssetPtr inflated = inflate(elsewhere);
-
-    ASSERT_TRUE(inflated);
-    EXPECT_EQ(inflated->url(), m_folder.url("library/imported.epub"));
-    EXPECT_EQ(names("library"), (Names{"a.epub", "imported.epub"}));
-    EXPECT_EQ(m_folder.read("library/a.epub"), zip);
-    EXPECT_EQ(m_folder.read("library/imported.epub/imported"), "x");
-    EXPECT_TRUE(std::filesystem::is_regular_file(m_folder / "imported.epub"));
-}
-
-TEST_F(UpdatingAssets, InflatingABookWhoseSourceIsGoneLeavesIt) {
-    const AssetPtr book = zippedBook();
-    ASSERT_TRUE(book);
-    const std::string zip = m_folder.read("library/a.epub");
-    const AssetPtr elsewhere = book->copyWithUpdates(
-        [&](PVMutableAssetMetadata& copy) { copy.setSourceURL(m_folder.url("gone.epub")); });
-
-    EXPECT_FALSE(inflate(elsewhere));
-
-    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::NoSuchFile, m_folder.url("gone.epub")));
-    EXPECT_EQ(m_folder.read("library/a.epub"), zip);
-}
-
-TEST_F(UpdatingAssets, InflatingAnythingElseGivesItBack) {
-    const AssetPtr package = expandedBook();
-    const auto document = pdf("library/a.pdf");
-    const AssetPtr audiobook = asset("library/a.m4a");
-    RecordedLog log;
-
-    EXPECT_EQ(inflate(package), package);
-    EXPECT_EQ(inflate(document), document);
-    EXPECT_EQ(m_manager->inflateAsset_temporaryDirectory_error(audiobook, std::nullopt), audiobook);
-    EXPECT_EQ(log.lines(),
-              (Lines{"default inflateMetadata: start {asset: 1, temporaryDirectory: 1",
-                     "default inflateMetadata: start {asset: 1, temporaryDirectory: 1",
-                     "default inflateMetadata: start {asset: 1, temporaryDirectory: 0"}));
-}
-
-TEST_F(UpdatingAssets, InflatingAMissingBookIsNoneWithoutAnError) {
-    const auto book = PVAssetMetadata::metadataWithURL_dictionary(m_folder.url("a.epub"), nullptr);
-    RecordedLog log;
-
-    EXPECT_FALSE(inflate(book));
-
-    EXPECT_FALSE(m_error);
-    EXPECT_EQ(log.lines(), (Lines{"default inflateMetadata: start {asset: 1, temporaryDirectory: 1",
-                                  "error Failed to get directory status",
-                                  "error inflateMetadata: failed to get compressed status: " +
-                                      m_folder.url("a.epub").absoluteString() + " error: (null)"}));
-}
-
-TEST_F(UpdatingAssets, InflatingNoRecordIsNone) {
-    RecordedLog log;
-
-    EXPECT_FALSE(m_manager->inflateAsset_temporaryDirectory_error(nullptr, std::nullopt));
-
-    EXPECT_EQ(log.lines(),
-              (Lines{"default inflateMetadata: start {asset: 0, temporaryDirectory: 0",
-                     "error inflateMetadata: failed to get compressed status: (null) error: "
-                     "(null)"}));
-}
-
-TEST_F(UpdatingAssets, InflatingADamagedZipFileLeavesIt) {
-    const auto book = asset("library/a.epub", "no zip file");
-
-    EXPECT_FALSE(inflate(book));
-
-    EXPECT_TRUE(m_error);
-    EXPECT_EQ(m_folder.read("library/a.epub"), "no zip file");
-}
-
-TEST_F(UpdatingAssets, InflatingClearsWhatAnEarlierRunLeftInTheTemporaryDirectory) {
-    const AssetPtr book = zippedBook();
-    m_folder.write("temporary/a.epub/OPS/half.xhtml", "left over");
-
-    ASSERT_TRUE(inflate(book));
-
-    EXPECT_EQ(names("library/a.epub/OPS"), (Names{"content.opf", "text.xhtml"}));
-}
-
-TEST_F(UpdatingAssets, InflatingWithoutTemporaryDirectoryDeletesTheZipFile) {
-    const AssetPtr book = zippedBook();
-    ASSERT_TRUE(book);
-
-    EXPECT_FALSE(m_manager->inflateAsset_temporaryDirectory_error(book, std::nullopt, &m_error));
-
-    EXPECT_EQ(names("library"), Names{});
 }
 
 }  // namespace

@@ -1,87 +1,22 @@
 #include "parvel/platform/FileSystemService.h"
 
-#include <fcntl.h>
-#include <sys/fsuid.h>
 #include <sys/stat.h>
-#include <sys/xattr.h>
-#include <unistd.h>
 
-#include <algorithm>
 #include <atomic>
-#include <cstring>
 #include <filesystem>
 #include <thread>
 
 #include <gtest/gtest.h>
 
-#include "tests/support/TemporaryDirectory.h"
+#include "tests/support/ServicedFolder.h"
+#include "tests/support/TestRounds.h"
 
 namespace parvel::testing {
 namespace {
 
 namespace fs = std::filesystem;
 
-std::optional<Error> generalError(PVFileErrorCode code, const URL& url) {
-    return makeFileError(code, url);
-}
-
-/// All names in a folder, hidden ones included, so that no staging folder goes unseen.
-std::vector<std::string> namesIn(const fs::path& folder) {
-    std::vector<std::string> names;
-    for (const auto& entry : fs::directory_iterator(folder))
-        names.push_back(entry.path().filename().string());
-    std::sort(names.begin(), names.end());
-    return names;
-}
-
-using Names = std::vector<std::string>;
-
-constexpr uid_t kNobody = 65534;
-
-void setAttribute(const std::string& path, const char* name, std::string_view value) {
-    ASSERT_EQ(setxattr(path.c_str(), name, value.data(), value.size(), 0), 0) << strerror(errno);
-}
-
-std::string attribute(const std::string& path, const char* name) {
-    char value[256];
-    const ssize_t length = getxattr(path.c_str(), name, value, sizeof value);
-    return length < 0 ? "(none)" : std::string(value, static_cast<std::size_t>(length));
-}
-
-/// A second file system to move to; skipped where the machine has none.
-class AcrossFileSystems : public ::testing::Test {
-protected:
-    void SetUp() override {
-        struct stat here {};
-        struct stat there {};
-        std::string pattern = "/dev/shm/parvel-XXXXXX";
-        if (!mkdtemp(pattern.data()))
-            GTEST_SKIP() << "no memory file system";
-        m_other = pattern;
-        ASSERT_EQ(stat(m_other.c_str(), &there), 0);
-        ASSERT_EQ(stat(m_folder.path().c_str(), &here), 0);
-        if (here.st_dev == there.st_dev)
-            GTEST_SKIP() << "only one file system";
-    }
-    void TearDown() override {
-        if (!m_other.empty())
-            fs::remove_all(m_other);
-    }
-    [[nodiscard]] URL otherURL(const char* name) const {
-        return URL::fileURLWithPath((m_other / name).string());
-    }
-
-    TemporaryDirectory m_folder;
-    fs::path m_other;
-    std::shared_ptr<FileSystemService> m_service = FileSystemService::makeDefault();
-};
-
-class FileSystem : public ::testing::Test {
-protected:
-    TemporaryDirectory m_folder;
-    std::shared_ptr<FileSystemService> m_service = FileSystemService::makeDefault();
-    std::optional<Error> m_error;
-};
+using FileSystem = ServicedFolder;
 
 TEST_F(FileSystem, ADanglingLinkOccupiesItsName) {
     fs::create_symlink("nowhere", m_folder / "link");
@@ -377,68 +312,6 @@ TEST_F(FileSystem, ACopyDropsSetIdBits) {
     EXPECT_EQ(fs::status(m_folder / "b").permissions(), fs::perms{0755});
 }
 
-TEST_F(FileSystem, AFolderOfAnyDepthIsRemoved) {
-    const int depth = 3000;
-    std::string path = m_folder / "deep";
-    fs::create_directory(path);
-    const int start = open(path.c_str(), O_RDONLY | O_DIRECTORY);
-    int folder = start;
-    for (int i = 0; i < depth; ++i) {
-        ASSERT_EQ(mkdirat(folder, "d", 0700), 0);
-        const int below = openat(folder, "d", O_RDONLY | O_DIRECTORY);
-        close(folder);
-        folder = below;
-    }
-    close(folder);
-
-    EXPECT_TRUE(m_service->removeItem(m_folder.url("deep"), &m_error));
-
-    EXPECT_FALSE(m_error);
-    EXPECT_EQ(namesIn(m_folder.path()), Names{});
-}
-
-TEST_F(FileSystem, RemovingDoesNotFollowALinkOutOfTheItem) {
-    m_folder.write("outside/kept", "1");
-    fs::create_directory(m_folder / "a");
-    fs::create_directory_symlink(m_folder / "outside", m_folder / "a/link");
-
-    EXPECT_TRUE(m_service->removeItem(m_folder.url("a")));
-
-    EXPECT_EQ(m_folder.read("outside/kept"), "1");
-    EXPECT_EQ(namesIn(m_folder.path()), Names{"outside"});
-}
-
-TEST_F(FileSystem, RemovingALinkLeavesItsTarget) {
-    m_folder.write("target", "t");
-    fs::create_symlink("target", m_folder / "link");
-
-    EXPECT_TRUE(m_service->removeItem(m_folder.url("link")));
-
-    EXPECT_EQ(namesIn(m_folder.path()), Names{"target"});
-}
-
-TEST_F(FileSystem, APackageOfFoldersThatForbidChangesIsRemovedByItsOwner) {
-    m_folder.write("a/b/c", "1");
-    fs::permissions(m_folder / "a/b", fs::perms{0});
-    fs::permissions(m_folder / "a", fs::perms{0500});
-    // The system's first user may do anything; another one, here nobody, has to be let in.
-    for (const char* name : {"", "a", "a/b", "a/b/c"})
-        (void)!chown((m_folder / name).c_str(), kNobody, kNobody);
-    setfsuid(geteuid() == 0 ? kNobody : geteuid());
-
-    const bool isRemoved = m_service->removeItem(m_folder.url("a"), &m_error);
-    setfsuid(geteuid());
-
-    EXPECT_TRUE(isRemoved);
-    EXPECT_EQ(namesIn(m_folder.path()), Names{});
-}
-
-TEST_F(FileSystem, RemovingNothingIsAnError) {
-    EXPECT_FALSE(m_service->removeItem(m_folder.url("a"), &m_error));
-
-    EXPECT_EQ(m_error, generalError(PVFileErrorCode::NoSuchFile, m_folder.url("a")));
-}
-
 TEST_F(FileSystem, AStagingFolderThatNobodyHoldsIsClearedByTheNextOperation) {
     m_folder.write(".parvel-stage-left/item/x", "1");
     m_folder.write("a", "1");
@@ -450,8 +323,7 @@ TEST_F(FileSystem, AStagingFolderThatNobodyHoldsIsClearedByTheNextOperation) {
 
 TEST_F(FileSystem, ManyCompetitorsForOneNameLeaveOneWinnerAndTheOthersWhole) {
     constexpr int competitors = 8;
-    const char* rounds = getenv("PARVEL_TEST_ROUNDS");
-    for (int round = 0; round < (rounds ? atoi(rounds) : 20); ++round) {
+    for (std::size_t round = 0; round < testRounds(20); ++round) {
         const std::string target = "won-" + std::to_string(round);
         std::vector<std::thread> threads;
         std::atomic<int> winners{0};
@@ -467,59 +339,8 @@ TEST_F(FileSystem, ManyCompetitorsForOneNameLeaveOneWinnerAndTheOthersWhole) {
         for (std::thread& thread : threads)
             thread.join();
         EXPECT_EQ(winners, 1);
-        EXPECT_EQ(namesIn(m_folder.path()).size(), static_cast<std::size_t>(competitors + round));
+        EXPECT_EQ(namesIn(m_folder.path()).size(), competitors + round);
     }
-}
-
-TEST_F(AcrossFileSystems, AMovedFolderArrivesWholeAndTheSourceGoes) {
-    const std::string file = m_folder.write("a.epub/OPS/x", "content");
-    setAttribute(m_folder / "a.epub", "user.com.kestrel.Folium.assetID", "42");
-    setAttribute(file, "user.t", "v");
-
-    EXPECT_TRUE(m_service->moveItem(m_folder.url("a.epub"), otherURL("b.epub")));
-
-    EXPECT_EQ(namesIn(m_folder.path()), Names{});
-    EXPECT_EQ(namesIn(m_other), Names{"b.epub"});
-    EXPECT_EQ(attribute(m_other / "b.epub", "user.com.kestrel.Folium.assetID"), "42");
-    EXPECT_EQ(attribute(m_other / "b.epub/OPS/x", "user.t"), "v");
-}
-
-TEST_F(AcrossFileSystems, AMoveOntoATakenNameLeavesBothWhole) {
-    m_folder.write("a", "1");
-    std::ofstream(m_other / "b") << "2";
-    std::optional<Error> error;
-
-    EXPECT_FALSE(m_service->moveItem(m_folder.url("a"), otherURL("b"), &error));
-
-    EXPECT_EQ(error, generalError(PVFileErrorCode::FileExists, otherURL("b")));
-    EXPECT_EQ(m_folder.read("a"), "1");
-    EXPECT_EQ(namesIn(m_other), Names{"b"});
-    EXPECT_EQ(fs::file_size(m_other / "b"), 1U);
-}
-
-TEST_F(AcrossFileSystems, AReplacementTakesThePlaceAndTheOldNameGoes) {
-    m_folder.write("new/x", "2");
-    fs::create_directory(m_other / "old");
-    std::ofstream(m_other / "old/y") << "1";
-
-    EXPECT_TRUE(m_service->replaceItem(otherURL("old"), m_folder.url("new"),
-                                       ReplaceOptions::NewMetadataOnly));
-
-    EXPECT_EQ(namesIn(m_folder.path()), Names{});
-    EXPECT_EQ(namesIn(m_other), Names{"old"});
-    EXPECT_EQ(namesIn(m_other / "old"), Names{"x"});
-}
-
-TEST_F(AcrossFileSystems, TheDefaultReplacementKeepsWhatTheNewItemLacks) {
-    m_folder.write("new", "2");
-    std::ofstream(m_other / "old") << "1";
-    setAttribute(m_other / "old", "user.kept", "old");
-
-    EXPECT_TRUE(
-        m_service->replaceItem(otherURL("old"), m_folder.url("new"), ReplaceOptions::Default));
-
-    EXPECT_EQ(attribute(m_other / "old", "user.kept"), "old");
-    EXPECT_EQ(namesIn(m_folder.path()), Names{});
 }
 
 TEST_F(FileSystem, AForwardingServicePassesEveryOperationOn) {

@@ -9,6 +9,7 @@
 
 #include "tests/support/MP4Builder.h"
 #include "tests/support/TemporaryDirectory.h"
+#include "tests/support/TestRounds.h"
 
 namespace parvel::testing {
 namespace {
@@ -278,11 +279,10 @@ TEST_F(AudioTags, AnAtomSmallerThanItsHeadEndsTheSearch) {
 }
 
 TEST_F(AudioTags, MutatedFilesEndInSomeAnswer) {
-    const char* rounds = getenv("PARVEL_TEST_ROUNDS");
     const std::string sound =
         file(item("cnID", 21, number(42, 4)) + item(kArtist, 1, "a") + item("covr", 13, "jpeg"));
     std::mt19937 random(1);
-    for (int round = 0; round < (rounds ? atoi(rounds) : 200); ++round) {
+    for (std::size_t round = 0; round < testRounds(200); ++round) {
         std::string bytes = sound;
         for (int i = 0; i < 3; ++i)
             bytes[random() % bytes.size()] = static_cast<char>(random());

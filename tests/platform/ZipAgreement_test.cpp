@@ -12,6 +12,7 @@
 #include "parvel/platform/linux/FileDescriptor.h"
 #include "parvel/platform/linux/LibzipArchive.h"
 #include "parvel/platform/linux/PlainZip.h"
+#include "tests/support/TestRounds.h"
 #include "tests/support/ZipBuilder.h"
 
 namespace parvel::testing {
@@ -175,11 +176,9 @@ TEST_F(ZipAgreementTest, AnswersAsLibzipWhereverTheFileIsCut) {
 }
 
 TEST_F(ZipAgreementTest, AnswersAsLibzipOnArchivesDamagedAtRandom) {
-    const char* setting = std::getenv("PARVEL_TEST_ROUNDS");
-    const int rounds = setting ? std::atoi(setting) : 3000;
     std::mt19937 random(1);
     const std::vector<ZipBuilder> archives = sampleArchives();
-    for (int round = 0; round < rounds && !HasFatalFailure(); ++round) {
+    for (std::size_t round = 0; round < testRounds(3000) && !HasFatalFailure(); ++round) {
         std::string bytes = archives[random() % archives.size()].bytes();
         const unsigned changes = 1 + random() % 4;
         for (unsigned i = 0; i < changes; ++i) {

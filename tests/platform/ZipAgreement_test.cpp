@@ -8,7 +8,9 @@
 #include <filesystem>
 #include <fstream>
 #include <random>
+#include <tuple>
 
+#include "parvel/platform/linux/ArchiveEntries.h"
 #include "parvel/platform/linux/FileDescriptor.h"
 #include "parvel/platform/linux/LibzipArchive.h"
 #include "parvel/platform/linux/PlainZip.h"
@@ -25,11 +27,49 @@ struct Tally {
     int plainArchives = 0;
     int sureContents = 0;
     int sureNones = 0;
+    int deliveries = 0;
 };
 
 std::string described(const std::optional<Data>& data) {
     std::vector<std::uint8_t> storage;
     return data ? "content " + std::string(data->text(storage)) : "none";
+}
+
+/// What an archive's entry delivers: its content, or the errno value.
+std::string delivered(auto& archive, std::uint64_t index, const host::ZipEntry& entry) {
+    std::string content = "content ";
+    const int error = archive.deliver(index, entry, [&content](Data::Bytes piece) {
+        content.append(piece.begin(), piece.end());
+        return 0;
+    });
+    return error == 0 ? content : "error " + std::to_string(error);
+}
+
+/// What is listed and delivered in turn must be what libzip lists and delivers.
+void expectSameEntries(int file, std::uint64_t size, host::LibzipArchive& full,
+                       const std::string& what, Tally& tally) {
+    const std::unique_ptr<host::ArchiveEntries> entries = host::ArchiveEntries::open(
+        file, size, host::LibzipArchive::readingBudget, [] { return 0; });
+    ASSERT_TRUE(entries) << what;
+    ASSERT_EQ(entries->count(), full.entryCount()) << what;
+    for (std::uint64_t index = 0; index < entries->count(); ++index) {
+        const std::optional<std::string_view> name = entries->name(index);
+        ASSERT_TRUE(name && full.name(index)) << what << ": " << index;
+        ASSERT_EQ(*name, full.name(index)) << what;
+        host::ZipEntry entry;
+        host::ZipEntry other;
+        ASSERT_TRUE(entries->describe(index, entry) && full.describe(index, other)) << what;
+        ASSERT_EQ(std::tie(entry.size, entry.compressedSize, entry.crc, entry.method,
+                           entry.externalAttributes, entry.hostSystem, entry.isEncrypted),
+                  std::tie(other.size, other.compressedSize, other.crc, other.method,
+                           other.externalAttributes, other.hostSystem, other.isEncrypted))
+            << what << ": " << *name;
+        if (!host::canBeDelivered(entry, entryLimit))
+            continue;
+        ++tally.deliveries;
+        ASSERT_EQ(delivered(*entries, index, entry), delivered(full, index, other))
+            << what << ": " << *name;
+    }
 }
 
 /// Whatever the plain reader answers of the open archive must be libzip's answer.
@@ -49,6 +89,7 @@ void expectAgreement(int file, std::uint64_t size, const std::vector<std::string
         ASSERT_EQ(described(content), described(full->readEntry(name, entryLimit)))
             << what << ": " << name;
     }
+    expectSameEntries(file, size, *full, what, tally);
 }
 
 class ZipAgreementTest : public ::testing::Test {
@@ -162,6 +203,7 @@ TEST_F(ZipAgreementTest, AnswersAsLibzipWhateverByteIsChanged) {
 
     EXPECT_GE(m_tally.plainArchives, 5000);
     EXPECT_GE(m_tally.sureContents, 5000);
+    EXPECT_GE(m_tally.deliveries, 5000);
 }
 
 TEST_F(ZipAgreementTest, AnswersAsLibzipWhereverTheFileIsCut) {

@@ -6,13 +6,11 @@
 #include "parvel/platform/linux/PlainZip.h"
 
 #include <string.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <cstring>
 
 #include "parvel/platform/TextRules.h"
-#include "parvel/platform/linux/SystemCall.h"
 #include "parvel/platform/linux/ZipFormat.h"
 
 namespace parvel::host {
@@ -20,31 +18,11 @@ namespace parvel::host {
 namespace {
 
 constexpr std::size_t tailLength = 4096;
-/// A directory up to this length is kept; a longer one is read through a window each time.
-constexpr std::uint64_t largestKeptDirectory = 1ULL << 20;
 /// More than the longest record: 46 bytes and three fields of 65,535.
 constexpr std::size_t windowLength = 256U << 10;
-/// Of one read for short pieces.
-constexpr std::size_t usualWindowLength = 4096;
-/// Local extra fields of this length still come with the header's own read.
-constexpr std::uint64_t usualExtraLength = 64;
 /// What an entry may take of the file beside its data and name: local extra fields, alignment, a
 /// data descriptor.
 constexpr std::uint64_t unlistedPerEntry = 128;
-
-/// Reads until the buffer is full. False for a file that ends before, and for an error.
-bool readFully(int file, std::uint64_t offset, std::uint8_t* buffer, std::size_t size) {
-    while (size > 0) {
-        const ssize_t count =
-            retried([&] { return ::pread(file, buffer, size, static_cast<off_t>(offset)); });
-        if (count <= 0)
-            return false;
-        buffer += count;
-        offset += static_cast<std::uint64_t>(count);
-        size -= static_cast<std::size_t>(count);
-    }
-    return true;
-}
 
 /// One whole record of the directory.
 struct DirectoryRecord {
@@ -199,7 +177,8 @@ bool isSaid(std::uint32_t field, std::uint64_t value) {
 
 }  // namespace
 
-std::unique_ptr<PlainZip> PlainZip::open(int file, std::uint64_t fileSize) {
+std::unique_ptr<PlainZip> PlainZip::open(int file, std::uint64_t fileSize,
+                                         std::uint64_t largestDirectory) {
     Buffer tail;
     tail.size = static_cast<std::size_t>(std::min<std::uint64_t>(fileSize, tailLength));
     tail.bytes = std::make_unique_for_overwrite<std::uint8_t[]>(tail.size);
@@ -208,6 +187,7 @@ std::unique_ptr<PlainZip> PlainZip::open(int file, std::uint64_t fileSize) {
 
     std::unique_ptr<PlainZip> archive(new PlainZip(file, fileSize));
     if (!readEndRecord({tail.bytes.get(), tail.size}, fileSize, archive->m_end) ||
+        archive->m_end.directorySize > largestDirectory ||
         !archive->keepDirectory(std::move(tail)) || !archive->directoryIsPlain())
         return nullptr;
     return archive;
@@ -292,6 +272,21 @@ bool PlainZip::directoryIsPlain() const {
            m_end.directoryOffset - listed <= entries * unlistedPerEntry;
 }
 
+/// A full reader takes a name for ended by the first NUL in it, or gives another character for it.
+std::optional<std::vector<PlainZip::Listed>> PlainZip::entries() const {
+    if (m_directory.size() != m_end.directorySize)
+        return std::nullopt;
+    std::vector<Listed> listed;
+    listed.reserve(m_end.entries);
+    DirectoryWalk walk(m_directory);
+    while (const std::optional<DirectoryRecord> record = walk.next()) {
+        if (record->name().find('\0') != std::string_view::npos)
+            return std::nullopt;
+        listed.push_back({record->name(), record->entry()});
+    }
+    return listed;
+}
+
 PlainZip::Answer PlainZip::readEntry(std::string_view name, std::uint64_t limit,
                                      std::optional<Data>& content) {
     content.reset();
@@ -305,7 +300,7 @@ PlainZip::Answer PlainZip::readEntry(std::string_view name, std::uint64_t limit,
         return Answer::Unsure;
 
     Data::Bytes stored;
-    if (!readStored(entry, name.size(), stored))
+    if (!m_window.readStored(entry, name.size(), stored))
         return Answer::Unsure;
     content = decodedEntry(entry, stored);
     return Answer::Sure;
@@ -322,48 +317,6 @@ PlainZip::Search PlainZip::find(std::string_view name, ZipEntry& entry) const {
         return Search::Found;
     }
     return walk.isAtEnd() ? Search::Absent : Search::Broken;
-}
-
-/// Reads the local header, the data behind it with it where the header is of the usual length.
-bool PlainZip::readStored(const ZipEntry& entry, std::size_t nameLength, Data::Bytes& stored) {
-    if (entry.offset > m_fileSize)
-        return false;
-    const std::uint64_t available = m_fileSize - entry.offset;
-    const auto size = static_cast<std::size_t>(std::min<std::uint64_t>(
-        available, zip::localHeaderLength + nameLength + usualExtraLength + entry.compressedSize));
-    Data::Bytes piece;
-    if (size < zip::localHeaderLength || !provide(entry.offset, size, piece) ||
-        std::memcmp(piece.data(), zip::localSignature, zip::signatureLength) != 0)
-        return false;
-
-    const std::uint64_t start =
-        zip::localHeaderLength + zip::get16(&piece[26]) + zip::get16(&piece[28]);
-    const auto length = static_cast<std::size_t>(entry.compressedSize);
-    if (start > available || length > available - start)
-        return false;
-    if (start + length <= size) {
-        stored = piece.subspan(start, length);
-        return true;
-    }
-    return provide(entry.offset + start, length, stored);
-}
-
-/// Bytes that lie within the file, good until the next call. What is read for a short piece serves
-/// the pieces behind it too, for a book's documents often stand one after the other.
-bool PlainZip::provide(std::uint64_t offset, std::size_t size, Data::Bytes& bytes) {
-    const bool isInWindow = offset >= m_windowOffset && size <= m_window.size &&
-                            offset - m_windowOffset <= m_window.size - size;
-    if (!isInWindow) {
-        const std::size_t length = std::max(size, static_cast<std::size_t>(std::min<std::uint64_t>(
-                                                      m_fileSize - offset, usualWindowLength)));
-        m_window = {std::make_unique_for_overwrite<std::uint8_t[]>(length), 0};
-        if (!readFully(m_file, offset, m_window.bytes.get(), length))
-            return false;
-        m_window.size = length;
-        m_windowOffset = offset;
-    }
-    bytes = {m_window.bytes.get() + (offset - m_windowOffset), size};
-    return true;
 }
 
 }  // namespace parvel::host

@@ -1,12 +1,15 @@
 #pragma once
 
 #include <cstdint>
+#include <limits>
 #include <memory>
 #include <optional>
 #include <string_view>
+#include <vector>
 
 #include "parvel/foundation/Data.h"
 #include "parvel/platform/linux/ZipEntry.h"
+#include "parvel/platform/linux/ZipWindow.h"
 
 namespace parvel::host {
 
@@ -19,8 +22,23 @@ class PlainZip {
 public:
     enum class Answer { Sure, Unsure };
 
-    /// Borrows the descriptor. Null for an archive that is not plain.
-    [[nodiscard]] static std::unique_ptr<PlainZip> open(int file, std::uint64_t fileSize);
+    /// An entry as the directory lists it.
+    struct Listed {
+        std::string_view name;
+        ZipEntry entry;
+    };
+
+    /// A directory up to this length is kept; a longer one is read through a window each time.
+    static constexpr std::uint64_t largestKeptDirectory = 1ULL << 20;
+
+    /// Borrows the descriptor. Null for an archive that is not plain, or whose directory is larger.
+    [[nodiscard]] static std::unique_ptr<PlainZip> open(
+        int file, std::uint64_t fileSize,
+        std::uint64_t largestDirectory = std::numeric_limits<std::uint64_t>::max());
+
+    /// The entries of a directory that is kept, in its order, their names good as long as the
+    /// archive. None for another, and where a full reader might give a name in another form.
+    [[nodiscard]] std::optional<std::vector<Listed>> entries() const;
 
     /// The entry's content; none, when the answer is sure, for one that can't be delivered.
     [[nodiscard]] Answer readEntry(std::string_view name, std::uint64_t limit,
@@ -38,24 +56,21 @@ private:
     };
     enum class Search { Found, Absent, Broken };
 
-    PlainZip(int file, std::uint64_t fileSize) : m_file(file), m_fileSize(fileSize) {}
+    PlainZip(int file, std::uint64_t fileSize)
+        : m_file(file), m_fileSize(fileSize), m_window(file, fileSize) {}
 
     [[nodiscard]] static bool readEndRecord(Data::Bytes tail, std::uint64_t fileSize,
                                             EndRecord& end);
     [[nodiscard]] bool keepDirectory(Buffer tail);
     [[nodiscard]] bool directoryIsPlain() const;
     [[nodiscard]] Search find(std::string_view name, ZipEntry& entry) const;
-    [[nodiscard]] bool readStored(const ZipEntry& entry, std::size_t nameLength,
-                                  Data::Bytes& stored);
-    [[nodiscard]] bool provide(std::uint64_t offset, std::size_t size, Data::Bytes& bytes);
 
     int m_file;
     std::uint64_t m_fileSize;
     EndRecord m_end;
     Buffer m_kept;            ///< the piece of the file that holds the directory
     Data::Bytes m_directory;  ///< within it; empty where it is too large to be kept
-    Buffer m_window;          ///< what was read last of the entries, served from while it lasts
-    std::uint64_t m_windowOffset = 0;
+    ZipWindow m_window;
 };
 
 }  // namespace parvel::host

@@ -44,7 +44,7 @@ libdeflate_decompressor* threadDecompressor() {
 }
 
 bool canGiveItsSize(const ZipEntry& entry) {
-    if (entry.method == storedMethod)
+    if (entry.isStored())
         return entry.size == entry.compressedSize;
     return entry.method == deflatedMethod &&
            entry.size / mostBytesPerByte <= entry.compressedSize &&
@@ -57,8 +57,12 @@ bool ZipEntry::isLarge() const {
     return size > largestWholeEntry || compressedSize > largestWholeEntry;
 }
 
+bool ZipEntry::isStored() const {
+    return method == storedMethod;
+}
+
 bool ZipEntry::hasKnownMethod() const {
-    return method == storedMethod || method == deflatedMethod;
+    return isStored() || method == deflatedMethod;
 }
 
 std::uint32_t ZipEntry::unixMode() const {
@@ -71,17 +75,24 @@ bool canBeDelivered(const ZipEntry& entry, std::uint64_t limit) {
            canGiveItsSize(entry);
 }
 
+std::uint32_t checksum(Data::Bytes content, std::uint32_t before) {
+    return libdeflate_crc32(before, content.data(), content.size());
+}
+
+bool inflateEntry(const ZipEntry& entry, Data::Bytes stored, std::uint8_t* content) {
+    // No place for the actual size: anything but the whole size is a failure.
+    if (!stored.empty() &&
+        libdeflate_deflate_decompress(threadDecompressor(), stored.data(), stored.size(), content,
+                                      entry.size, nullptr) != LIBDEFLATE_SUCCESS)
+        return false;
+    return checksum({content, static_cast<std::size_t>(entry.size)}) == entry.crc;
+}
+
 std::optional<Data> decodedEntry(const ZipEntry& entry, Data::Bytes stored) {
+    if (entry.isStored())
+        return checksum(stored) == entry.crc ? std::optional(Data::copyOf(stored)) : std::nullopt;
     auto content = std::make_unique_for_overwrite<std::uint8_t[]>(entry.size);
-    if (entry.method == storedMethod) {
-        std::copy(stored.begin(), stored.end(), content.get());
-    } else if (!stored.empty()) {
-        // No place for the actual size: anything but the whole size is a failure.
-        if (libdeflate_deflate_decompress(threadDecompressor(), stored.data(), stored.size(),
-                                          content.get(), entry.size, nullptr) != LIBDEFLATE_SUCCESS)
-            return std::nullopt;
-    }
-    if (libdeflate_crc32(0, content.get(), entry.size) != entry.crc)
+    if (!inflateEntry(entry, stored, content.get()))
         return std::nullopt;
     return Data::adopt(std::move(content), entry.size);
 }

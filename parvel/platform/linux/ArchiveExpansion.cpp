@@ -9,15 +9,15 @@
 #include <sys/statvfs.h>
 
 #include <algorithm>
-#include <cstring>
 #include <limits>
+#include <optional>
 #include <string>
 #include <string_view>
 
 #include "parvel/foundation/URL.h"
-#include "parvel/platform/linux/ItemContent.h"
+#include "parvel/platform/linux/ArchiveOwner.h"
+#include "parvel/platform/linux/FoldersBelow.h"
 #include "parvel/platform/linux/ItemTree.h"
-#include "parvel/platform/linux/OpenBeneath.h"
 #include "parvel/platform/linux/Paths.h"
 #include "parvel/platform/linux/SystemCall.h"
 #include "parvel/platform/linux/WriteBehind.h"
@@ -79,73 +79,11 @@ int checkContent(const ZipEntry& entry) {
     return canBeDelivered(entry, std::numeric_limits<std::uint64_t>::max()) ? 0 : EBADMSG;
 }
 
-/// Gives what is made to the archive's owner and group, where this process is root's: everybody
-/// else's new items are his, in the group that new items have there.
-class ArchiveOwner {
-public:
-    explicit ArchiveOwner(const struct stat& archive) : m_archive(archive) {}
-
-    /// 0 or the errno value; a file system that refuses is no error.
-    [[nodiscard]] int give(int item) const { return m_isRoot ? copyOwner(m_archive, item) : 0; }
-
-private:
-    const struct stat& m_archive;
-    bool m_isRoot = ::geteuid() == 0;
-};
-
-/// The folders below one that holds all; the one used last stays open.
-class FoldersBelow {
-public:
-    FoldersBelow(FileDescriptor root, const ArchiveOwner& owner)
-        : m_root(std::move(root)), m_owner(owner) {}
-
-    /// The open folder of that path, made with those on the way to it; negative with errno set.
-    [[nodiscard]] int open(std::string_view path) {
-        if (path.empty())
-            return m_root.get();
-        if (m_last && path == m_lastPath)
-            return m_last.get();
-        m_lastPath = path;
-        m_last = openBeneath(m_root.get(), m_lastPath.c_str(), O_PATH | O_DIRECTORY);
-        if (!m_last && errno == ENOENT)
-            m_last = make(m_lastPath);
-        return m_last.get();
-    }
-
-private:
-    [[nodiscard]] FileDescriptor make(const std::string& path) const {
-        FileDescriptor folder;
-        for (std::size_t start = 0; start < path.size();) {
-            const std::size_t end = std::min(path.find('/', start), path.size());
-            const std::string component = path.substr(start, end - start);
-            const int above = folder ? folder.get() : m_root.get();
-            const bool isMade = ::mkdirat(above, component.c_str(), 0700) == 0;
-            if (!isMade && errno != EEXIST)
-                return {};
-            FileDescriptor next = openBeneath(above, component.c_str(), O_PATH | O_DIRECTORY);
-            if (!next)
-                return {};
-            if (const int error = isMade ? m_owner.give(next.get()) : 0) {
-                errno = error;
-                return {};
-            }
-            folder = std::move(next);
-            start = end + 1;
-        }
-        return folder;
-    }
-
-    FileDescriptor m_root;
-    const ArchiveOwner& m_owner;
-    FileDescriptor m_last;
-    std::string m_lastPath;
-};
-
 class Expansion {
 public:
-    Expansion(LibzipArchive& archive, const ArchiveOwner& owner, FileDescriptor root,
+    Expansion(ArchiveEntries& entries, const ArchiveOwner& owner, FileDescriptor root,
               const std::string& destination, const CopierReports& reports)
-        : m_archive(archive),
+        : m_entries(entries),
           m_owner(owner),
           m_folders(std::move(root), owner),
           m_destination(destination),
@@ -153,7 +91,7 @@ public:
 
     /// 0 or the errno value, told already.
     int run() {
-        const std::uint64_t count = m_archive.entryCount();
+        const std::uint64_t count = m_entries.count();
         for (std::uint64_t index = 0; index < count; ++index) {
             if (const int error = m_reports.cancellation())
                 return error;
@@ -165,11 +103,10 @@ public:
 
 private:
     int expandEntry(std::uint64_t index) {
-        const char* stored = m_archive.name(index);
-        const std::string_view name = stored ? stored : "";
+        const std::string_view name = m_entries.name(index).value_or("");
         const std::string path = pathAppending(m_destination, name);
         ZipEntry entry;
-        if (!m_archive.describe(index, entry))
+        if (!m_entries.describe(index, entry))
             return m_reports.failed(path, EBADMSG);
         const std::string_view item = name.ends_with('/') ? name.substr(0, name.size() - 1) : name;
         int error = checkName(item);
@@ -215,7 +152,7 @@ private:
     int deliver(std::uint64_t index, const ZipEntry& entry, int file) {
         WriteBehind disk(file);
         std::uint64_t size = 0;
-        return m_archive.deliver(index, entry, [&](Data::Bytes piece) {
+        return m_entries.deliver(index, entry, [&](Data::Bytes piece) {
             while (!piece.empty()) {
                 if (const int error = m_reports.cancellation())
                     return error;
@@ -233,7 +170,7 @@ private:
         });
     }
 
-    LibzipArchive& m_archive;
+    ArchiveEntries& m_entries;
     const ArchiveOwner& m_owner;
     FoldersBelow m_folders;
     const std::string& m_destination;
@@ -256,17 +193,17 @@ int checkClaims(SourceArchive& source, const std::string& destination,
     std::uint64_t stored = 0;
     std::uint64_t content = 0;
     std::uint64_t folders = 0;
-    std::string before;
-    const std::uint64_t count = source.archive().entryCount();
+    std::string_view before;
+    const std::uint64_t count = source.entries().count();
     for (std::uint64_t index = 0; index < count; ++index) {
         if (const int error = reports.cancellation())
             return error;
-        if (const char* name = source.archive().name(index)) {
-            folders += newFolders(before, name);
-            before = name;
+        if (const std::optional<std::string_view> name = source.entries().name(index)) {
+            folders += newFolders(before, *name);
+            before = *name;
         }
         ZipEntry entry;
-        if (!source.archive().describe(index, entry))
+        if (!source.entries().describe(index, entry))
             continue;
         stored = saturatingSum(stored, entry.compressedSize);
         stored = saturatingSum(stored, zip::localHeaderLength + zip::directoryHeaderLength);
@@ -294,10 +231,10 @@ std::unique_ptr<SourceArchive> SourceArchive::open(const std::string& path,
         return nullptr;
     }
     if (S_ISREG(source->m_status.st_mode))
-        source->m_archive =
-            LibzipArchive::open(source->m_file.get(), source->size(), kDirectoryBudget,
-                                [reports] { return reports.cancellation(); });
-    if (source->m_archive)
+        source->m_entries =
+            ArchiveEntries::open(source->m_file.get(), source->size(), kDirectoryBudget,
+                                 [reports] { return reports.cancellation(); });
+    if (source->m_entries)
         return source;
     error = reports.cancellation();
     if (error == 0)
@@ -317,11 +254,11 @@ bool SourceArchive::isStillAt(const std::string& path) const {
 
 ArchiveCopier::Count countArchiveEntries(SourceArchive& source, const CopierReports& reports) {
     ArchiveCopier::Count result;
-    const std::uint64_t count = source.archive().entryCount();
+    const std::uint64_t count = source.entries().count();
     for (std::uint64_t index = 0; index < count && reports.cancellation() == 0; ++index) {
-        const char* name = source.archive().name(index);
+        const std::optional<std::string_view> name = source.entries().name(index);
         ZipEntry entry;
-        if (!name || !source.archive().describe(index, entry) || isFolder(name, entry))
+        if (!name || !source.entries().describe(index, entry) || isFolder(*name, entry))
             continue;
         ++result.files;
         result.bytes = saturatingSum(result.bytes, entry.size);
@@ -341,7 +278,7 @@ int expandArchive(SourceArchive& source, const std::string& destination,
     const ArchiveOwner owner(source.status());
     if (const int error = owner.give(root.get()))
         return reports.fatal(error);
-    return Expansion(source.archive(), owner, std::move(root), destination, reports).run();
+    return Expansion(source.entries(), owner, std::move(root), destination, reports).run();
 }
 
 }  // namespace parvel::host

@@ -7,9 +7,9 @@
 #include <string>
 
 #include "parvel/platform/ArchiveCopier.h"
+#include "parvel/platform/linux/ArchiveEntries.h"
 #include "parvel/platform/linux/CopierReports.h"
 #include "parvel/platform/linux/FileDescriptor.h"
-#include "parvel/platform/linux/LibzipArchive.h"
 
 namespace parvel::host {
 
@@ -27,12 +27,12 @@ public:
         return static_cast<std::uint64_t>(m_status.st_size);
     }
     [[nodiscard]] const struct stat& status() const { return m_status; }
-    [[nodiscard]] LibzipArchive& archive() { return *m_archive; }
+    [[nodiscard]] ArchiveEntries& entries() { return *m_entries; }
 
 private:
     FileDescriptor m_file;
     struct stat m_status {};
-    std::unique_ptr<LibzipArchive> m_archive;
+    std::unique_ptr<ArchiveEntries> m_entries;
 };
 
 /// The archive's entries that are no folders; what the archive copier says holds.

@@ -32,8 +32,9 @@ protected:
 
     TemporaryDirectory m_folder;
     struct stat m_archive {};
-    host::ArchiveOwner m_owner{m_archive};
-    host::FoldersBelow m_folders{rootIn(m_folder), m_owner};
+    host::FileDescriptor m_root = rootIn(m_folder);
+    host::ArchiveOwner m_owner{m_archive, m_root.get()};
+    host::FoldersBelow m_folders{std::move(m_root), m_owner};
 };
 
 TEST_F(FoldersBelowTest, TheEmptyPathIsTheFolderThatHoldsAll) {

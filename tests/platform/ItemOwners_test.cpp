@@ -288,9 +288,9 @@ protected:
         return ArchiveCopierFactory::host().makeCopier()->copy(m_folder / archive,
                                                                m_folder / package, options);
     }
-    void makeBook(const std::string& name) {
+    void makeBook(const std::string& name, uid_t owner = kReader, gid_t group = kReaders) {
         m_folder.write(name, ZipBuilder{}.deflated("OPS/text/a", "1").stored("b", "2").bytes());
-        ASSERT_EQ(chown((m_folder / name).c_str(), kReader, kReaders), 0);
+        ASSERT_EQ(chown((m_folder / name).c_str(), owner, group), 0);
     }
 };
 
@@ -303,6 +303,24 @@ TEST_F(ExpandedBooksOwners, WhatRootExpandsIsTheArchivesOwners) {
         EXPECT_EQ(ownedAt(folder), (Owned{kReader, kReaders, 0700})) << folder;
     for (const char* member : {"book/OPS/text/a", "book/b"})
         EXPECT_EQ(ownedAt(member), (Owned{kReader, kReaders, 0600})) << member;
+}
+
+TEST_F(ExpandedBooksOwners, WhatRootExpandsIsTheArchivesGroupsWhoseverTheFolderIs) {
+    makeBook("of readers", 0, kReaders);
+    makeBook("of root", 0, 0);
+    fs::create_directory(m_folder / "shelf");
+    ASSERT_EQ(chown((m_folder / "shelf").c_str(), kReader, kReaders), 0);
+    ASSERT_EQ(chmod((m_folder / "shelf").c_str(), 02770), 0);
+
+    EXPECT_EQ(expand("of readers", "a"), 0);
+    EXPECT_EQ(expand("of readers", "shelf/a"), 0);
+    EXPECT_EQ(expand("of root", "b"), 0);
+    EXPECT_EQ(expand("of root", "shelf/b"), 0);
+
+    for (const char* member : {"a/OPS/text/a", "a/b", "shelf/a/OPS/text/a", "shelf/a/b"})
+        EXPECT_EQ(ownedAt(member), (Owned{0, kReaders, 0600})) << member;
+    for (const char* member : {"b/OPS/text/a", "b/b", "shelf/b/OPS/text/a", "shelf/b/b"})
+        EXPECT_EQ(ownedAt(member), (Owned{0, 0, 0600})) << member;
 }
 
 }  // namespace

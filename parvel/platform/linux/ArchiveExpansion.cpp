@@ -275,7 +275,7 @@ int expandArchive(SourceArchive& source, const std::string& destination,
     FileDescriptor root(::open(destination.c_str(), O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
     if (!root)
         return reports.fatal(errno);
-    const ArchiveOwner owner(source.status());
+    const ArchiveOwner owner(source.status(), root.get());
     if (const int error = owner.give(root.get()))
         return reports.fatal(error);
     return Expansion(source.entries(), owner, std::move(root), destination, reports).run();

@@ -79,30 +79,48 @@ public:
         });
     }
 
+    /// What one read has to take of an entry: its local header and data.
+    [[nodiscard]] static std::size_t lengthOf(const Entry& entry) {
+        constexpr std::size_t extraAllowance = 128;
+        return kLocalLength + entry.name.size() + extraAllowance + entry.stored;
+    }
+    /// As many bytes from the offset on as the file has.
+    [[nodiscard]] std::size_t readPiece(std::uint8_t* piece, std::size_t length,
+                                        std::size_t offset) const {
+        const ssize_t count = pread(m_file, piece, length, static_cast<off_t>(offset));
+        return count < 0 ? 0 : static_cast<std::size_t>(count);
+    }
+    [[nodiscard]] static const std::uint8_t* dataBehind(const std::uint8_t* localHeader) {
+        return localHeader + kLocalLength + get(localHeader + 26, 2) + get(localHeader + 28, 2);
+    }
+    [[nodiscard]] static bool inflate(const Entry& entry, const std::uint8_t* data, void* content) {
+        static libdeflate_decompressor* const inflater = libdeflate_alloc_decompressor();
+        return libdeflate_deflate_decompress(inflater, data, entry.stored, content, entry.size,
+                                             nullptr) == LIBDEFLATE_SUCCESS;
+    }
+    [[nodiscard]] static bool isWhole(const Entry& entry, const void* content) {
+        return libdeflate_crc32(0, content, entry.size) == entry.crc;
+    }
+
     /// Local header and data in one read, inflated and checked.
     [[nodiscard]] bool read(const Entry& entry, std::string& content) {
-        constexpr std::size_t localLength = 30;
-        constexpr std::size_t extraAllowance = 128;
-        const std::size_t wanted = localLength + entry.name.size() + extraAllowance + entry.stored;
+        const std::size_t wanted = lengthOf(entry);
         if (m_piece.size() < wanted)
             m_piece.resize(wanted);
-        if (pread(m_file, m_piece.data(), wanted, entry.offset) <
-            static_cast<ssize_t>(localLength + entry.stored))
+        if (readPiece(m_piece.data(), wanted, entry.offset) < kLocalLength + entry.stored)
             return false;
-        const std::uint8_t* data = m_piece.data() + localLength + get(m_piece.data() + 26, 2) +
-                                   get(m_piece.data() + 28, 2);
-        static libdeflate_decompressor* const inflater = libdeflate_alloc_decompressor();
+        const std::uint8_t* data = dataBehind(m_piece.data());
         content.resize(entry.size);
         if (entry.method == 0)
             std::memcpy(content.data(), data, entry.size);
-        else if (libdeflate_deflate_decompress(inflater, data, entry.stored, content.data(),
-                                               entry.size, nullptr) != LIBDEFLATE_SUCCESS)
+        else if (!inflate(entry, data, content.data()))
             return false;
-        return libdeflate_crc32(0, content.data(), content.size()) == entry.crc;
+        return isWhole(entry, content.data());
     }
 
 private:
     static constexpr std::size_t kEndLength = 22;
+    static constexpr std::size_t kLocalLength = 30;
 
     static std::uint32_t get(const std::uint8_t* bytes, int count) {
         std::uint32_t value = 0;

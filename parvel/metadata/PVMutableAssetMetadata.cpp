@@ -15,7 +15,7 @@ namespace parvel {
 namespace {
 
 /// Few records have more.
-constexpr std::size_t usualEntries = 8;
+constexpr std::size_t usualEntries = 10;
 
 std::optional<Value> pathToStore(const std::optional<URL>& url) {
     return url ? std::optional<Value>(url->path()) : std::nullopt;

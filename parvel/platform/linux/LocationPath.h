@@ -29,7 +29,7 @@ public:
                                       const XmlElementTree::Element* context) const;
 
 private:
-    static constexpr std::size_t maximumPredicates = 4;
+    static constexpr std::size_t maximumPredicates = 2;
     struct Predicate {
         std::uint32_t position = 0;  ///< from 1; 0 for a test of an attribute
         std::string_view attribute;

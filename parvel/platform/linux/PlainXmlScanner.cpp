@@ -23,8 +23,9 @@ constexpr CharacterKinds kNameStart = 1;
 constexpr CharacterKinds kNamePart = 2;
 constexpr CharacterKinds kBlank = 4;
 constexpr CharacterKinds kTextPart = 8;         ///< means itself in text
-constexpr CharacterKinds kValuePart = 16;       ///< means itself in quotes of either kind
-constexpr CharacterKinds kIdentifierPart = 32;  ///< of what identifies an external subset
+constexpr CharacterKinds kTextEnd = 16;         ///< is something of its own within text
+constexpr CharacterKinds kValuePart = 32;       ///< means itself in quotes of either kind
+constexpr CharacterKinds kIdentifierPart = 64;  ///< of what identifies an external subset
 
 constexpr bool isOneOf(char character, std::string_view characters) {
     return characters.find(character) != std::string_view::npos;
@@ -43,6 +44,8 @@ constexpr CharacterKinds kindsOf(char c) {
         kinds |= kBlank;
     if ((isPrintable && !isOneOf(c, "<&]")) || isOneOf(c, "\t\n"))
         kinds |= kTextPart;
+    if (isOneOf(c, "<&\r"))
+        kinds |= kTextEnd;
     if (isPrintable && !isOneOf(c, "<&\"'"))
         kinds |= kValuePart;
     if (isLetter || isDigit || isOneOf(c, " -/.:,()+_"))
@@ -234,7 +237,7 @@ bool PlainXmlScanner::takeText(std::string_view& text) {
         m_at = behindAll(kTextPart, m_at, m_end);
         if (atEnd())
             return false;
-        if (isOneOf(*m_at, "<&\r")) {
+        if (isOf(kTextEnd, *m_at)) {
             text = since(begin);
             return true;
         }

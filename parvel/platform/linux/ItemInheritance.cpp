@@ -9,7 +9,6 @@
 #include "parvel/platform/linux/FileDescriptor.h"
 #include "parvel/platform/linux/ItemContent.h"
 #include "parvel/platform/linux/OpenFolder.h"
-#include "parvel/platform/linux/SystemCall.h"
 
 namespace parvel::host {
 
@@ -21,7 +20,7 @@ constexpr int kDeepestMembers = 200;  // two descriptors a level
 class Succession {
 public:
     Succession(const std::string& oldItem, const std::string& newItem)
-        : m_old(open(oldItem)), m_new(open(newItem)) {
+        : m_old(openItem(AT_FDCWD, oldItem.c_str())), m_new(openItem(AT_FDCWD, newItem.c_str())) {
         m_error = m_old && m_new ? 0 : errno;
         if (m_error == 0 &&
             (::fstat(m_old.get(), &m_oldStatus) != 0 || ::fstat(m_new.get(), &m_newStatus) != 0))
@@ -46,10 +45,6 @@ public:
     }
 
 private:
-    static FileDescriptor open(const std::string& path) {
-        return FileDescriptor(retried(
-            [&] { return ::open(path.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC); }));
-    }
     static bool isFolder(const struct stat& item) { return S_ISDIR(item.st_mode); }
 
     FileDescriptor m_old;

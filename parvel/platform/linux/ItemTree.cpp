@@ -13,19 +13,12 @@
 #include "parvel/platform/linux/HiddenItem.h"
 #include "parvel/platform/linux/ItemContent.h"
 #include "parvel/platform/linux/OpenFolder.h"
-#include "parvel/platform/linux/SystemCall.h"
 
 namespace parvel::host {
 
 namespace {
 
 constexpr int kMaximumDepth = 200;  // three descriptors a level
-
-/// Opens a file or folder, and waits for nobody; none, with errno set, for a link.
-FileDescriptor openItem(int folder, const char* name) {
-    return FileDescriptor(retried(
-        [&] { return ::openat(folder, name, O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC); }));
-}
 
 // Copying
 

@@ -13,4 +13,10 @@ inline FileDescriptor openFolder(int parent, const char* name, int flags) {
         retried([&] { return ::openat(parent, name, O_DIRECTORY | O_CLOEXEC | flags); }));
 }
 
+/// Opens a file or folder for reading, and waits for nobody; none, with errno set, for a link.
+inline FileDescriptor openItem(int folder, const char* name) {
+    return FileDescriptor(retried(
+        [&] { return ::openat(folder, name, O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC); }));
+}
+
 }  // namespace parvel::host

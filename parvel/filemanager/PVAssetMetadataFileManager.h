@@ -124,7 +124,8 @@ public:
     /// removes it and brings back the first one. A record of a kind without such a file is only
     /// given the cover. The record comes back unchanged without a new cover; none for an empty one.
     /// A first one that can't be brought back leaves its error beside the record; a cover that
-    /// can't be moved aside, as where a first one is kept already, does not. Deliberate.
+    /// can't be moved aside, as where a first one is kept already, does not. Deliberate. The
+    /// misspelling is the operation's name.
     AssetPtr _updateImageCoverDataForMetadta_updates_error(const AssetPtr& asset,
                                                            const AssetPtr& updates,
                                                            ErrorOut error = nullptr);
@@ -154,7 +155,8 @@ public:
     /// leaves it under the trash's own name. So does a display name without extension, of an item
     /// that has one. Deliberate. The record's `trashedURL` is its place.
     AssetPtr trashAsset_error(const AssetPtr& asset, ErrorOut error = nullptr);
-    /// Deletes the item for good, a folder with all that is in it; false where it can't.
+    /// Deletes the item for good, a package with all that it holds; of a link the link alone. After
+    /// a failure it stands as it was; where a part of it was gone already, its name is free.
     bool removeAsset_error(const AssetPtr& asset, ErrorOut error = nullptr);
     /// Moves the item aside into the directory; one of that name there fails it. The error is not
     /// written for a record without URL. Deliberate.

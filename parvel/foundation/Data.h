@@ -12,7 +12,8 @@
 namespace parvel {
 
 /// Immutable bytes in one or more ranges. Copies share the bytes. They are owned in memory and
-/// never mapped from a file, so nobody can cut them short.
+/// never mapped from a file, so nobody can cut them short. What was moved from is only to be
+/// assigned to or destroyed.
 class PV_EXPORT Data {
 public:
     using Bytes = std::span<const std::uint8_t>;
@@ -32,9 +33,10 @@ public:
 
     /// The ranges in order; empty for no bytes.
     [[nodiscard]] std::vector<Bytes> ranges() const;
-    /// All bytes as one range. Data of several ranges is copied together once a call, into
-    /// `storage`.
+    /// All bytes as one range, good while this object and `storage` are: data of several ranges is
+    /// copied into `storage` at each call.
     [[nodiscard]] Bytes contiguous(std::vector<std::uint8_t>& storage) const;
+    /// The same as text, in no encoding.
     [[nodiscard]] std::string_view text(std::vector<std::uint8_t>& storage) const;
 
     /// Of the size and the first bytes.

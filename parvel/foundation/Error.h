@@ -14,9 +14,11 @@
 
 namespace parvel {
 
-/// The library's own domain; its codes are PVParvelFoundationErrorCode.
+/// The library's own domain; its codes are PVParvelFoundationErrorCode. Where a header names a code
+/// below zero alone (-1002), it is one of these.
 inline constexpr std::string_view PVParvelFoundationErrorDomain = "PVParvelFoundationErrorDomain";
-/// The platform's general file errors; the codes are PVFileErrorCode.
+/// The platform's general file errors; the codes are PVFileErrorCode. A header's "general error
+/// 259" is one of these.
 inline constexpr std::string_view PVFileErrorDomain = "PVFileErrorDomain";
 /// The code is an errno value (POSIX.1).
 inline constexpr std::string_view PVPOSIXErrorDomain = "PVPOSIXErrorDomain";
@@ -32,12 +34,12 @@ inline constexpr std::string_view PVLocalizedFailureReasonErrorKey =
 
 /// Codes of PVParvelFoundationErrorDomain. -1004, -1005 and -1007 are never raised and stay free.
 enum class PVParvelFoundationErrorCode : std::int64_t {
-    NoAssetType = -1001,
-    MissingURL = -1002,
-    NoAssetID = -1003,
-    NoIdentity = -1006,
-    Cancelled = -1008,
-    CorruptAsset = -1009,
+    NoAssetType = -1001,  ///< the file name's extension is none of the four kinds'
+    MissingURL = -1002,   ///< the operation needs a URL that is absent
+    NoAssetID = -1003,    ///< what was read has no asset ID, or is no audio file
+    NoIdentity = -1006,   ///< store ID, generated ID and path are absent, or the one of them needed
+    Cancelled = -1008,    ///< a copy was cancelled
+    CorruptAsset = -1009,  ///< no record, or one without URL, for synchronised storage
 };
 
 /// Codes of PVFileErrorDomain.

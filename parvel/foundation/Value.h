@@ -34,7 +34,8 @@ struct Null {
 
 /// One property-list value, or the null marker. Arrays and dictionaries are immutable behind a
 /// shared pointer, so a copy is cheap. `as<T>()` looks at the value; absent values are null
-/// pointers to Value, never a kind of Value.
+/// pointers to Value, never a kind of Value. What was moved from is only to be assigned to or
+/// destroyed.
 class PV_EXPORT Value {
 public:
     Value() = default;  ///< the null marker
@@ -48,7 +49,7 @@ public:
     Value(Data data) : m_storage(std::move(data)) {}
     Value(Array array);
     Value(Dictionary dictionary);
-    /// Shares the dictionary without a copy; null is not allowed.
+    /// These share the container without a copy; null is not allowed.
     Value(std::shared_ptr<const Dictionary> dictionary) : m_storage(std::move(dictionary)) {}
     Value(std::shared_ptr<const Array> array) : m_storage(std::move(array)) {}
     Value(const Value&) = default;

@@ -2,6 +2,7 @@
 
 #include <memory>
 #include <optional>
+#include <utility>
 
 #include "parvel/foundation/ErrorOut.h"
 #include "parvel/foundation/URL.h"

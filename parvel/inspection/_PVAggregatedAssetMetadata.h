@@ -2,6 +2,7 @@
 
 #include <memory>
 #include <optional>
+#include <utility>
 
 #include "parvel/foundation/URL.h"
 #include "parvel/inspection/_PVAggregatedAssetData.h"

@@ -66,7 +66,8 @@ public:
     void cancel() override;
 
     /// The staging directory, after the item of the source's name in it is gone; none where that
-    /// can't be deleted, or where the source has no name of its own.
+    /// can't be deleted, or where the source has no name of its own. The misspelling is the
+    /// operation's name.
     [[nodiscard]] std::optional<URL> _subtaskTargetDirectoryWithInstalltDirectory_error(
         const std::optional<URL>& installDirectory, ErrorOut error = nullptr);
 

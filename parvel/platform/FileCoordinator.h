@@ -3,6 +3,7 @@
 #include <functional>
 #include <memory>
 #include <optional>
+#include <utility>
 
 #include "parvel/foundation/ErrorOut.h"
 #include "parvel/foundation/PVExport.h"

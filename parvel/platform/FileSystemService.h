@@ -3,6 +3,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <utility>
 
 #include "parvel/foundation/ErrorOut.h"
 #include "parvel/foundation/PVExport.h"
@@ -46,7 +47,8 @@ public:
     /// anything stands at the destination.
     virtual bool copyItem(const URL& source, const URL& destination, ErrorOut error = nullptr) = 0;
     /// Removes a file, a link or a whole folder; links are not followed. What stands for an item
-    /// that is not on this device goes without a download.
+    /// that is not on this device goes without a download. After a failure the item stands as it
+    /// was; where a part of a folder was gone already, its name is free.
     virtual bool removeItem(const URL& item, ErrorOut error = nullptr) = 0;
     /// Moves the item to the user's trash (freedesktop.org Trash specification 1.0): the home
     /// trash, or its volume's own. `resulting` is its place there.

@@ -46,6 +46,7 @@ struct CoverFiles {
 
 AssetPtr restoreOriginalCover(FileSystemService& fileManager, const PVAssetMetadata& asset,
                               const CoverFiles& files, ErrorOut error) {
+    // Deliberate: the misspelling is part of the text.
     PVParvelLog().info("ReplaceCover: udpates.coverImageData = null -- Removing existing metadata");
     if (!fileManager.removeItem(files.artwork, error))
         return nullptr;

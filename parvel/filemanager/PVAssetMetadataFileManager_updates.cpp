@@ -43,11 +43,12 @@ PVAssetMetadataFileManager::updateAsset_withUpdates_temporaryDirectory_inflateIf
         copy.setGenerationCount(copy.generationCount() + 1);
         // Deliberate: updates that don't speak of a preview make it none.
         copy.setPreview(changes->isPreview());
+        // The record is still being made, so the pointer to it owns nothing.
         persistXattrMetadata(AssetPtr(AssetPtr(), &copy));
     });
     if (isKnown) {
         // Deliberate: the asset as it was given, also where its PDF was renamed, and although its
-        // attributes are written by now.
+        // attributes are written. The misspelling is part of the text.
         PVParvelLog().error("updateMetadata: updates == metadta -- Done");
         return asset;
     }

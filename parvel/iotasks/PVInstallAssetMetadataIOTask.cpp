@@ -111,9 +111,11 @@ std::optional<URL> PVInstallAssetMetadataIOTask::_subtaskTargetDirectoryWithInst
                                 candidate);
             return std::nullopt;
         }
+        // Deliberate: the misspelling is part of the text.
         PVParvelLog().info("TemporaryDirectory: Deleted existig temporary file: %@", candidate);
         return staging;
     }
+    // Deliberate: the misspelling is part of the text.
     PVParvelLog().debug("TemporaryDiretory: Target URL available: %@", candidate);
     return staging;
 }

@@ -131,6 +131,7 @@ std::uint64_t fixPermissionsAndCalculateAllocatedSize(const URL& url, ErrorOut e
     std::uint64_t size = 0;
     const auto isDirectory = queries.isDirectory(url, &directoryError);
     if (!isDirectory) {
+        // Deliberate: the misspelling is part of the text.
         PVParvelLog().error("Failed to state file for directory");
     } else if (*isDirectory) {
         size = fixPermissionsOfPackage(url);

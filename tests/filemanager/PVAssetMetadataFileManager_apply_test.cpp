@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include "parvel/xattr/PNMetadataXattr.h"
+#include "tests/support/EnvironmentValue.h"
 #include "tests/support/ForwardingXattrStore.h"
 #include "tests/support/ManagedFolder.h"
 #include "tests/support/RecordedLog.h"
@@ -13,11 +14,7 @@ namespace {
 /// A library and a freshly downloaded version of a book beside it.
 class ApplyingUpdates : public ManagedFolder {
 protected:
-    void SetUp() override {
-        setenv("XDG_RUNTIME_DIR", m_locks.path().c_str(), 1);
-        makeFolder("library");
-    }
-    void TearDown() override { unsetenv("XDG_RUNTIME_DIR"); }
+    ApplyingUpdates() { makeFolder("library"); }
 
     MutableAssetPtr book(const std::string& name, const std::string& content, Dictionary entries) {
         return PVAssetMetadata::metadataWithURL_dictionary(asset(name, content)->url(), &entries);
@@ -34,7 +31,9 @@ protected:
             std::make_shared<RefusingFileSystem>([](auto, const URL&) { return true; }));
     }
 
+private:
     TemporaryDirectory m_locks;
+    EnvironmentValue m_runtime{"XDG_RUNTIME_DIR", m_locks.path().string()};
 };
 
 /// A file system that keeps no attributes.

@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include "parvel/metadata/PVMutableAssetMetadata.h"
+#include "tests/support/EnvironmentValue.h"
 #include "tests/support/InstallFolder.h"
 
 namespace parvel::testing {
@@ -8,11 +9,7 @@ namespace {
 
 class PlacingInstalls : public InstallFolder {
 protected:
-    void SetUp() override {
-        setenv("XDG_RUNTIME_DIR", m_locks.path().c_str(), 1);
-        makeFolder("cloud/.stfolder");
-    }
-    void TearDown() override { unsetenv("XDG_RUNTIME_DIR"); }
+    PlacingInstalls() { makeFolder("cloud/.stfolder"); }
 
     /// The same install into synchronised storage.
     AssetPtr executeIntoCloud() {
@@ -25,7 +22,9 @@ protected:
         return all;
     }
 
+private:
     TemporaryDirectory m_locks;
+    EnvironmentValue m_runtime{"XDG_RUNTIME_DIR", m_locks.path().string()};
 };
 
 TEST_F(PlacingInstalls, AReplacingUpdateLandsUnderTheOldAssetsName) {

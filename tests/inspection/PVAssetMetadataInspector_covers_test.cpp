@@ -91,14 +91,6 @@ TEST_F(CoverImageData, OfABookWithoutACoverIsNone) {
     EXPECT_EQ(m_error, std::nullopt);
 }
 
-TEST_F(CoverImageData, AFolderThatIsNoBookHasNoArtworkFile) {
-    const URL url = book().file("BazaarArtwork", "artwork").expand(m_folder / "folder");
-
-    EXPECT_EQ(cover(url), std::nullopt);
-
-    EXPECT_EQ(m_error, makeNoAssetTypeError(url));
-}
-
 TEST_F(CoverImageData, OfWhatIsNotThereIsTheWholeReadsFailure) {
     const URL url = m_folder.url("absent.epub");
     const RecordedLog log;

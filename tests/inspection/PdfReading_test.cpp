@@ -11,15 +11,13 @@
 #include "parvel/platform/ImageCodec.h"
 #include "parvel/platform/ReaderProgram.h"
 #include "parvel/platform/Service.h"
+#include "tests/support/Colours.h"
 #include "tests/support/PdfBuilder.h"
 #include "tests/support/RecordedLog.h"
 #include "tests/support/TemporaryDirectory.h"
 
 namespace parvel::testing {
 namespace {
-
-constexpr std::uint32_t white = 0xFFFFFFFF;
-constexpr std::uint32_t red = 0xFFFF0000;
 
 /// Whole documents, read by the helper program.
 class PdfReading : public ::testing::Test {

@@ -43,4 +43,5 @@ echo "== program"
 "$prefix/bin/parvel" --version --json | grep '"seccomp":true'
 
 echo "== SONAME"
-readelf -d "$prefix/$libdir/libParvelFoundation.so" | grep -E 'SONAME.*libParvelFoundation\.so\.[0-9]+'
+readelf -d "$prefix/$libdir/libParvelFoundation.so" |
+    grep -E 'SONAME.*libParvelFoundation\.so\.(0\.[0-9]+|[1-9][0-9]*)\]'

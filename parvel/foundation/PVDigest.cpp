@@ -2,6 +2,7 @@
 
 #include <memory>
 
+#include "parvel/foundation/UpperCaseHex.h"
 #include "parvel/platform/Digest.h"
 #include "parvel/platform/Service.h"
 
@@ -15,16 +16,6 @@ std::optional<String> parvel_MD5String(const Data& data) {
         running->update(range);
     const std::optional<Digest::MD5> digest = running->finish();
     return digest ? std::optional(upperCaseHex(*digest)) : std::nullopt;
-}
-
-String upperCaseHex(Data::Bytes bytes) {
-    String text;
-    text.reserve(2 * bytes.size());
-    for (std::uint8_t byte : bytes) {
-        text += "0123456789ABCDEF"[byte >> 4];
-        text += "0123456789ABCDEF"[byte & 15];
-    }
-    return text;
 }
 
 }  // namespace parvel

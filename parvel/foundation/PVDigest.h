@@ -11,7 +11,4 @@ namespace parvel {
 /// in order by one update. None where the host's digest service refuses MD5.
 PV_EXPORT std::optional<String> parvel_MD5String(const Data& data);
 
-/// The bytes as upper-case hexadecimal characters, as above.
-[[nodiscard]] String upperCaseHex(Data::Bytes bytes);
-
 }  // namespace parvel

@@ -2,8 +2,8 @@
 #include <utility>
 
 #include "parvel/foundation/PVCasts.h"
-#include "parvel/foundation/PVDigest.h"
 #include "parvel/foundation/PVParvelLog.h"
+#include "parvel/foundation/UpperCaseHex.h"
 #include "parvel/inspection/PVAssetMetadataInspector.h"
 #include "parvel/metadata/PVMutableAssetMetadata.h"
 #include "parvel/platform/Digest.h"

@@ -28,12 +28,11 @@ LOWER = {
     "reader/images": {"parvel/platform"},
 }
 
-# Ties that run back up, from source files alone: a task calls the manager that made it, and the
-# inspector's attribute read is the manager's; staging asks where synchronised storage begins.
+# Ties that run back up, from source files alone: a task calls the manager that made it, and staging
+# asks where synchronised storage begins.
 BACK = {
     ("parvel/platform/linux", "parvel/platform/linux/cloud/SyncedPlace.h"),
     ("parvel/iotasks", "parvel/filemanager/PVAssetMetadataFileManager.h"),
-    ("parvel/inspection", "parvel/filemanager/PVAssetMetadataFileManager.h"),
 }
 
 # Only these layers may include headers of the system and of other libraries.

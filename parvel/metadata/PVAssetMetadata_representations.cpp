@@ -146,6 +146,7 @@ bool PVAssetMetadata::identityOfDictionary_matchesDictionary_key(
         const std::optional<Value> first = normalizedValue(dictionary, *key);
         return first && first == normalizedValue(other, *key);
     }
+    // Deliberate: identities that differ decide nothing where another one matches.
     return generatedIDsMatch(dictionary, other) || storeIDsMatch(dictionary, other) ||
            pathsMatch(dictionary, other);
 }

@@ -18,7 +18,7 @@ struct CloudReport {
     std::optional<DownloadingStatus> status;  ///< none where nobody can tell, and outside
     std::string client;                       ///< the sync client's name; empty outside
     std::string root;    ///< the path of the synchronised folder; empty outside
-    std::string mark;    ///< the name in that folder that tells; empty where the desktop does
+    std::string mark;    ///< the name in that folder that marks it; empty where the desktop tells
     std::string reason;  ///< for the status, in a few English words
 };
 

@@ -9,7 +9,7 @@
 namespace parvel {
 
 /// What confines the helper program, parvel-reader, which parses PDF documents and images. Where it
-/// can't be had, PDF documents can't be opened, and nothing else is amiss.
+/// can't be had, PDF documents can't be opened and images not decoded; all else works.
 struct ReaderConfinement {
     bool hasSystemCallFilter = false;  ///< a seccomp filter
     bool hasNoFiles = false;           ///< Landlock, without any path

@@ -31,8 +31,9 @@ PV_EXPORT bool pvamfm_setExtendedAttributeString_forKey_error(const URL& url,
 PV_EXPORT bool pvamfm_extendedAttributeData_forKey_error(const URL& url, std::optional<Data>* data,
                                                          std::string_view key,
                                                          ErrorOut error = nullptr);
-/// The same as text, which ends at the first NUL. Bytes that are no UTF-8, be it behind the NUL,
-/// give no text: `string` becomes none. Without `string` the attribute is read all the same.
+/// The same as text, which ends at the first NUL. Bytes that are no valid UTF-8, also where that is
+/// behind the NUL, give no text: `string` becomes none. Without `string` the attribute is read all
+/// the same.
 PV_EXPORT bool pvamfm_extendedAttributeString_forKey_error(const URL& url,
                                                            std::optional<String>* string,
                                                            std::string_view key,

@@ -5,7 +5,6 @@
 #include <cmath>
 #include <limits>
 #include <numbers>
-#include <utility>
 #include <vector>
 
 #include "parvel/platform/ImageCodec.h"

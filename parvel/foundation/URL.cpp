@@ -6,7 +6,6 @@
 #include <functional>
 #include <system_error>
 #include <utility>
-#include <vector>
 
 namespace parvel {
 namespace {

@@ -1,9 +1,6 @@
 #pragma once
 
-#include <array>
 #include <string_view>
-
-#include "parvel/foundation/PVExport.h"
 
 /// The extended attributes that carry an asset's metadata on the file or package folder itself.
 /// Every value is UTF-8 text without a terminator.

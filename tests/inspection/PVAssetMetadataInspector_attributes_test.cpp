@@ -7,7 +7,6 @@
 #include "parvel/metadata/PVAssetMetadataKeys.h"
 #include "parvel/metadata/PVMutableAssetMetadata.h"
 #include "parvel/platform/DateText.h"
-#include "parvel/platform/Service.h"
 #include "parvel/xattr/PNMetadataXattr.h"
 #include "tests/support/AttributeFolder.h"
 #include "tests/support/EpubBuilder.h"

@@ -8,7 +8,6 @@
 #include "parvel/foundation/PVDigest.h"
 #include "parvel/metadata/PVAssetMetadataKeys.h"
 #include "parvel/platform/MalformedInput.h"
-#include "parvel/platform/ResourceQueries.h"
 #include "parvel/platform/Service.h"
 #include "parvel/platform/XmlDocument.h"
 #include "parvel/platform/ZipArchive.h"

@@ -1,12 +1,10 @@
 #pragma once
 
-#include <cerrno>
 #include <cstring>
 #include <optional>
 #include <span>
 #include <string>
 #include <string_view>
-#include <vector>
 
 #include <gtest/gtest.h>
 

@@ -1,7 +1,6 @@
 #pragma once
 
 #include <optional>
-#include <utility>
 #include <vector>
 
 #include "parvel/metadata/PVMutableAssetMetadata.h"

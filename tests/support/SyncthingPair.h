@@ -1,7 +1,6 @@
 #pragma once
 
 #include <array>
-#include <memory>
 #include <string>
 
 #include "tests/support/EnvironmentValue.h"

@@ -1,6 +1,6 @@
 #include "parvel/xattr/ExtendedAttributes.h"
 
-#include <cstring>
+#include <cerrno>
 #include <functional>
 
 #include <gtest/gtest.h>

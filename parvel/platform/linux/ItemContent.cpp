@@ -17,6 +17,7 @@
 #include <string_view>
 #include <vector>
 
+#include "parvel/platform/linux/RoomAhead.h"
 #include "parvel/platform/linux/SystemCall.h"
 
 namespace parvel::host {
@@ -37,12 +38,15 @@ enum class PieceWay { Share, Range, Sendfile, Buffer };
 /// Copies a file of a given size, and what it has grown by.
 class PieceCopy {
 public:
-    PieceCopy(int from, int to, std::uint64_t size) : m_from(from), m_to(to), m_size(size) {}
+    PieceCopy(int from, int to, std::uint64_t size)
+        : m_from(from), m_to(to), m_size(size), m_room(to, size) {}
 
     /// The length copied; 0 at the end of the file, and negative with errno set.
     ssize_t next() {
         for (;;) {
             const ssize_t length = retried([&] { return copyPiece(); });
+            if (length > 0)
+                m_copied += static_cast<std::uint64_t>(length);
             if (length > 0 || m_way == PieceWay::Buffer || (length < 0 && !canFallBack(errno)))
                 return length;
             if (m_way == PieceWay::Share) {
@@ -55,6 +59,9 @@ public:
         }
     }
 
+    /// For a copy that does not come to its end.
+    void giveRoomBack() { m_room.giveBack(); }
+
 private:
     static bool canFallBack(int error) {
         return error == EXDEV || error == EINVAL || error == ENOSYS || error == EOPNOTSUPP ||
@@ -64,24 +71,25 @@ private:
     /// Sharing leaves the positions of the files where they are.
     bool startBehindShared() {
         m_way = PieceWay::Range;
-        const auto shared = static_cast<off_t>(m_shared);
-        return m_shared == 0 || (::lseek(m_from, shared, SEEK_SET) == shared &&
+        const auto shared = static_cast<off_t>(m_copied);
+        return m_copied == 0 || (::lseek(m_from, shared, SEEK_SET) == shared &&
                                  ::lseek(m_to, shared, SEEK_SET) == shared);
     }
 
     ssize_t sharePiece() {
-        const std::uint64_t length = std::min(kSharedPiece, m_size - m_shared);
+        const std::uint64_t length = std::min(kSharedPiece, m_size - m_copied);
         file_clone_range range{};
         range.src_fd = m_from;
-        range.src_offset = range.dest_offset = m_shared;
+        range.src_offset = range.dest_offset = m_copied;
         range.src_length = length;
         if (length == 0 || ::ioctl(m_to, FICLONERANGE, &range) != 0)
             return length == 0 ? 0 : -1;
-        m_shared += length;
         return static_cast<ssize_t>(length);
     }
 
     ssize_t copyPiece() {
+        if (m_way != PieceWay::Share)
+            m_room.reached(m_copied);
         switch (m_way) {
             case PieceWay::Share:
                 return sharePiece();
@@ -109,10 +117,29 @@ private:
     int m_from;
     int m_to;
     std::uint64_t m_size;
-    std::uint64_t m_shared = 0;
+    std::uint64_t m_copied = 0;
     PieceWay m_way = PieceWay::Share;
+    RoomAhead m_room;
     std::unique_ptr<char[]> m_buffer;
 };
+
+/// 0 or the errno value.
+int copyAll(PieceCopy& pieces, std::uint64_t size, const PieceReport& report) {
+    std::uint64_t copied = 0;
+    for (;;) {
+        const ssize_t length = pieces.next();
+        if (length < 0)
+            return errno;
+        copied += static_cast<std::uint64_t>(length);
+        // Cut short, or grown, while it was copied.
+        if (copied > size || (length == 0 && copied < size))
+            return EIO;
+        if (length == 0)
+            return 0;
+        if (const int error = report ? report(copied) : 0)
+            return error;
+    }
+}
 
 /// What a call gives that tells the size where it has no room: asked again where the content has
 /// grown in between. None with errno set.
@@ -226,20 +253,10 @@ mode_t modeWithout(mode_t mode, bool hasGroup, bool hasAccessList) {
 
 int copyContent(int from, int to, std::uint64_t size, const PieceReport& report) {
     PieceCopy pieces(from, to, size);
-    std::uint64_t copied = 0;
-    for (;;) {
-        const ssize_t length = pieces.next();
-        if (length < 0)
-            return errno;
-        copied += static_cast<std::uint64_t>(length);
-        // Cut short, or grown, while it was copied.
-        if (copied > size || (length == 0 && copied < size))
-            return EIO;
-        if (length == 0)
-            return 0;
-        if (const int error = report ? report(copied) : 0)
-            return error;
-    }
+    const int error = copyAll(pieces, size, report);
+    if (error != 0)
+        pieces.giveRoomBack();
+    return error;
 }
 
 int copyAttributes(int from, int to, bool onlyMissing) {

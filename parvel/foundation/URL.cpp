@@ -242,9 +242,10 @@ std::string_view lastComponentOfPath(std::string_view path) {
 }
 
 std::string_view extensionOfPath(std::string_view path) {
-    const std::string_view name = lastComponentOfPath(path);
-    const std::size_t dot = name.rfind('.');
-    return dot == std::string_view::npos ? std::string_view() : name.substr(dot + 1);
+    path = withoutTrailingSlashes(path);
+    const std::size_t dot = path.find_last_of("./");
+    return dot == std::string_view::npos || path[dot] == '/' ? std::string_view()
+                                                             : path.substr(dot + 1);
 }
 
 std::string_view pathWithoutExtension(std::string_view path) {

@@ -223,9 +223,7 @@ TEST_F(Reconciling, AMissingAssetWhoseAttributesCanNotBeWrittenComesBackWithTheE
 
     ASSERT_EQ(found.size(), 1U);
     EXPECT_TRUE(found[0]->_hasAllocatedSize());
-    ASSERT_TRUE(m_error);
-    EXPECT_EQ(m_error->domain(), PVPOSIXErrorDomain);
-    EXPECT_EQ(m_error->code(), EROFS);
+    EXPECT_EQ(m_error, makePOSIXError(EROFS, book));
 }
 
 TEST_F(Reconciling, TheManagersOwnServicesAreNotAsked) {

@@ -22,11 +22,7 @@ protected:
         return result;
     }
     void expectNoSuchFile(const URL& url) {
-        ASSERT_TRUE(m_error);
-        EXPECT_EQ(m_error->domain(), PVFileErrorDomain);
-        EXPECT_EQ(m_error->code(), 4);
-        ASSERT_TRUE(m_error->url());
-        EXPECT_EQ(*m_error->url(), url);
+        EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::NoSuchFile, url));
     }
 
     CloudStore& m_store = CloudStore::host();

@@ -17,11 +17,7 @@ protected:
         return ResourceQueries::host().relationship(directory, item, &m_error);
     }
     void expectNoSuchFile(const URL& url) {
-        ASSERT_TRUE(m_error);
-        EXPECT_EQ(m_error->domain(), PVFileErrorDomain);
-        EXPECT_EQ(m_error->code(), 4);
-        ASSERT_TRUE(m_error->url());
-        EXPECT_EQ(*m_error->url(), url);
+        EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::NoSuchFile, url));
     }
 
     ResourceQueries& m_queries = ResourceQueries::host();
@@ -55,9 +51,7 @@ TEST_F(ResourceQueriesTest, ALoopOfLinksIsAPOSIXError) {
     std::filesystem::create_symlink("link", m_folder / "link");
 
     EXPECT_FALSE(m_queries.isReachable(m_folder.url("link"), &m_error));
-    ASSERT_TRUE(m_error);
-    EXPECT_EQ(m_error->domain(), PVPOSIXErrorDomain);
-    EXPECT_EQ(m_error->code(), ELOOP);
+    EXPECT_EQ(m_error, makePOSIXError(ELOOP, m_folder.url("link")));
 }
 
 TEST_F(ResourceQueriesTest, TellsFoldersFromFilesThroughLinks) {

@@ -27,8 +27,6 @@ protected:
     std::shared_ptr<FileSystemService> m_service = FileSystemService::makeDefault();
     std::optional<URL> m_resulting;
     std::optional<Error> m_error;
-
-private:
 };
 
 TEST_F(Trash, ATrashedItemLiesInTheHomeTrashWithItsInfoFile) {
@@ -100,7 +98,8 @@ TEST_F(Trash, AFailedRenameWithinTheTrashLeavesItemAndInfoFile) {
     EXPECT_FALSE(
         m_service->moveItem(*m_resulting, m_folder.url("data/Trash/files/b.pdf"), &m_error));
 
-    EXPECT_EQ(m_error->code(), 516);
+    EXPECT_EQ(m_error,
+              makeFileError(PVFileErrorCode::FileExists, m_folder.url("data/Trash/files/b.pdf")));
     EXPECT_EQ(m_folder.read("data/Trash/files/a.pdf"), "1");
     EXPECT_TRUE(fs::exists(trash("info/a.pdf.trashinfo")));
     EXPECT_FALSE(fs::exists(trash("info/b.pdf.trashinfo")));
@@ -112,7 +111,7 @@ TEST_F(Trash, ARenameOntoItsOwnNameWithinTheTrashFailsAndTouchesNothing) {
 
     EXPECT_FALSE(m_service->moveItem(*m_resulting, *m_resulting, &m_error));
 
-    EXPECT_EQ(m_error->code(), 516);
+    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::FileExists, *m_resulting));
     EXPECT_EQ(m_folder.read("data/Trash/files/a.pdf"), "1");
     EXPECT_TRUE(fs::exists(trash("info/a.pdf.trashinfo")));
 }
@@ -124,7 +123,8 @@ TEST_F(Trash, ARenameIntoAFolderThatDoesNotExistInTheTrashFails) {
     EXPECT_FALSE(
         m_service->moveItem(*m_resulting, m_folder.url("data/Trash/files/Name/pdf"), &m_error));
 
-    EXPECT_EQ(m_error->code(), 4);
+    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::NoSuchFile,
+                                     m_folder.url("data/Trash/files/Name/pdf")));
     EXPECT_TRUE(fs::exists(trash("files/a.pdf")));
     EXPECT_TRUE(fs::exists(trash("info/a.pdf.trashinfo")));
 }

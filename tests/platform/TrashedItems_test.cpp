@@ -39,8 +39,6 @@ protected:
     TemporaryDirectory m_folder;
     const EnvironmentValue m_dataHome{"XDG_DATA_HOME", m_folder / "data"};
     std::shared_ptr<FileSystemService> m_service = FileSystemService::makeDefault();
-
-private:
 };
 
 using Pairs = std::vector<std::pair<std::string, std::string>>;

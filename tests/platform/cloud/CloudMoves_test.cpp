@@ -46,10 +46,7 @@ protected:
     }
     [[nodiscard]] bool exists(const std::string& name) const { return fs::exists(m_folder / name); }
     void expectError(std::string_view domain, std::int64_t code, const std::string& name) {
-        ASSERT_TRUE(m_error);
-        EXPECT_EQ(m_error->domain(), domain);
-        EXPECT_EQ(m_error->code(), code);
-        EXPECT_EQ(*m_error->url(), m_folder.url(name));
+        EXPECT_EQ(m_error, Error(domain, code, {{std::string(PVURLErrorKey), m_folder.url(name)}}));
     }
 
     TemporaryDirectory m_folder;

@@ -288,10 +288,7 @@ protected:
         return isFetched;
     }
     void expectTimedOut(std::string_view name) {
-        ASSERT_TRUE(m_error);
-        EXPECT_EQ(m_error->domain(), PVPOSIXErrorDomain);
-        EXPECT_EQ(m_error->code(), ETIMEDOUT);
-        EXPECT_EQ(*m_error->url(), m_folder.url(name));
+        EXPECT_EQ(m_error, makePOSIXError(ETIMEDOUT, m_folder.url(name)));
     }
 
     std::optional<Error> m_error;

@@ -35,7 +35,7 @@ void waitForSignals(sigset_t signals) {
             _exit(kInterruptedExit);
         const std::uint64_t one = 1;
         // A full counter would wake the thread all the same.
-        static_cast<void>(!write(s_wakeUp, &one, sizeof one));
+        (void)!write(s_wakeUp, &one, sizeof one);
         const std::lock_guard lock(s_callMutex);
         if (s_call)
             s_call();

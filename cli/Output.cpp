@@ -63,7 +63,7 @@ int writeAll(int descriptor, std::string_view text) {
 
 void writeToStandardError(std::string_view text) {
     // Nobody is left to tell when standard error itself fails.
-    static_cast<void>(writeAll(STDERR_FILENO, text));
+    (void)writeAll(STDERR_FILENO, text);
 }
 
 }  // namespace parvel::cli

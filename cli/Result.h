@@ -23,7 +23,7 @@ struct Result {
     std::vector<Dictionary::Entry> fields;  ///< what the command adds to the keys of every result
     bool needsRecord = true;                ///< whether it is a failure that there is no record
     bool isUndone = false;                  ///< a record came, but not all that it says was written
-    std::string_view nothing = "no metadata";  ///< what there is where there is no record
+    std::string_view nothing = "no metadata";  ///< what a failure without an error is called
     std::string reason;   ///< what the log said about a failure, in words for a person
     std::string advice;   ///< what to do about a failure, where the command knows
     std::string outcome;  ///< what was done, in words for a person, where that is the result's text

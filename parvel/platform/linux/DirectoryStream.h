@@ -15,7 +15,7 @@ public:
     explicit DirectoryStream(FileDescriptor directory)
         : m_stream(directory ? ::fdopendir(directory.get()) : nullptr) {
         if (m_stream)
-            static_cast<void>(directory.release());
+            (void)directory.release();
     }
     ~DirectoryStream() {
         if (m_stream)

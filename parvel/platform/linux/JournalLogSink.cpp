@@ -53,7 +53,7 @@ public:
         for (std::size_t i = 0; i < fields.size(); ++i)
             list[i] = {fields[i].data(), fields[i].size()};
         // A line that can't be delivered is lost; logging never fails an operation.
-        static_cast<void>(sd_journal_sendv(list.data(), static_cast<int>(list.size())));
+        (void)sd_journal_sendv(list.data(), static_cast<int>(list.size()));
     }
 
 private:

@@ -181,7 +181,7 @@ private:
     }
 };
 
-/// Where packages are made for true.
+/// Where packages are really made.
 class Scratch {
 public:
     /// A path of no item yet; empty, with the errno value, where there can be none.

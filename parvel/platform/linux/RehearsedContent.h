@@ -7,7 +7,7 @@
 namespace parvel::host {
 
 /// The services that read, write and copy files' content, over a rehearsed disk: a file is read
-/// where it really lies, one that would be written only takes its name. Packages are made for true,
+/// where it really lies, one that would be written only takes its name. Packages are really made,
 /// in a folder of the system's temporary directory that goes with the last of these services, so
 /// that a rehearsal tells what a damaged archive would come to. In force while it lives.
 class RehearsedContent {

@@ -63,8 +63,8 @@ int moveInto(const TrashFolder& trash, const std::string& item, const std::strin
     return EEXIST;
 }
 
-/// The item's info file; none where there is none. One that can't be looked at is one: its own
-/// rename then tells.
+/// The item's info file, where it has one. One that can't be looked at counts as there: its rename
+/// then tells why.
 std::optional<std::string> infoFileThere(const std::string& item) {
     std::optional<std::string> info = infoFileOfTrashed(item);
     struct stat status {};

@@ -23,6 +23,10 @@
 #include <filesystem>
 
 #include "parvel/platform/linux/FileDescriptor.h"
+#include "parvel/platform/linux/Libcrypto.h"
+#include "parvel/platform/linux/Libicui18n.h"
+#include "parvel/platform/linux/Libsystemd.h"
+#include "parvel/platform/linux/Libzip.h"
 
 namespace parvel::testing {
 namespace {
@@ -236,6 +240,15 @@ void decideOnCalls(int listener, int process, pid_t child, const Trap& trap, Tra
     }
 }
 
+/// Loads in this process what an operation would load on its first use in each child, whose calls
+/// for that would be held too.
+void loadLibraries() {
+    (void)host::Libcrypto::host();
+    (void)host::Libicui18n::host();
+    (void)host::Libsystemd::host();
+    (void)host::Libzip::host();
+}
+
 std::optional<bool> answerOf(pid_t child, int* status) {
     while (::waitpid(child, status, 0) < 0 && errno == EINTR) {
     }
@@ -248,6 +261,7 @@ std::optional<bool> answerOf(pid_t child, int* status) {
 
 TrappedRun runTrapped(const Trap& trap, HostAbilities abilities,
                       const std::function<bool()>& operation) {
+    loadLibraries();
     TrappedRun run;
     std::array<int, 2> sockets{};
     if (::socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, sockets.data()) != 0)

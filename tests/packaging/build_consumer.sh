@@ -42,6 +42,12 @@ echo "== program"
 # Only with its helper program can it tell how that is confined.
 "$prefix/bin/parvel" --version --json | grep '"seccomp":true'
 
+echo "== no start pays for the libraries that are loaded on use"
+if readelf -d "$prefix/$libdir/libParvelFoundation.so" "$prefix/bin/parvel" |
+    grep -E 'NEEDED.*lib(crypto|icui18n|systemd|zip)\.so'; then
+    exit 1
+fi
+
 echo "== SONAME"
 readelf -d "$prefix/$libdir/libParvelFoundation.so" |
     grep -E 'SONAME.*libParvelFoundation\.so\.(0\.[0-9]+|[1-9][0-9]*)\]'

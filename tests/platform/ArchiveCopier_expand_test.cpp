@@ -7,6 +7,7 @@
 
 #include "parvel/platform/linux/FileDescriptor.h"
 #include "parvel/platform/linux/LibzipArchive.h"
+#include "tests/support/AbsentLibrary.h"
 #include "tests/support/ArchiveCopying.h"
 
 namespace parvel::testing {
@@ -201,6 +202,15 @@ TEST_F(ExpandingArchives, AnOpeningThatIsInterruptedGivesNoArchive) {
 
     EXPECT_FALSE(host::LibzipArchive::open(file.get(), size, budget, [] { return ECANCELED; }));
     EXPECT_TRUE(host::LibzipArchive::open(file.get(), size, budget, [] { return 0; }));
+}
+
+TEST_F(ExpandingArchives, WithoutLibzipThereIsNoArchive) {
+    writeSource(ZipBuilder{}.stored("a", "1"));
+    const host::FileDescriptor file(::open(sourcePath().c_str(), O_RDONLY | O_CLOEXEC));
+
+    EXPECT_FALSE(host::LibzipArchive::open(file.get(), std::filesystem::file_size(sourcePath()),
+                                           host::LibzipArchive::readingBudget, nullptr,
+                                           absentLibrary<host::Libzip>()));
 }
 
 TEST_F(ExpandingArchives, AnExistingDestinationIsFatalAndStaysAsItIs) {

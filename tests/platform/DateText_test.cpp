@@ -1,6 +1,7 @@
 #include "parvel/platform/DateText.h"
 
 #include "parvel/platform/linux/DateTextICU.h"
+#include "tests/support/AbsentLibrary.h"
 #include "tests/support/TestRounds.h"
 
 #include <gtest/gtest.h>
@@ -127,6 +128,13 @@ TEST(DateText, SurvivesDatesFarBeyondTheCalendar) {
         EXPECT_FALSE(text.empty()) << seconds;
         static_cast<void>(DateText::host().dateFromString(text));
     }
+}
+
+TEST(DateText, WritesAndReadsNothingWhereItsLibraryIsMissing) {
+    const auto english = makeDateTextICU("en_US.UTF-8", absentLibrary<host::Libicui18n>);
+
+    EXPECT_EQ(english->stringFromDate(localNoon(2024, 1, 1)), "");
+    EXPECT_FALSE(english->dateFromString("Monday, January 1, 2024"));
 }
 
 TEST(DateText, IsOneForTheProcess) {

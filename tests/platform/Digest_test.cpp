@@ -5,6 +5,9 @@
 #include <string>
 #include <vector>
 
+#include "parvel/platform/linux/DigestOpenSSL.h"
+#include "tests/support/AbsentLibrary.h"
+
 namespace parvel::testing {
 namespace {
 
@@ -43,6 +46,13 @@ TEST(Digest, SHA256TakesEveryRange) {
 
     EXPECT_EQ(hexadecimal(Digest::host().sha256(Data::joining(parts))),
               "ba7816bf8f01cfea414140de5dae2223b00361a396177a9cb410ff61f20015ad");
+}
+
+TEST(Digest, IsNoneWhereItsLibraryIsMissing) {
+    const std::unique_ptr<Digest> digest = makeDigestOpenSSL(absentLibrary<host::Libcrypto>);
+
+    EXPECT_EQ(digest->beginMD5(), nullptr);
+    EXPECT_EQ(digest->sha256(Data()), std::nullopt);
 }
 
 }  // namespace

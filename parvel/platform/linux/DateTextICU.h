@@ -4,6 +4,7 @@
 #include <string>
 
 #include "parvel/platform/DateText.h"
+#include "parvel/platform/linux/Libicui18n.h"
 
 namespace parvel {
 
@@ -11,7 +12,9 @@ namespace parvel {
 /// LC_TIME and LANG that is set and not empty, "C" where none is.
 [[nodiscard]] std::string userTimeLocaleName();
 
-/// A formatter for a locale named as in the environment, in the user's time zone.
-[[nodiscard]] std::unique_ptr<DateText> makeDateTextICU(const std::string& localeName);
+/// A formatter for a locale named as in the environment, in the user's time zone. It writes empty
+/// texts and reads none where the library is not complete.
+[[nodiscard]] std::unique_ptr<DateText> makeDateTextICU(
+    const std::string& localeName, const host::Libicui18n& (*icu)() = host::Libicui18n::host);
 
 }  // namespace parvel

@@ -1,10 +1,11 @@
 #include "parvel/platform/linux/JournalFields.h"
 
 #include <sys/uio.h>
-#include <systemd/sd-journal.h>
 #include <unistd.h>
 
 #include <cerrno>
+
+#include "parvel/platform/linux/Libsystemd.h"
 
 namespace parvel {
 namespace {
@@ -48,12 +49,15 @@ public:
         if (!m_hasJournal)
             return;
         const KeptErrno kept;
+        const host::Libsystemd& libsystemd = host::Libsystemd::host();
+        if (!libsystemd.isComplete())
+            return;
         std::array<std::string, 4> fields = journalFields(line);
         std::array<iovec, 4> list;
         for (std::size_t i = 0; i < fields.size(); ++i)
             list[i] = {fields[i].data(), fields[i].size()};
         // A line that can't be delivered is lost; logging never fails an operation.
-        (void)sd_journal_sendv(list.data(), static_cast<int>(list.size()));
+        (void)libsystemd.sd_journal_sendv(list.data(), static_cast<int>(list.size()));
     }
 
 private:

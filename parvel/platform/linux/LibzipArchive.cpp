@@ -14,32 +14,17 @@ namespace {
 constexpr std::uint64_t largestDeliveredWhole = 8ULL << 20;
 constexpr std::uint64_t pieceLength = 1ULL << 20;
 
-struct CloseEntry {
-    void operator()(zip_file_t* entry) const { zip_fclose(entry); }
-};
-using EntryHandle = std::unique_ptr<zip_file_t, CloseEntry>;
-
-/// Reads until the buffer is full. False for an entry that ends before, and for an error.
-bool readFully(zip_file_t* entry, std::uint8_t* buffer, std::uint64_t size) {
-    while (size > 0) {
-        const zip_int64_t count = zip_fread(entry, buffer, std::min(size, pieceLength));
-        if (count <= 0)
-            return false;
-        buffer += count;
-        size -= static_cast<std::uint64_t>(count);
-    }
-    return true;
-}
-
 }  // namespace
 
 std::unique_ptr<LibzipArchive> LibzipArchive::open(int file, std::uint64_t fileSize,
                                                    std::uint64_t budget,
-                                                   LibzipSource::Interruption interruption) {
-    if (fileSize < zip::endLength)  // libzip takes an empty file for an empty archive
+                                                   LibzipSource::Interruption interruption,
+                                                   const Libzip& libzip) {
+    // libzip takes an empty file for an empty archive.
+    if (fileSize < zip::endLength || !libzip.isComplete())
         return nullptr;
     std::unique_ptr<LibzipArchive> archive(
-        new LibzipArchive(file, fileSize, std::move(interruption)));
+        new LibzipArchive(libzip, file, fileSize, std::move(interruption)));
     archive->m_archive = archive->m_source.open(budget);
     if (!archive->m_archive)
         return nullptr;
@@ -68,19 +53,20 @@ std::optional<std::uint64_t> LibzipArchive::find(std::string_view name) const {
 }
 
 std::uint64_t LibzipArchive::entryCount() const {
-    return static_cast<std::uint64_t>(zip_get_num_entries(m_archive.get(), 0));
+    return static_cast<std::uint64_t>(m_libzip.zip_get_num_entries(m_archive.get(), 0));
 }
 
 const char* LibzipArchive::name(std::uint64_t index) const {
-    return zip_get_name(m_archive.get(), index, ZIP_FL_ENC_RAW);
+    return m_libzip.zip_get_name(m_archive.get(), index, ZIP_FL_ENC_RAW);
 }
 
 bool LibzipArchive::describe(std::uint64_t index, ZipEntry& entry) const {
     zip_stat_t status;
     zip_uint8_t system = 0;
     zip_uint32_t attributes = 0;
-    if (zip_stat_index(m_archive.get(), index, ZIP_FL_ENC_RAW, &status) != 0 ||
-        zip_file_get_external_attributes(m_archive.get(), index, 0, &system, &attributes) != 0)
+    if (m_libzip.zip_stat_index(m_archive.get(), index, ZIP_FL_ENC_RAW, &status) != 0 ||
+        m_libzip.zip_file_get_external_attributes(m_archive.get(), index, 0, &system,
+                                                  &attributes) != 0)
         return false;
     entry.size = status.size;
     entry.compressedSize = status.comp_size;
@@ -92,10 +78,27 @@ bool LibzipArchive::describe(std::uint64_t index, ZipEntry& entry) const {
     return true;
 }
 
+LibzipArchive::EntryHandle LibzipArchive::openEntry(std::uint64_t index, zip_flags_t flags) const {
+    return EntryHandle(m_libzip.zip_fopen_index(m_archive.get(), index, flags),
+                       CloseEntry{m_libzip});
+}
+
+/// Reads until the buffer is full. False for an entry that ends before, and for an error.
+bool LibzipArchive::readFully(zip_file_t* entry, std::uint8_t* buffer, std::uint64_t size) const {
+    while (size > 0) {
+        const zip_int64_t count = m_libzip.zip_fread(entry, buffer, std::min(size, pieceLength));
+        if (count <= 0)
+            return false;
+        buffer += count;
+        size -= static_cast<std::uint64_t>(count);
+    }
+    return true;
+}
+
 std::optional<Data> LibzipArchive::readWhole(std::uint64_t index, const ZipEntry& entry) {
     if (entry.compressedSize > m_fileSize)
         return std::nullopt;
-    const EntryHandle file(zip_fopen_index(m_archive.get(), index, ZIP_FL_COMPRESSED));
+    const EntryHandle file = openEntry(index, ZIP_FL_COMPRESSED);
     const auto size = static_cast<std::size_t>(entry.compressedSize);
     const auto stored = std::make_unique_for_overwrite<std::uint8_t[]>(size);
     if (!file || !readFully(file.get(), stored.get(), size))
@@ -107,11 +110,11 @@ std::optional<Data> LibzipArchive::readWhole(std::uint64_t index, const ZipEntry
 std::optional<Data> LibzipArchive::readInPieces(std::uint64_t index, const ZipEntry& entry) {
     if (entry.compressedSize > m_fileSize)
         return std::nullopt;
-    const EntryHandle file(zip_fopen_index(m_archive.get(), index, 0));
+    const EntryHandle file = openEntry(index, 0);
     auto content = std::make_unique_for_overwrite<std::uint8_t[]>(entry.size);
     std::uint8_t beyond;
     if (!file || !readFully(file.get(), content.get(), entry.size) ||
-        zip_fread(file.get(), &beyond, 1) != 0)
+        m_libzip.zip_fread(file.get(), &beyond, 1) != 0)
         return std::nullopt;
     return Data::adopt(std::move(content), entry.size);
 }
@@ -128,12 +131,12 @@ int LibzipArchive::deliver(std::uint64_t index, const ZipEntry& entry, const Sin
 
 /// The end is read too: libzip checks size and checksum when it meets it.
 int LibzipArchive::deliverInPieces(std::uint64_t index, const ZipEntry& entry, const Sink& sink) {
-    const EntryHandle file(zip_fopen_index(m_archive.get(), index, 0));
+    const EntryHandle file = openEntry(index, 0);
     if (!file)
         return readError();
     const auto piece = std::make_unique_for_overwrite<std::uint8_t[]>(pieceLength);
     for (std::uint64_t delivered = 0;;) {
-        const zip_int64_t count = zip_fread(file.get(), piece.get(), pieceLength);
+        const zip_int64_t count = m_libzip.zip_fread(file.get(), piece.get(), pieceLength);
         if (count < 0)
             return readError();
         if (count == 0)

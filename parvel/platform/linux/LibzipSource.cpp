@@ -23,15 +23,17 @@ constexpr int mostEndRecords = 64;
 LibzipHandle LibzipSource::open(std::uint64_t budget) {
     if (!endRecordsAreModest(budget))
         return nullptr;
-    zip_source_t* source = zip_source_function_create(&LibzipSource::command, this, nullptr);
+    zip_source_t* source =
+        m_libzip.zip_source_function_create(&LibzipSource::command, this, nullptr);
     if (!source)
         return nullptr;
     m_budget = budget;
     m_isOpening = true;
-    LibzipHandle archive(zip_open_from_source(source, ZIP_RDONLY, nullptr));
+    LibzipHandle archive(m_libzip.zip_open_from_source(source, ZIP_RDONLY, nullptr),
+                         DiscardLibzip{&m_libzip});
     m_isOpening = false;
     if (!archive)
-        zip_source_free(source);
+        m_libzip.zip_source_free(source);
     return archive;
 }
 
@@ -73,10 +75,10 @@ zip_int64_t LibzipSource::command(void* source, void* data, zip_uint64_t length,
     auto& self = *static_cast<LibzipSource*>(source);
     switch (command) {
         case ZIP_SOURCE_SUPPORTS:
-            return zip_source_make_command_bitmap(ZIP_SOURCE_SUPPORTS, ZIP_SOURCE_OPEN,
-                                                  ZIP_SOURCE_READ, ZIP_SOURCE_SEEK, ZIP_SOURCE_TELL,
-                                                  ZIP_SOURCE_STAT, ZIP_SOURCE_CLOSE,
-                                                  ZIP_SOURCE_ERROR, ZIP_SOURCE_FREE, -1);
+            return self.m_libzip.zip_source_make_command_bitmap(
+                ZIP_SOURCE_SUPPORTS, ZIP_SOURCE_OPEN, ZIP_SOURCE_READ, ZIP_SOURCE_SEEK,
+                ZIP_SOURCE_TELL, ZIP_SOURCE_STAT, ZIP_SOURCE_CLOSE, ZIP_SOURCE_ERROR,
+                ZIP_SOURCE_FREE, -1);
         case ZIP_SOURCE_OPEN:
             self.m_position = 0;
             return 0;
@@ -88,13 +90,13 @@ zip_int64_t LibzipSource::command(void* source, void* data, zip_uint64_t length,
             return static_cast<zip_int64_t>(self.m_position);
         case ZIP_SOURCE_STAT: {
             auto* status = static_cast<zip_stat_t*>(data);
-            zip_stat_init(status);
+            self.m_libzip.zip_stat_init(status);
             status->size = self.m_fileSize;
             status->valid = ZIP_STAT_SIZE;
             return sizeof *status;
         }
         case ZIP_SOURCE_ERROR:
-            return zip_error_to_data(&self.m_error, data, length);
+            return self.m_libzip.zip_error_to_data(&self.m_error, data, length);
         case ZIP_SOURCE_CLOSE:
         case ZIP_SOURCE_FREE:
             return 0;
@@ -131,7 +133,7 @@ zip_int64_t LibzipSource::read(std::uint8_t* data, std::uint64_t length) {
 
 zip_int64_t LibzipSource::seek(void* data, std::uint64_t length) {
     const zip_int64_t position =
-        zip_source_seek_compute_offset(m_position, m_fileSize, data, length, &m_error);
+        m_libzip.zip_source_seek_compute_offset(m_position, m_fileSize, data, length, &m_error);
     if (position < 0)
         return -1;
     m_position = static_cast<std::uint64_t>(position);
@@ -164,7 +166,7 @@ zip_int64_t LibzipSource::readAt(std::uint64_t position, std::uint8_t* data, std
 zip_int64_t LibzipSource::fail(int zipError, int errnoValue) {
     if (errnoValue != 0)
         m_readError = errnoValue;
-    zip_error_set(&m_error, zipError, errnoValue);
+    m_libzip.zip_error_set(&m_error, zipError, errnoValue);
     return -1;
 }
 

@@ -1,7 +1,5 @@
 #pragma once
 
-#include <zip.h>
-
 #include <array>
 #include <cstddef>
 #include <cstdint>
@@ -9,10 +7,13 @@
 #include <memory>
 #include <utility>
 
+#include "parvel/platform/linux/Libzip.h"
+
 namespace parvel::host {
 
 struct DiscardLibzip {
-    void operator()(zip_t* archive) const { zip_discard(archive); }
+    const Libzip* libzip = nullptr;
+    void operator()(zip_t* archive) const { libzip->zip_discard(archive); }
 };
 using LibzipHandle = std::unique_ptr<zip_t, DiscardLibzip>;
 
@@ -24,8 +25,11 @@ public:
     /// Asked while an archive is opened, which ends where it gives an errno value.
     using Interruption = std::function<int()>;
 
-    LibzipSource(int file, std::uint64_t fileSize, Interruption interruption = nullptr)
-        : m_file(file), m_fileSize(fileSize), m_interruption(std::move(interruption)) {}
+    LibzipSource(const Libzip& libzip, int file, std::uint64_t fileSize, Interruption interruption)
+        : m_libzip(libzip),
+          m_file(file),
+          m_fileSize(fileSize),
+          m_interruption(std::move(interruption)) {}
     LibzipSource(const LibzipSource&) = delete;
     LibzipSource& operator=(const LibzipSource&) = delete;
 
@@ -46,6 +50,7 @@ private:
                                      std::uint64_t length);
     [[nodiscard]] zip_int64_t fail(int zipError, int errnoValue);
 
+    const Libzip& m_libzip;
     int m_file;
     std::uint64_t m_fileSize;
     Interruption m_interruption;

@@ -16,6 +16,7 @@
 #include <gtest/gtest.h>
 
 #include "parvel/platform/linux/cloud/HostCloudStore.h"
+#include "tests/support/AbsentLibrary.h"
 #include "tests/support/EnvironmentValue.h"
 #include "tests/support/StandInServer.h"
 #include "tests/support/TemporaryDirectory.h"
@@ -264,6 +265,25 @@ TEST_F(DesktopRootsTest, ASilentClientIsWaitedForOnlyAWhile) {
 
 TEST_F(DesktopRootsTest, AClientThatDoesNotRunIsNotStarted) {
     EXPECT_TRUE(roots().empty());
+}
+
+TEST_F(DesktopRootsTest, WithoutLibsystemdThereAreNoRoots) {
+    announceDrive();
+
+    EXPECT_TRUE(
+        host::desktopRoots(steady_clock::now() + milliseconds(500), absentLibrary<host::Libsystemd>)
+            .empty());
+    EXPECT_EQ(m_client->calls(), 0);
+}
+
+TEST_F(DesktopRootsTest, LibsystemdIsNotLoadedWhereNoClientIsRegistered) {
+    std::filesystem::remove_all(m_folder / "share");
+    const auto unwanted = []() -> const host::Libsystemd& {
+        ADD_FAILURE() << "was asked for";
+        return host::Libsystemd::host();
+    };
+
+    EXPECT_TRUE(host::desktopRoots(steady_clock::now() + milliseconds(500), unwanted).empty());
 }
 
 TEST_F(DesktopRootsTest, WithoutABusThereAreNoRoots) {

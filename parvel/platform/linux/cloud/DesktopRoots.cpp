@@ -2,11 +2,9 @@
 
 #include <fcntl.h>
 #include <stdlib.h>
-#include <systemd/sd-bus.h>
 
 #include <algorithm>
 #include <memory>
-#include <optional>
 #include <set>
 #include <string_view>
 #include <utility>
@@ -28,12 +26,14 @@ constexpr std::size_t kLargestFile = 16'384;
 constexpr std::size_t kLongestText = 4096;
 
 struct CloseBus {
-    void operator()(sd_bus* bus) const { sd_bus_close_unref(bus); }
+    const Libsystemd* systemd = nullptr;
+    void operator()(sd_bus* bus) const { systemd->sd_bus_close_unref(bus); }
 };
 using Bus = std::unique_ptr<sd_bus, CloseBus>;
 
 struct FreeMessage {
-    void operator()(sd_bus_message* message) const { sd_bus_message_unref(message); }
+    const Libsystemd& systemd;
+    void operator()(sd_bus_message* message) const { systemd.sd_bus_message_unref(message); }
 };
 using Message = std::unique_ptr<sd_bus_message, FreeMessage>;
 
@@ -59,7 +59,7 @@ std::string_view withoutSpace(std::string_view text) {
 }
 
 /// Reads a key file whose lines are `BusName=…` and `ObjectPath=…`.
-std::optional<Provider> parsedProvider(std::string_view text) {
+Provider parsedProvider(std::string_view text) {
     Provider provider;
     while (!text.empty()) {
         const std::size_t end = std::min(text.find('\n'), text.size());
@@ -75,9 +75,7 @@ std::optional<Provider> parsedProvider(std::string_view text) {
         else if (key == "ObjectPath")
             provider.second = value;
     }
-    const bool isUsable = sd_bus_service_name_is_valid(provider.first.c_str()) > 0 &&
-                          sd_bus_object_path_is_valid(provider.second.c_str()) > 0;
-    return isUsable ? std::optional(std::move(provider)) : std::nullopt;
+    return provider;
 }
 
 void addProvidersIn(const std::string& folder, std::set<Provider>& providers) {
@@ -90,8 +88,7 @@ void addProvidersIn(const std::string& folder, std::set<Provider>& providers) {
             continue;
         if (++files > kMostFiles)
             return;
-        if (auto provider = parsedProvider(readSmallFile(entries.descriptor(), entry->d_name)))
-            providers.insert(std::move(*provider));
+        providers.insert(parsedProvider(readSmallFile(entries.descriptor(), entry->d_name)));
     }
 }
 
@@ -108,6 +105,11 @@ std::set<Provider> registeredProviders() {
     return providers;
 }
 
+bool isUsable(const Libsystemd& systemd, const Provider& provider) {
+    return systemd.sd_bus_service_name_is_valid(provider.first.c_str()) > 0 &&
+           systemd.sd_bus_object_path_is_valid(provider.second.c_str()) > 0;
+}
+
 std::string busAddress() {
     if (const char* address = ::secure_getenv("DBUS_SESSION_BUS_ADDRESS"))
         return address;
@@ -122,32 +124,32 @@ std::uint64_t microsecondsUntil(Deadline deadline) {
 }
 
 /// Connects in steps of its own: the library's own wait for a bus that says nothing is far longer.
-Bus connectedBus(Deadline deadline) {
+Bus connectedBus(const Libsystemd& systemd, Deadline deadline) {
     sd_bus* made = nullptr;
-    if (sd_bus_new(&made) < 0)
+    if (systemd.sd_bus_new(&made) < 0)
         return nullptr;
-    Bus bus(made);
+    Bus bus(made, CloseBus{&systemd});
     const std::string address = busAddress();
-    if (address.empty() || sd_bus_set_address(made, address.c_str()) < 0 ||
-        sd_bus_set_bus_client(made, 1) < 0 || sd_bus_start(made) < 0)
+    if (address.empty() || systemd.sd_bus_set_address(made, address.c_str()) < 0 ||
+        systemd.sd_bus_set_bus_client(made, 1) < 0 || systemd.sd_bus_start(made) < 0)
         return nullptr;
-    while (sd_bus_is_ready(made) == 0) {
-        const int processed = sd_bus_process(made, nullptr);
+    while (systemd.sd_bus_is_ready(made) == 0) {
+        const int processed = systemd.sd_bus_process(made, nullptr);
         const std::uint64_t left = microsecondsUntil(deadline);
-        if (processed < 0 || left == 0 || (processed == 0 && sd_bus_wait(made, left) < 0))
+        if (processed < 0 || left == 0 || (processed == 0 && systemd.sd_bus_wait(made, left) < 0))
             return nullptr;
     }
-    return sd_bus_is_ready(made) > 0 ? std::move(bus) : nullptr;
+    return systemd.sd_bus_is_ready(made) > 0 ? std::move(bus) : nullptr;
 }
 
 /// Reads a property whose value is a text; another is passed over. Negative on a broken message.
-int readTextProperty(sd_bus_message* message, std::string& out) {
+int readTextProperty(const Libsystemd& systemd, sd_bus_message* message, std::string& out) {
     const char* contents = nullptr;
-    const int peeked = sd_bus_message_peek_type(message, nullptr, &contents);
+    const int peeked = systemd.sd_bus_message_peek_type(message, nullptr, &contents);
     if (peeked < 0 || !contents || std::string_view(contents) != "s")
-        return sd_bus_message_skip(message, "v");
+        return systemd.sd_bus_message_skip(message, "v");
     const char* text = nullptr;
-    const int read = sd_bus_message_read(message, "v", "s", &text);
+    const int read = systemd.sd_bus_message_read(message, "v", "s", &text);
     if (read >= 0 && text && std::string_view(text).size() <= kLongestText)
         out = text;
     return read;
@@ -162,84 +164,95 @@ bool isPossibleRoot(DesktopRoot& root) {
 }
 
 /// Reads the properties of one interface, `a{sv}`, and adds the folder that an account names.
-int readProperties(sd_bus_message* message, bool isAccount, std::vector<DesktopRoot>& roots) {
-    int result = sd_bus_message_enter_container(message, 'a', "{sv}");
+int readProperties(const Libsystemd& systemd, sd_bus_message* message, bool isAccount,
+                   std::vector<DesktopRoot>& roots) {
+    int result = systemd.sd_bus_message_enter_container(message, 'a', "{sv}");
     DesktopRoot root{};
-    while (result >= 0 && (result = sd_bus_message_enter_container(message, 'e', "sv")) > 0) {
+    while (result >= 0 &&
+           (result = systemd.sd_bus_message_enter_container(message, 'e', "sv")) > 0) {
         const char* name = nullptr;
         std::string other;
-        result = sd_bus_message_read_basic(message, 's', &name);
+        result = systemd.sd_bus_message_read_basic(message, 's', &name);
         if (result < 0)
             return result;
         const std::string_view property = name;
-        result = readTextProperty(message, property == "Path"   ? root.path
-                                           : property == "Name" ? root.client
-                                                                : other);
+        result = readTextProperty(systemd, message,
+                                  property == "Path"   ? root.path
+                                  : property == "Name" ? root.client
+                                                       : other);
         if (result >= 0)
-            result = sd_bus_message_exit_container(message);
+            result = systemd.sd_bus_message_exit_container(message);
     }
     if (result < 0)
         return result;
     if (isAccount && roots.size() < kMostRoots && isPossibleRoot(root))
         roots.push_back(std::move(root));
-    return sd_bus_message_exit_container(message);
+    return systemd.sd_bus_message_exit_container(message);
 }
 
 /// Reads `a{oa{sa{sv}}}`: objects, their interfaces, the properties of these.
-int readObjects(sd_bus_message* message, std::vector<DesktopRoot>& roots) {
-    int result = sd_bus_message_enter_container(message, 'a', "{oa{sa{sv}}}");
+int readObjects(const Libsystemd& systemd, sd_bus_message* message,
+                std::vector<DesktopRoot>& roots) {
+    int result = systemd.sd_bus_message_enter_container(message, 'a', "{oa{sa{sv}}}");
     while (result >= 0 &&
-           (result = sd_bus_message_enter_container(message, 'e', "oa{sa{sv}}")) > 0) {
-        if ((result = sd_bus_message_skip(message, "o")) >= 0)
-            result = sd_bus_message_enter_container(message, 'a', "{sa{sv}}");
+           (result = systemd.sd_bus_message_enter_container(message, 'e', "oa{sa{sv}}")) > 0) {
+        if ((result = systemd.sd_bus_message_skip(message, "o")) >= 0)
+            result = systemd.sd_bus_message_enter_container(message, 'a', "{sa{sv}}");
         while (result >= 0 &&
-               (result = sd_bus_message_enter_container(message, 'e', "sa{sv}")) > 0) {
+               (result = systemd.sd_bus_message_enter_container(message, 'e', "sa{sv}")) > 0) {
             const char* interface = nullptr;
-            if ((result = sd_bus_message_read_basic(message, 's', &interface)) >= 0)
-                result = readProperties(message, std::string_view(interface) == kAccountInterface,
-                                        roots);
+            if ((result = systemd.sd_bus_message_read_basic(message, 's', &interface)) >= 0)
+                result = readProperties(systemd, message,
+                                        std::string_view(interface) == kAccountInterface, roots);
             if (result >= 0)
-                result = sd_bus_message_exit_container(message);
+                result = systemd.sd_bus_message_exit_container(message);
         }
         if (result >= 0)
-            result = sd_bus_message_exit_container(message);
+            result = systemd.sd_bus_message_exit_container(message);
         if (result >= 0)
-            result = sd_bus_message_exit_container(message);
+            result = systemd.sd_bus_message_exit_container(message);
     }
     return result;
 }
 
-void askProvider(sd_bus* bus, const Provider& provider, Deadline deadline,
-                 std::vector<DesktopRoot>& roots) {
+void askProvider(const Libsystemd& systemd, sd_bus* bus, const Provider& provider,
+                 Deadline deadline, std::vector<DesktopRoot>& roots) {
     sd_bus_message* made = nullptr;
-    if (sd_bus_message_new_method_call(bus, &made, provider.first.c_str(), provider.second.c_str(),
-                                       "org.freedesktop.DBus.ObjectManager",
-                                       "GetManagedObjects") < 0)
+    if (systemd.sd_bus_message_new_method_call(
+            bus, &made, provider.first.c_str(), provider.second.c_str(),
+            "org.freedesktop.DBus.ObjectManager", "GetManagedObjects") < 0)
         return;
-    const Message call(made);
+    const Message call(made, FreeMessage{systemd});
     sd_bus_message* answered = nullptr;
     const std::uint64_t left = microsecondsUntil(deadline);
-    if (left == 0 || sd_bus_message_set_auto_start(made, 0) < 0 ||
-        sd_bus_call(bus, made, left, nullptr, &answered) < 0)
+    if (left == 0 || systemd.sd_bus_message_set_auto_start(made, 0) < 0 ||
+        systemd.sd_bus_call(bus, made, left, nullptr, &answered) < 0)
         return;
-    const Message answer(answered);
+    const Message answer(answered, FreeMessage{systemd});
     std::vector<DesktopRoot> told;
     // An answer that is wrong anywhere is believed nowhere.
-    if (readObjects(answered, told) >= 0)
+    if (readObjects(systemd, answered, told) >= 0)
         roots.insert(roots.end(), std::make_move_iterator(told.begin()),
                      std::make_move_iterator(told.end()));
 }
 
 }  // namespace
 
-std::vector<DesktopRoot> desktopRoots(Deadline deadline) {
+std::vector<DesktopRoot> desktopRoots(Deadline deadline, const Libsystemd& (*libsystemd)()) {
     std::vector<DesktopRoot> roots;
-    const std::set<Provider> providers = registeredProviders();
+    std::set<Provider> providers = registeredProviders();
     if (providers.empty())
         return roots;
-    if (const Bus bus = connectedBus(deadline))
+    const Libsystemd& systemd = libsystemd();
+    if (!systemd.isComplete())
+        return roots;
+    std::erase_if(providers,
+                  [&](const Provider& provider) { return !isUsable(systemd, provider); });
+    if (providers.empty())
+        return roots;
+    if (const Bus bus = connectedBus(systemd, deadline))
         for (const Provider& provider : providers)
-            askProvider(bus.get(), provider, deadline, roots);
+            askProvider(systemd, bus.get(), provider, deadline, roots);
     return roots;
 }
 

@@ -3,9 +3,11 @@
 #include <cerrno>
 #include <cstring>
 
+#include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "cli/Command.h"
 #include "cli/Messages.h"
 
 namespace parvel::cli {
@@ -48,6 +50,15 @@ bool Output::finish(std::string_view command) {
         writeToStandardError(
             problemLine(command, std::string("standard output: ") + strerrordesc_np(m_errno)));
     return !failed();
+}
+
+void holdStandardStreams() {
+    // A file gets the lowest number that is free, which is the stream's own.
+    for (const int stream : {STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO}) {
+        const int wrongWay = stream == STDIN_FILENO ? O_WRONLY : O_RDONLY;
+        if (fcntl(stream, F_GETFD) < 0 && open("/dev/null", wrongWay) < 0)
+            _exit(kFailure);
+    }
 }
 
 int writeAll(int descriptor, std::string_view text) {

@@ -29,6 +29,11 @@ private:
     std::string m_buffer;
 };
 
+/// Takes the numbers of those standard streams that are closed, so that no file which is opened
+/// later is written to, or read, as one of them. Using such a stream goes on failing. Called first
+/// of all.
+void holdStandardStreams();
+
 /// Writes the whole text; the errno of the write that failed, else 0.
 [[nodiscard]] int writeAll(int descriptor, std::string_view text);
 

@@ -128,5 +128,6 @@ int run(const std::vector<std::string>& arguments) {
 }  // namespace parvel::cli
 
 int main(int argc, char** argv) {
+    parvel::cli::holdStandardStreams();
     return parvel::cli::run({argv + std::min(argc, 1), argv + argc});
 }

@@ -1,3 +1,5 @@
+#include <cerrno>
+
 #include <gtest/gtest.h>
 
 #include "parvel/filemanager/PVAssetMetadataFileManager.h"
@@ -35,8 +37,9 @@ protected:
     [[nodiscard]] std::map<std::string, std::string> disk() const {
         std::map<std::string, std::string> state;
         for (const auto& entry : fs::recursive_directory_iterator(m_folder.path())) {
-            const std::string name = fs::relative(entry.path(), m_folder.path()).string();
-            state[name] = entry.is_regular_file() ? m_folder.read(name) : "a folder";
+            const std::string name = entry.path().lexically_relative(m_folder.path()).string();
+            const bool isFile = fs::is_regular_file(entry.symlink_status());
+            state[name] = isFile ? m_folder.read(name) : "no file";
         }
         return state;
     }
@@ -178,6 +181,19 @@ TEST_F(RehearsedChanges, AnInstallOverATakenNameIsForeseen) {
     EXPECT_FALSE(real.record);
     EXPECT_EQ(real.error,
               makeFileError(PVFileErrorCode::FileExists, m_folder.url("library/new.epub")));
+}
+
+TEST_F(RehearsedChanges, WhatCanNotBeLookedUpFailsAsItWould) {
+    fs::create_symlink("circle", m_folder / "circle");
+    const URL url = m_folder.url("circle/a.pdf");
+
+    const RehearsedOutcome real =
+        expectForeseen([&url](PVAssetMetadataFileManager&, const URL&, ErrorOut error) {
+            return PVAssetMetadataInspector::metadataForAssetAtURL_error(url, error);
+        });
+
+    ASSERT_TRUE(real.error);
+    EXPECT_EQ(real.error->code(), ELOOP);
 }
 
 TEST_F(RehearsedChanges, AStagingDirectoryOnlyTakesItsName) {

@@ -139,6 +139,34 @@ TEST_F(RehearsedFolder, AMoveIntoAFolderThatIsMissingFails) {
                    move("absent.pdf", "b.pdf"), move("a.pdf", std::string(300, 'x'))});
 }
 
+TEST_F(RehearsedFolder, TheEmptyPathNamesNothing) {
+    m_folder.write("a.pdf", "1");
+    const URL none = URL::fileURLWithPath("");
+
+    expectTheSame({
+        [](FileSystemService& service, Said&) { return service.itemExistsAtPath(""); },
+        [none](FileSystemService& service, Said& said) {
+            return service.removeItem(none, &said.error);
+        },
+        [none](FileSystemService& service, Said& said) {
+            return service.trashItem(none, &said.resulting, &said.error);
+        },
+        [none, this](FileSystemService& service, Said& said) {
+            return service.moveItem(none, at("b.pdf"), &said.error);
+        },
+        [none, this](FileSystemService& service, Said& said) {
+            return service.moveItem(at("a.pdf"), none, &said.error);
+        },
+        [none, this](FileSystemService& service, Said& said) {
+            return service.copyItem(at("a.pdf"), none, &said.error);
+        },
+        [none, this](FileSystemService& service, Said& said) {
+            return service.replaceItem(none, at("a.pdf"), ReplaceOptions::Default, &said.resulting,
+                                       &said.error);
+        },
+    });
+}
+
 TEST_F(RehearsedFolder, AMoveOfAFolderIntoItselfFails) {
     m_folder.write("a.epub/mimetype", "1");
 

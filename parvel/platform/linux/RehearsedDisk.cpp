@@ -13,8 +13,11 @@ namespace parvel::host {
 
 namespace {
 
-/// The path with its folder's links resolved, as far as the folder is there.
+/// The path with its folder's links resolved, as far as the folder is there. The empty path names
+/// nothing, and stays as it is.
 std::string keyOf(const std::string& path) {
+    if (path.empty())
+        return path;
     const std::string folder = parentFolderOf(path);
     if (const auto canonical = canonicalPath(folder))
         return pathAppending(*canonical, lastComponentOfPath(path));
@@ -292,11 +295,8 @@ int RehearsedDisk::makingError(const std::string& path) const {
 
 std::optional<std::string> RehearsedDisk::realPath(const std::string& path) const {
     const std::lock_guard lock(m_mutex);
-    const std::string key = keyOf(path);
-    const Entry entry = entryAt(key);
-    if (entry.kind != Kind::Real || lookUp(key) != 0)
-        return std::nullopt;
-    return entry.real;
+    const Entry entry = entryAt(keyOf(path));
+    return entry.kind == Kind::Real ? std::optional(entry.real) : std::nullopt;
 }
 
 /// Attributes are those of the item behind a link.

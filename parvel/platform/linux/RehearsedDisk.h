@@ -41,7 +41,8 @@ public:
     /// Whether an item could be made where nothing stands.
     [[nodiscard]] int makingError(const std::string& path) const;
 
-    /// Where on the real disk that lies which would stand at the path; none where nothing would.
+    /// Where on the real disk that is looked for which would stand at the path; none where it would
+    /// be gone, or made new.
     [[nodiscard]] std::optional<std::string> realPath(const std::string& path) const;
     /// Of the item that the path leads to.
     [[nodiscard]] Attributes attributesAt(const std::string& path) const;

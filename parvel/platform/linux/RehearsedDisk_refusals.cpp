@@ -81,6 +81,8 @@ int RehearsedDisk::folderError(const std::string& folder) const {
 
 /// Whether the name could be made.
 int RehearsedDisk::changeError(const std::string& key) const {
+    if (key.empty())
+        return ENOENT;
     const Entry folder = entryAt(parentFolderOf(key));
     return folder.kind == Kind::Real ? accessError(folder.real, W_OK | X_OK) : 0;
 }

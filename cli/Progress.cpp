@@ -23,8 +23,10 @@ constexpr auto kShortWork = 500ms;
 /// Before that a speed is a guess.
 constexpr auto kMeasurable = 1s;
 constexpr auto kStep = 100ms;
-constexpr int kBarWidth = 30;
-constexpr int kMovingWidth = 6;
+constexpr std::size_t kBarWidth = 30;
+constexpr std::size_t kNarrowestBar = 5;
+constexpr double kMovingShare = 0.2;
+constexpr double kWayInSeconds = 2.4;
 constexpr double kLongestLeft = 100 * 3600;
 constexpr std::string_view kClearLine = "\r\x1b[K";
 
@@ -75,18 +77,23 @@ std::string speedText(double bytesPerSecond) {
     return std::to_string(tenths / 10) + "." + std::to_string(tenths % 10) + " MB/s";
 }
 
-/// A bar that is full from one place to another.
-std::string barText(int from, int to) {
-    std::string bar(kBarWidth, ' ');
-    for (int at = from; at < to; ++at)
-        bar[static_cast<std::size_t>(at)] = '#';
-    return "[" + bar + "]";
+/// A bar for a line of which so much is free, with its brackets and the space behind it; empty
+/// where that is too little.
+std::string barText(double from, double filled, std::size_t free) {
+    constexpr std::size_t around = 3;
+    if (free < around + kNarrowestBar)
+        return {};
+    const std::size_t width = std::min(kBarWidth, free - around);
+    const auto begin = static_cast<std::size_t>(from * static_cast<double>(width));
+    const auto full = static_cast<std::size_t>(filled * static_cast<double>(width));
+    return "[" + std::string(begin, ' ') + std::string(full, '#') +
+           std::string(width - begin - full, ' ') + "] ";
 }
 
 }  // namespace
 
 Progress::Progress(Form form, std::string_view path) : m_form(form), m_path(path) {
-    if (form == Form::Auto && isatty(STDERR_FILENO) == 0)
+    if (form == Form::Auto && !isCapableTerminal(STDERR_FILENO))
         m_form = Form::Never;
 }
 
@@ -113,8 +120,7 @@ void Progress::report(double share) {
     if (m_percentage == percentage)
         return;
     m_percentage = percentage;
-    draw(barText(0, percentage * kBarWidth / 100),
-         std::to_string(percentage) + " %" + speedAndTimeLeft(known));
+    draw(0, percentage / 100.0, std::to_string(percentage) + " %" + speedAndTimeLeft(known));
 }
 
 void Progress::report(double share, std::string_view path) {
@@ -127,10 +133,9 @@ void Progress::reportTime() {
     if (m_form == Form::Json || m_form == Form::Never || isTooEarly())
         return;
     const double seconds = elapsed().count();
-    const int way = kBarWidth - kMovingWidth;
-    const int step = static_cast<int>(std::fmod(seconds * 10, 2 * way));
-    const int from = step < way ? step : 2 * way - step;
-    draw(barText(from, from + kMovingWidth), clockText(seconds));
+    const double way = std::fmod(seconds / kWayInSeconds, 2);
+    const double from = (way < 1 ? way : 2 - way) * (1 - kMovingShare);
+    draw(from, kMovingShare, clockText(seconds));
 }
 
 void Progress::printLine(double share) const {
@@ -152,14 +157,14 @@ std::string Progress::speedAndTimeLeft(double share) {
                         : " " + speedText(static_cast<double>(*m_size) * share / seconds) + left;
 }
 
-void Progress::draw(std::string_view bar, std::string_view words) {
+void Progress::draw(double from, double filled, std::string_view words) {
     m_hasDrawn = true;
-    const std::string left = std::string(bar) + " " + std::string(words) + " ";
-    const std::size_t width = std::max(terminalWidth(STDERR_FILENO), left.size() + 1);
-    const std::string name = safeText(lastComponentOfPath(m_path));
     // A line that is full would go on in the next one, and stay there.
-    writeToStandardError(std::string(kClearLine) + left +
-                         std::string(cutText(name, width - left.size() - 1)));
+    const std::size_t width = terminalWidth(STDERR_FILENO) - 1;
+    std::string line(cutText(words, width));
+    line.insert(0, barText(from, filled, width - line.size()));
+    line += " " + safeText(lastComponentOfPath(m_path));
+    writeToStandardError(std::string(kClearLine) + std::string(cutText(line, width)));
 }
 
 BusyProgress::BusyProgress(Progress::Form form, std::string_view path) : m_progress(form, path) {

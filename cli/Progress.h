@@ -40,7 +40,8 @@ private:
     [[nodiscard]] std::string speedAndTimeLeft(double share);
     [[nodiscard]] bool isTooEarly() const;
     void printLine(double share) const;
-    void draw(std::string_view bar, std::string_view words);
+    /// A bar of which the `filled` share is full behind the `from` share, if there is room for one.
+    void draw(double from, double filled, std::string_view words);
 
     Form m_form;
     std::string m_path;

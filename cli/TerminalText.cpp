@@ -167,12 +167,16 @@ void appendField(std::string_view label, std::string_view text, std::size_t labe
     }
 }
 
+bool isCapableTerminal(int descriptor) {
+    const char* kind = std::getenv("TERM");
+    return isatty(descriptor) == 1 && !(kind && std::string_view(kind) == "dumb");
+}
+
 Terminal Terminal::ofStandardOutput() {
     Terminal terminal;
-    const bool isTerminal = isatty(STDOUT_FILENO) == 1;
     terminal.width = std::clamp<std::size_t>(terminalWidth(STDOUT_FILENO), 40, 120);
     const char* noColor = std::getenv("NO_COLOR");
-    terminal.hasStyles = isTerminal && !(noColor && *noColor);
+    terminal.hasStyles = isCapableTerminal(STDOUT_FILENO) && !(noColor && *noColor);
     return terminal;
 }
 

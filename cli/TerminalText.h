@@ -30,10 +30,13 @@ std::vector<std::string> wrapped(std::string_view text, std::size_t width);
 void appendField(std::string_view label, std::string_view text, std::size_t labelWidth,
                  std::size_t width, std::string& out);
 
+/// Whether the descriptor is a terminal that knows more than lines of text (TERM is not "dumb").
+bool isCapableTerminal(int descriptor);
+
 /// What is known of the place that standard output goes to.
 struct Terminal {
     std::size_t width = 80;
-    bool hasStyles = false;  ///< a terminal, and NO_COLOR is not set
+    bool hasStyles = false;  ///< a capable terminal, and NO_COLOR is not set
 
     static Terminal ofStandardOutput();
 };

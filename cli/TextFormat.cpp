@@ -176,7 +176,7 @@ std::string flagsText(const Dictionary& record) {
 
 std::string fileText(const Result& result) {
     std::error_code unknown;
-    const std::uintmax_t size = std::filesystem::file_size(result.path, unknown);
+    const std::uintmax_t size = std::filesystem::file_size(urlOfPath(result.path).path(), unknown);
     return unknown ? result.path : result.path + " (" + asSize(size) + ")";
 }
 

@@ -1,27 +1,21 @@
 #include "cli/CommandLine.h"
 
 #include <algorithm>
+#include <filesystem>
+#include <system_error>
 
 #include <CLI/CLI.hpp>
+
+#include "cli/Suggestion.h"
 
 namespace parvel::cli {
 namespace {
 
 constexpr std::string_view kHelpNames = "-h,--help";
 
-/// The operands among what the parser did not know; anything else there is no option of ours.
-std::vector<std::string> operandsOf(std::vector<std::string> remaining) {
-    std::vector<std::string> operands;
-    bool onlyOperands = false;
-    for (std::string& argument : remaining) {
-        if (!onlyOperands && argument == "--")
-            onlyOperands = true;
-        else if (!onlyOperands && argument.size() > 1 && argument.front() == '-')
-            throw UsageError("unknown option " + argument);
-        else
-            operands.push_back(std::move(argument));
-    }
-    return operands;
+bool standsOnDisk(const std::string& path) {
+    std::error_code unknown;
+    return std::filesystem::exists(std::filesystem::symlink_status(path, unknown));
 }
 
 std::string_view longNameOf(std::string_view names) {
@@ -107,6 +101,34 @@ std::vector<std::string> CommandLine::withEmptyValuesApart(
     }
     out.insert(out.end(), end, arguments.end());
     return out;
+}
+
+void CommandLine::throwUnknown(const std::string& argument) const {
+    if (standsOnDisk(argument))
+        throw UsageError("unknown option " + argument + "; for the file of that name, type ./" +
+                         argument);
+    std::vector<std::string_view> names;
+    for (const Group& group : m_groups) {
+        for (const Option& option : group.options)
+            names.push_back(longNameOf(option.names));
+    }
+    throw UsageError("unknown option " + argument +
+                     suggestionFor(argument.substr(0, argument.find('=')), names));
+}
+
+/// The operands among what the parser did not know; anything else there is no option of ours.
+std::vector<std::string> CommandLine::operandsOf(std::vector<std::string> remaining) const {
+    std::vector<std::string> operands;
+    bool onlyOperands = false;
+    for (std::string& argument : remaining) {
+        if (!onlyOperands && argument == "--")
+            onlyOperands = true;
+        else if (!onlyOperands && argument.size() > 1 && argument.front() == '-')
+            throwUnknown(argument);
+        else
+            operands.push_back(std::move(argument));
+    }
+    return operands;
 }
 
 std::vector<std::string> CommandLine::parse(std::span<const std::string> arguments) {

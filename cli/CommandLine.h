@@ -63,6 +63,8 @@ private:
     [[nodiscard]] const Option* optionOf(std::string_view longName) const;
     [[nodiscard]] std::vector<std::string> withEmptyValuesApart(
         std::span<const std::string> arguments) const;
+    [[noreturn]] void throwUnknown(const std::string& argument) const;
+    [[nodiscard]] std::vector<std::string> operandsOf(std::vector<std::string> remaining) const;
 
     std::string m_command;
     std::string m_operands;

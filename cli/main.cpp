@@ -10,6 +10,7 @@
 #include "cli/Messages.h"
 #include "cli/Output.h"
 #include "cli/OutputOptions.h"
+#include "cli/Suggestion.h"
 #include "parvel/platform/ReaderProgram.h"
 
 namespace parvel::cli {
@@ -77,7 +78,10 @@ const CommandEntry& commandOfName(const std::string& name) {
         if (command.name == name)
             return command;
     }
-    throw UsageError("unknown command \"" + name + "\"");
+    std::vector<std::string_view> names;
+    for (const CommandEntry& command : commands())
+        names.push_back(command.name);
+    throw UsageError("unknown command \"" + name + "\"" + suggestionFor(name, names));
 }
 
 int runCommand(const CommandEntry& entry, std::span<const std::string> arguments) {
@@ -113,6 +117,8 @@ int run(const std::vector<std::string>& arguments) {
             return printText(line.help());
         if (options.version)
             return printVersion(options.json || std::count(all.begin(), all.end(), "--json") > 0);
+        if (options.json)
+            throw UsageError("--json goes with --version, or behind the command");
         printLogLines(logLevelOfName(options.log.value_or("off")));
         if (index == arguments.size())
             throw UsageError("no command is given");

@@ -132,6 +132,16 @@ std::string_view adviceOnUpdate(const URL& url) {
     return "the attributes that it keeps are another asset's";
 }
 
+/// Why an asset has no identity to be written.
+std::string adviceOnIdentity(const URL& url) {
+    if (standsAt(url))
+        return "nothing in it or on it says which asset it is; --record can say it";
+    std::optional<Error> error;
+    static_cast<void>(keptIdentity(url, error));
+    const bool isForbidden = error && error->code() == EACCES;
+    return isForbidden ? "its folder may not be looked into" : "it is not there";
+}
+
 Result AttributesCommand::read(const std::string& path) const {
     Result result = resultForPath(path);
     result.recordKey = "attributes";
@@ -154,9 +164,7 @@ Result AttributesCommand::write(const std::string& path) const {
     result.fields.push_back({"written", Number::boolean(written)});
     setRecord(result, asset, PVAssetMetadataFlavorFull);
     if (result.error == makeNoIdentityError())
-        result.advice = standsAt(urlOfPath(path))
-                            ? "nothing in it or on it says which asset it is; --record can say it"
-                            : "it is not there";
+        result.advice = adviceOnIdentity(urlOfPath(path));
     result.outcome = written ? "has its attributes" : "nothing to write";
     return result;
 }

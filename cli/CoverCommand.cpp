@@ -124,7 +124,7 @@ int CoverCommand::run(std::vector<std::string> operands) {
     if (hasFile() && isSameFile(*m_file, operands[0]))
         throw UsageError("-o " + *m_file + ": that is the asset itself");
     if (hasFile() &&
-        PVAssetMetadata::assetTypeForAssetAtURL(urlOfPath(*m_file)) != PVAssetTypeUnknown)
+        PVAssetMetadata::assetTypeForAssetAtURL(urlOfOption("-o", *m_file)) != PVAssetTypeUnknown)
         throw UsageError("-o " + *m_file + ": that is the name of an asset");
 
     Result result = resultForPath(operands[0]);

@@ -10,6 +10,7 @@
 #include <map>
 #include <tuple>
 
+#include "parvel/inspection/BestCover.h"
 #include "parvel/inspection/PVAssetMetadataInspector.h"
 #include "tests/support/TemporaryDirectory.h"
 
@@ -98,10 +99,16 @@ protected:
         m_manifest = json::parse(file);
     }
 
+    [[nodiscard]] static std::string nameAndReason(const json& asset) {
+        return asset.at("name").get<std::string>() + ": " + asset.at("why").get<std::string>();
+    }
+    [[nodiscard]] URL placeOf(const json& asset) const {
+        return URL::fileURLWithPath(m_assets + "/" + asset.at("path").get<std::string>());
+    }
+
     void inspect(const json& asset) {
-        SCOPED_TRACE(asset.at("name").get<std::string>() + ": " +
-                     asset.at("why").get<std::string>());
-        const URL url = URL::fileURLWithPath(m_assets + "/" + asset.at("path").get<std::string>());
+        SCOPED_TRACE(nameAndReason(asset));
+        const URL url = placeOf(asset);
         const long memory = peakMemoryInKilobytes();
         const auto start = std::chrono::steady_clock::now();
         std::optional<Error> error;
@@ -122,6 +129,17 @@ protected:
         }
     }
 
+    void seekCover(const json& asset) {
+        SCOPED_TRACE(nameAndReason(asset));
+        const auto start = std::chrono::steady_clock::now();
+        const std::optional<BestCover> cover = bestCoverForAssetAtURL(placeOf(asset));
+        EXPECT_LT(std::chrono::steady_clock::now() - start, kLongestTime);
+        if (cover) {
+            EXPECT_THAT(contentOf(cover->bytes),
+                        Not(HasSubstr(m_manifest.at("secret").get<std::string>())));
+        }
+    }
+
     TemporaryDirectory m_directory;
     std::string m_assets = m_directory / "assets";
     json m_manifest;
@@ -132,6 +150,15 @@ TEST_P(HostileTest, EveryAssetEndsInARecordOrAnErrorAndTouchesNothing) {
 
     for (const json& asset : m_manifest.at("assets"))
         inspect(asset);
+
+    EXPECT_EQ(stateBelow(m_directory.path()), before);
+}
+
+TEST_P(HostileTest, TheBestCoverOfEveryAssetIsItsOwnAndTouchesNothing) {
+    const DiskState before = stateBelow(m_directory.path());
+
+    for (const json& asset : m_manifest.at("assets"))
+        seekCover(asset);
 
     EXPECT_EQ(stateBelow(m_directory.path()), before);
 }

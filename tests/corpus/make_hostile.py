@@ -192,6 +192,8 @@ def zips():
         archive = book(drop=('in/front.gif',))
         archive.add('in/front.gif', (CANARY + '/secret.txt').encode(), mode=mode)
         put('zip-cover-' + n, archive.bytes(), 'either', 'the cover is a ' + n)
+    empty = book(drop=('in/front.gif',), extra=[('in/front.gif', b'')])
+    put('zip-cover-empty', empty.bytes(), 'record', 'the cover is an empty file')
     unicode_name = b'\1' + struct.pack('<I', zlib.crc32(b'in/fake.opf')) + b'in/book.opf'
     put('zip-unicode-path', book(drop=('in/book.opf',)).add(
         'in/fake.opf', opf(), extra=struct.pack('<HH', 0x7075, len(unicode_name)) + unicode_name).bytes(),

@@ -2,14 +2,14 @@
 
 #include <optional>
 
-#include "reader/InputMapping.h"
+#include "reader/Input.h"
 #include "reader/MemoryFile.h"
 #include "reader/images/ImageDecoder.h"
 
 namespace parvel::reader {
 
 Answer decodedImage(const Received& received) {
-    const InputMapping input(received);
+    const Input input(received);
     Answer answer;
     Reply& reply = answer.reply;
     std::optional<MemoryFile> pixels;

@@ -13,7 +13,7 @@
 #include <optional>
 #include <utility>
 
-#include "reader/InputMapping.h"
+#include "reader/Input.h"
 #include "reader/MemoryFile.h"
 #include "reader/PdfDate.h"
 #include "reader/PdfText.h"
@@ -155,8 +155,8 @@ Document::~Document() = default;
 
 Answer Document::open(const Received& received) {
     close();
-    m_bytes = std::make_unique<InputMapping>(received);
-    const std::span<const std::uint8_t> bytes = m_bytes->bytes();
+    m_input = std::make_unique<Input>(received);
+    const std::span<const std::uint8_t> bytes = m_input->bytes();
     if (!bytes.empty() && bytes.size() <= kLargestDocument)
         m_document.reset(poppler::document::load_from_raw_data(
             reinterpret_cast<const char*>(bytes.data()), static_cast<int>(bytes.size())));
@@ -168,11 +168,11 @@ Answer Document::open(const Received& received) {
 
 void Document::close() {
     m_document.reset();
-    m_bytes.reset();
+    m_input.reset();
 }
 
-std::uint64_t Document::inputSize() const {
-    return m_bytes ? m_bytes->bytes().size() : 0;
+std::uint64_t Document::mappedSize() const {
+    return m_input ? Input::mappedSize(m_input->bytes().size()) : 0;
 }
 
 Answer Document::describePage() const {

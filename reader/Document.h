@@ -11,7 +11,7 @@ class page;
 
 namespace parvel::reader {
 
-class InputMapping;
+class Input;
 
 /// The PDF document that is open, if any, and what is asked of it. A locked one is asked for
 /// nothing but that: it would bring the PDF library down.
@@ -27,8 +27,8 @@ public:
     /// Refused for what is no document.
     [[nodiscard]] Answer open(const Received& received);
     void close();
-    /// How many bytes the open document takes in the address space; 0 for none.
-    [[nodiscard]] std::uint64_t inputSize() const;
+    /// How many bytes of the address space the open document is mapped into.
+    [[nodiscard]] std::uint64_t mappedSize() const;
     [[nodiscard]] Answer describePage() const;
     /// Refused when there is no page to draw.
     [[nodiscard]] Answer drawPage(const Request& request) const;
@@ -37,7 +37,7 @@ private:
     [[nodiscard]] std::unique_ptr<poppler::page> firstPage() const;
 
     std::unique_ptr<poppler::document> m_held;  ///< keeps the PDF library's state
-    std::unique_ptr<InputMapping> m_bytes;
+    std::unique_ptr<Input> m_input;
     std::unique_ptr<poppler::document> m_document;
 };
 

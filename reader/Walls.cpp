@@ -14,6 +14,7 @@
 #include <array>
 #include <cerrno>
 #include <memory>
+#include <utility>
 
 #include "parvel/platform/linux/FileDescriptor.h"
 #include "parvel/platform/linux/ReaderProtocol.h"
@@ -125,7 +126,11 @@ void allowAddressSpace(std::uint64_t inputBytes) {
         ::getrlimit(RLIMIT_AS, &limits);
         return limits.rlim_max;
     }();
-    const rlimit limits{std::min<rlim_t>(addressSpace + inputBytes, most), most};
+    static rlim_t allowed = 0;
+    const rlim_t wanted = std::min<rlim_t>(addressSpace + inputBytes, most);
+    if (std::exchange(allowed, wanted) == wanted)
+        return;
+    const rlimit limits{wanted, most};
     ::setrlimit(RLIMIT_AS, &limits);
 }
 

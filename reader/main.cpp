@@ -17,6 +17,7 @@
 #include "reader/Document.h"
 #include "reader/Fonts.h"
 #include "reader/HostFiles.h"
+#include "reader/Input.h"
 #include "reader/Walls.h"
 
 namespace parvel::reader {
@@ -55,7 +56,7 @@ public:
             return true;
         }
         // A document that is open stays mapped while something else is asked.
-        allowAddressSpace(received.request.size + m_document.inputSize());
+        allowAddressSpace(Input::mappedSize(received.request.size) + m_document.mappedSize());
         Answer answer;
         const bool isAnswered = makeAnswer(received, answer);
         answer.reply.number = received.request.number;

@@ -12,9 +12,9 @@ struct OpenItem;
 
 /// Holds the file or folder at a URL open while it lives: what this thread then asks the host about
 /// that very path (whether it can be reached, is a folder, which attributes it has) and reads there
-/// (entries of the archive, members of the folder, media tags) comes from the one open item. So the
-/// path is looked up once, and all answers are about the same item, though another should take its
-/// name meanwhile. What is written goes by the path as ever.
+/// (entries of the archive, members of the folder, PDF documents, media tags) comes from the one
+/// open item. So the path is looked up once, and all answers are about the same item, though
+/// another should take its name meanwhile. What is written goes by the path as ever.
 ///
 /// Where the item can't be opened, for lack of permission say, nothing is held and each service
 /// looks the path up. Scopes nest: one within another of the same path holds the same item.

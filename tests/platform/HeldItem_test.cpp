@@ -9,12 +9,14 @@
 
 #include "parvel/inspection/PVAssetMetadataInspector.h"
 #include "parvel/platform/FileReader.h"
+#include "parvel/platform/PdfDocument.h"
 #include "parvel/platform/ResourceQueries.h"
 #include "parvel/platform/Service.h"
 #include "parvel/platform/ZipArchive.h"
 #include "tests/support/AttributeFolder.h"
 #include "tests/support/EpubBuilder.h"
 #include "tests/support/ForwardingXattrStore.h"
+#include "tests/support/PdfBuilder.h"
 
 namespace parvel::testing {
 namespace {
@@ -57,6 +59,16 @@ TEST_F(HeldItemTest, AnswersStayAboutTheHeldFileThoughAnotherTakesItsName) {
     }
     EXPECT_EQ(stored(url, "mark"), "second");
     EXPECT_EQ(entryOf(url), Data::copyOf("second"));
+}
+
+TEST_F(HeldItemTest, ADocumentIsTheHeldFilesOwn) {
+    m_folder.write("a.pdf", PdfBuilder{}.information("/Author (first)").page("").bytes());
+    const URL url = m_folder.url("a.pdf");
+    const HeldItem held(url);
+    std::filesystem::remove(url.path());
+    m_folder.write("a.pdf", PdfBuilder{}.information("/Author (second)").page("").bytes());
+
+    EXPECT_EQ(PdfDocuments::host().open(url)->author(), "first");
 }
 
 TEST_F(HeldItemTest, TheListIsTheHeldFilesOwn) {

@@ -144,23 +144,46 @@ TEST_F(HelperProcessTest, IsReplacedAfterAThousandDocuments) {
     EXPECT_NE(helperProcesses(), helpers);
 }
 
+/// Tells whether the one helper maps the file.
+bool isMappedByHelper(const std::string& path) {
+    std::ifstream file("/proc/" + std::to_string(*helperProcesses().begin()) + "/maps");
+    const std::string text{std::istreambuf_iterator<char>(file), {}};
+    return text.find(path) != std::string::npos;
+}
+
 TEST_F(HelperProcessTest, HoldsNoDocumentThatNobodyNeeds) {
-    auto document = open();
+    const std::string path = m_folder / "large.pdf";
+    m_folder.write("large.pdf", PdfBuilder{}.page("").bytes());
+    std::filesystem::resize_file(path, reader::longestCopied + 1);
+    auto document = open("large.pdf");
     ASSERT_TRUE(document);
-    const std::string maps = "/proc/" + std::to_string(*helperProcesses().begin()) + "/maps";
-    const auto isMapped = [&] {
-        std::ifstream file(maps);
-        const std::string text{std::istreambuf_iterator<char>(file), {}};
-        return text.find(m_folder / "a.pdf") != std::string::npos;
-    };
-    if (!isMapped())
+    if (!isMappedByHelper(path))
         GTEST_SKIP() << "what the helper maps can't be read";
 
     document.reset();
 
-    for (int i = 0; i < 1000 && isMapped(); ++i)
+    for (int i = 0; i < 1000 && isMappedByHelper(path); ++i)
         ::usleep(1000);
-    EXPECT_FALSE(isMapped());
+    EXPECT_FALSE(isMappedByHelper(path));
+}
+
+TEST_F(HelperProcessTest, HoldsNothingOfASmallDocumentsFile) {
+    m_folder.write("small.pdf", PdfBuilder{}.information("/Author (Bob)").page("").bytes());
+    std::filesystem::resize_file(m_folder / "small.pdf", reader::longestCopied);
+
+    const auto document = open("small.pdf");
+
+    ASSERT_TRUE(document);
+    EXPECT_EQ(document->author(), "Bob");
+    EXPECT_FALSE(isMappedByHelper(m_folder / "small.pdf"));
+    EXPECT_TRUE(document->firstPage()->draw(10, 10));
+}
+
+TEST_F(HelperProcessTest, OpensAnotherDocumentInPlaceOfOneThatWasForgotten) {
+    EXPECT_EQ(authorOf(), "Ann");
+    m_folder.write("a.pdf", PdfBuilder{}.information("/Author (Bob)").page("").bytes());
+
+    EXPECT_EQ(authorOf(), "Bob");
 }
 
 TEST_F(HelperProcessTest, ServesADocumentThatWasCutShortAtWorstWithNothing) {

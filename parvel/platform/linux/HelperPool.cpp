@@ -34,11 +34,11 @@ void keepIdle(std::unique_ptr<HelperProcess> helper) {
 
 /// Nobody's document may stay mapped in a helper that waits: it would keep its file system busy.
 bool closeForgottenDocument(HelperProcess& helper) {
-    if (!helper.hasOpenDocument || !helper.openDocument.expired())
+    if (!helper.holdsDocument || !helper.openDocument.expired())
         return true;
     reader::Request request;
     request.ask = reader::Ask::CloseDocument;
-    helper.hasOpenDocument = false;
+    helper.holdsDocument = false;
     return helper.tell(request);
 }
 

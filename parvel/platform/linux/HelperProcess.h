@@ -62,7 +62,7 @@ public:
 
     /// Stands for the document that is open in it; gone when nobody needs that any longer.
     std::weak_ptr<const void> openDocument;
-    bool hasOpenDocument = false;
+    bool holdsDocument = false;  ///< and whether its file is held, until it is told to close that
 
 private:
     HelperProcess(FileDescriptor socket, FileDescriptor process, const HelperMeans& means);

@@ -1,7 +1,7 @@
 #include "parvel/platform/PdfDocument.h"
 
-#include <fcntl.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <cmath>
@@ -9,15 +9,14 @@
 #include <utility>
 
 #include "parvel/platform/TextRules.h"
-#include "parvel/platform/linux/FileDescriptor.h"
 #include "parvel/platform/linux/HelperPool.h"
+#include "parvel/platform/linux/OpenItem.h"
 #include "parvel/platform/linux/SystemCall.h"
 
 namespace parvel {
 
 namespace {
 
-using host::FileDescriptor;
 using host::HelperAnswer;
 using host::HelperLease;
 using host::HelperMeans;
@@ -38,12 +37,15 @@ auto identityOf(const struct stat& status) {
 
 struct PdfInput {
     URL url;
-    FileDescriptor descriptor;
-    struct stat status {};
+    std::shared_ptr<const host::OpenItem> file;
 
+    [[nodiscard]] int descriptor() const { return file->descriptor.get(); }
+    [[nodiscard]] std::uint64_t size() const {
+        return static_cast<std::uint64_t>(file->status.st_size);
+    }
     [[nodiscard]] HelperMeans means() const {
         HelperMeans means;
-        means.inputBytes = std::max(means.inputBytes, static_cast<std::uint64_t>(status.st_size));
+        means.inputBytes = std::max(means.inputBytes, size());
         return means;
     }
 };
@@ -57,9 +59,8 @@ public:
         const auto buffer = std::make_unique_for_overwrite<std::uint8_t[]>(readPiece);
         off_t offset = 0;
         for (;;) {
-            const ssize_t count = host::retried([&] {
-                return ::pread(m_input->descriptor.get(), buffer.get(), readPiece, offset);
-            });
+            const ssize_t count = host::retried(
+                [&] { return ::pread(m_input->descriptor(), buffer.get(), readPiece, offset); });
             if (count < 0)
                 return fail(error, makeServiceError(errno, m_input->url));
             if (count == 0)
@@ -132,7 +133,7 @@ struct OpenedPdf {
 /// The document that the helper has open, where it is the same file in the same state.
 std::shared_ptr<const OpenedPdf> sameDocument(const HelperProcess& helper, const PdfInput& input) {
     auto opened = std::static_pointer_cast<const OpenedPdf>(helper.openDocument.lock());
-    if (opened && identityOf(opened->input->status) != identityOf(input.status))
+    if (opened && identityOf(opened->input->file->status) != identityOf(input.file->status))
         opened.reset();
     return opened;
 }
@@ -140,12 +141,12 @@ std::shared_ptr<const OpenedPdf> sameDocument(const HelperProcess& helper, const
 bool askToOpen(HelperLease& lease, const PdfInput& input, HelperAnswer& answer) {
     Request request;
     request.ask = Ask::OpenDocument;
-    request.size = static_cast<std::uint64_t>(input.status.st_size);
-    return lease.ask(request, input.descriptor.get(), answer);
+    request.size = input.size();
+    return lease.ask(request, input.descriptor(), answer);
 }
 
 void setOpenDocument(HelperLease& lease, const std::shared_ptr<const OpenedPdf>& document) {
-    lease.helper()->hasOpenDocument = document != nullptr;
+    lease.helper()->holdsDocument = document && document->input->size() > reader::longestCopied;
     lease.helper()->openDocument = document;
 }
 
@@ -287,21 +288,18 @@ public:
     std::unique_ptr<PdfFile> openFile(const URL& url, ErrorOut error) override {
         if (!url.isFileURL())
             return fail(error, makeServiceError(ENOENT, url));
-        PdfInput input{url, FileDescriptor(host::retried([&] {
-                           return ::open(url.path().c_str(),
-                                         O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY);
-                       }))};
-        if (!input.descriptor || ::fstat(input.descriptor.get(), &input.status) != 0)
+        PdfInput input{url, host::openItem(url.path())};
+        if (!input.file)
             return fail(error, makeServiceError(fileErrno(errno), url));
-        if (!S_ISREG(input.status.st_mode))
-            return fail(error,
-                        makeServiceError(S_ISDIR(input.status.st_mode) ? EISDIR : EBADMSG, url));
+        const mode_t mode = input.file->status.st_mode;
+        if (!S_ISREG(mode))
+            return fail(error, makeServiceError(S_ISDIR(mode) ? EISDIR : EBADMSG, url));
         return std::make_unique<HelperPdfFile>(std::move(input));
     }
 
     std::unique_ptr<PdfDocument> openDocument(PdfFile& file, ErrorOut error) override {
         const std::shared_ptr<const PdfInput> input = static_cast<HelperPdfFile&>(file).input();
-        if (static_cast<std::uint64_t>(input->status.st_size) > reader::longestDocument)
+        if (input->size() > reader::longestDocument)
             return fail(error, corruptDocument(input->url));
         HelperLease lease(input->means());
         if (!lease.helper())

@@ -28,7 +28,7 @@ enum class Ask : std::uint32_t {
     /// Draws the first page of the open document, `width` by `height`. Answered with pixels, or
     /// with FontsWanted.
     DrawPage = 2,
-    /// Unmaps and closes the open document, if any. The one request that is not answered.
+    /// Closes the open document, if any, and unmaps its file. The one request that is not answered.
     CloseDocument = 3,
     /// With the descriptor of an encoded image of `size` bytes. Answered with pixels.
     DecodeImage = 4,
@@ -111,6 +111,9 @@ inline constexpr int longestWaitMilliseconds = 10000;
 /// longer.
 inline constexpr std::uint64_t addressSpace = 256ULL << 20;
 inline constexpr std::uint64_t ordinaryInput = 64ULL << 20;
+/// The longest input that the helper copies at once. Nothing of its file is held then, so that such
+/// a document need not be closed. Anything longer is mapped.
+inline constexpr std::uint64_t longestCopied = 256ULL << 10;
 /// The longest document: the PDF library counts its bytes in an int.
 inline constexpr std::uint64_t longestDocument = 0x7fffffff;
 

@@ -9,10 +9,10 @@
 #include <cmath>
 #include <cstddef>
 #include <cstring>
-#include <limits>
 #include <optional>
 #include <utility>
 
+#include "reader/HostFiles.h"
 #include "reader/Input.h"
 #include "reader/MemoryFile.h"
 #include "reader/PdfDate.h"
@@ -21,9 +21,6 @@
 namespace parvel::reader {
 
 namespace {
-
-/// The library counts a document's bytes as an int.
-constexpr std::size_t kLargestDocument = std::numeric_limits<int>::max();
 
 constexpr int pixelSize = 4;
 
@@ -155,11 +152,16 @@ Document::~Document() = default;
 
 Answer Document::open(const Received& received) {
     close();
-    m_input = std::make_unique<Input>(received);
-    const std::span<const std::uint8_t> bytes = m_input->bytes();
-    if (!bytes.empty() && bytes.size() <= kLargestDocument)
-        m_document.reset(poppler::document::load_from_raw_data(
-            reinterpret_cast<const char*>(bytes.data()), static_cast<int>(bytes.size())));
+    if (received.request.size > longestMapped) {
+        const OfferedFile file(received.input.get());
+        m_document.reset(poppler::document::load_from_file(file.path()));
+    } else {
+        m_input = std::make_unique<Input>(received);
+        const std::span<const std::uint8_t> bytes = m_input->bytes();
+        if (!bytes.empty())
+            m_document.reset(poppler::document::load_from_raw_data(
+                reinterpret_cast<const char*>(bytes.data()), static_cast<int>(bytes.size())));
+    }
     if (m_document)
         return informationOf(*m_document);
     close();

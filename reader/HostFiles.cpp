@@ -33,6 +33,9 @@ std::map<std::string, int, std::less<>>& hostFiles() {
 /// The request that is answered when a file is missing. Set and read on the one thread there is.
 const Request* volatile endingRequest = nullptr;
 
+/// Opened by its path as if it were kept. Set and read on that thread, too.
+const OfferedFile* volatile offeredFile = nullptr;
+
 /// What code is told that asks for a path that was not kept.
 long missingFile() {
     if (const Request* request = endingRequest) {
@@ -48,12 +51,21 @@ long missingFile() {
     return -ENOENT;
 }
 
+/// Negative for none.
+int keptDescriptor(std::string_view path) {
+    const OfferedFile* offered = offeredFile;
+    if (offered && offered->path() == path)
+        return offered->descriptor();
+    const auto found = hostFiles().find(path);
+    return found == hostFiles().end() ? -1 : found->second;
+}
+
 /// A descriptor of its own for each open; they share the place in the file, so each begins anew.
 long openKept(const char* path) {
-    const auto found = hostFiles().find(std::string_view(path));
-    if (found == hostFiles().end())
+    const int kept = keptDescriptor(path);
+    if (kept < 0)
         return missingFile();
-    const int descriptor = ::fcntl(found->second, F_DUPFD_CLOEXEC, 0);
+    const int descriptor = ::fcntl(kept, F_DUPFD_CLOEXEC, 0);
     if (descriptor < 0)
         return -errno;
     ::lseek(descriptor, 0, SEEK_SET);
@@ -109,6 +121,15 @@ void answerTrappedCalls() {
     action.sa_sigaction = answerTrappedCall;
     action.sa_flags = SA_SIGINFO | SA_NODEFER;
     ::sigaction(SIGSYS, &action, nullptr);
+}
+
+OfferedFile::OfferedFile(int descriptor)
+    : m_path("/proc/self/fd/" + std::to_string(descriptor)), m_descriptor(descriptor) {
+    offeredFile = this;
+}
+
+OfferedFile::~OfferedFile() {
+    offeredFile = nullptr;
 }
 
 EndWhenFileIsWanted::EndWhenFileIsWanted(const Request* request) {

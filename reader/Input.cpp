@@ -9,12 +9,10 @@ namespace parvel::reader {
 
 Input::Input(const Received& received) {
     const std::uint64_t size = received.request.size;
-    if (size == 0 || size > longestDocument)
-        return;
-    if (mappedSize(size) == 0)
-        copy(received);
-    else
+    if (mappedSize(size) > 0)
         map(received);
+    else if (size > 0 && size <= longestCopied)
+        copy(received);
 }
 
 Input::~Input() {

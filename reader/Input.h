@@ -8,9 +8,9 @@
 
 namespace parvel::reader {
 
-/// The bytes of a request's input, copied or mapped: none where they can't be had, or are more than
-/// those of any document may be. A mapped file that is shorter than was said, or is cut short, ends
-/// the process, which is meant: it hurts nobody here.
+/// The bytes of a request's input, copied or mapped: none where they can't be had, or are too many
+/// to be mapped. A mapped file that is shorter than was said, or is cut short, ends the process,
+/// which is meant: it hurts nobody here.
 class Input {
 public:
     explicit Input(const Received& received);
@@ -20,7 +20,7 @@ public:
 
     /// How much of the address space an input of that size is mapped into.
     [[nodiscard]] static std::uint64_t mappedSize(std::uint64_t size) {
-        return size > longestCopied ? size : 0;
+        return size > longestCopied && size <= longestMapped ? size : 0;
     }
     [[nodiscard]] std::span<const std::uint8_t> bytes() const { return m_bytes; }
 

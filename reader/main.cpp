@@ -50,7 +50,7 @@ public:
     explicit Reader(bool hasFonts) : m_hasFonts(hasFonts) {}
 
     /// False for a request that makes no sense, and when nobody hears the answer.
-    bool serve(const Received& received) {
+    bool serve(Received& received) {
         if (received.request.ask == Ask::CloseDocument) {
             m_document.close();
             return true;
@@ -60,6 +60,8 @@ public:
         Answer answer;
         const bool isAnswered = makeAnswer(received, answer);
         answer.reply.number = received.request.number;
+        // Whoever hears the answer finds the file no longer open, unless the document needs it.
+        received.input = host::FileDescriptor();
         return isAnswered && send(answer);
     }
 

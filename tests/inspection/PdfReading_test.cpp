@@ -1,6 +1,5 @@
 #include <cerrno>
 #include <filesystem>
-#include <fstream>
 
 #include <gtest/gtest.h>
 #include <sys/stat.h>
@@ -9,9 +8,11 @@
 #include "parvel/inspection/PVAssetMetadataInspector.h"
 #include "parvel/metadata/PVMutableAssetMetadata.h"
 #include "parvel/platform/ImageCodec.h"
+#include "parvel/platform/PdfDocument.h"
 #include "parvel/platform/ReaderProgram.h"
 #include "parvel/platform/Service.h"
 #include "tests/support/Colours.h"
+#include "tests/support/LargePdf.h"
 #include "tests/support/PdfBuilder.h"
 #include "tests/support/RecordedLog.h"
 #include "tests/support/TemporaryDirectory.h"
@@ -101,51 +102,48 @@ TEST_F(PdfReading, ReadsADocumentThatOnlyItsOwnersPasswordProtectsAndDoesNotMark
     EXPECT_TRUE(asset->coverImageData());
 }
 
-/// Documents whose table of objects stands behind a hole, read with an identity that is kept, so
-/// that they are not read whole.
+/// Documents of one page and a hole, read with an identity that is kept, so that they are not read
+/// whole.
 class LargePdfReading : public PdfReading {
 protected:
-    AssetPtr readWithTableAt(std::uint64_t place) {
-        const std::string text = PdfBuilder{}.information("/Author (Thoreau)").page("").bytes();
-        const std::size_t gap = text.find("xref\n");
-        m_folder.write("Walden.pdf", text.substr(0, gap));
-        std::filesystem::resize_file(m_url.path(), place, m_problem);
-        if (m_problem)
-            return nullptr;
-        std::string end = text.substr(gap);
-        end.replace(end.find("startxref\n") + 10, std::to_string(gap).size(),
-                    std::to_string(place));
-        std::ofstream(m_url.path(), std::ios::binary | std::ios::app) << end;
+    void expectReadAndDrawn(std::uint64_t hole) {
+        if (const std::error_code problem = writeLargePdf(m_url.path(), hole))
+            GTEST_SKIP() << "no files of that size here: " << problem.message();
         const Dictionary kept{{"PVGeneratedItemId", "KEPT"}};
-        return PVAssetMetadataInspector::
+        const AssetPtr asset = PVAssetMetadataInspector::
             _pdf_metadataForAssetAtURL_preloadedMetadata_includeCover_error(
                 m_url, PVAssetMetadata::metadataWithURL_dictionary(m_url, &kept),
-                /*includeCover=*/false, &m_error);
+                /*includeCover=*/true, &m_error);
+
+        ASSERT_TRUE(asset) << hole;
+        EXPECT_EQ(asset->author(), "Thoreau") << hole;
+        EXPECT_EQ(asset->pageCount(), 1U) << hole;
+        EXPECT_EQ(asset->assetID(), "KEPT") << hole;
+        EXPECT_TRUE(asset->coverImageData()) << hole;
     }
 
     static constexpr std::uint64_t twoGigabytes = std::uint64_t{1} << 31;
-    std::error_code m_problem;
 };
 
-TEST_F(LargePdfReading, ReadsADocumentOfAlmostTwoGigabytes) {
-    const AssetPtr asset = readWithTableAt(twoGigabytes - 5000);
-
-    if (m_problem)
-        GTEST_SKIP() << "no files of 2 GB here: " << m_problem.message();
-    ASSERT_TRUE(asset);
-    EXPECT_EQ(asset->author(), "Thoreau");
-    EXPECT_EQ(asset->pageCount(), 1U);
-    EXPECT_EQ(asset->assetID(), "KEPT");
+TEST_F(LargePdfReading, ReadsAndDrawsADocumentOfAlmostTwoGigabytes) {
+    expectReadAndDrawn(twoGigabytes - 5000);
 }
 
-TEST_F(LargePdfReading, RefusesALargerOneAsCorrupt) {
-    for (const std::uint64_t place : {twoGigabytes, 2 * twoGigabytes}) {
-        EXPECT_FALSE(readWithTableAt(place)) << place;
+TEST_F(LargePdfReading, ReadsAndDrawsLargerOnes) {
+    expectReadAndDrawn(twoGigabytes);
+    expectReadAndDrawn(2 * twoGigabytes);
+    expectReadAndDrawn(4 * twoGigabytes);
+}
 
-        if (m_problem)
-            GTEST_SKIP() << "no files of that size here: " << m_problem.message();
-        EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::Corrupt, m_url)) << place;
-    }
+TEST_F(LargePdfReading, RefusesALargeFileThatIsNoDocumentAsCorrupt) {
+    m_folder.write("Walden.pdf", "text");
+    std::error_code problem;
+    std::filesystem::resize_file(m_url.path(), 2 * twoGigabytes, problem);
+    if (problem)
+        GTEST_SKIP() << "no files of that size here: " << problem.message();
+
+    EXPECT_FALSE(PdfDocuments::host().open(m_url, &m_error));
+    EXPECT_EQ(m_error, makeFileError(PVFileErrorCode::Corrupt, m_url));
 }
 
 TEST_F(PdfReading, DrawsTheFirstPageOnWhite) {

@@ -6,6 +6,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <atomic>
 #include <filesystem>
 #include <thread>
@@ -14,6 +15,7 @@
 #include "parvel/platform/PdfDocument.h"
 #include "parvel/platform/ReaderProgram.h"
 #include "tests/support/HelperProcesses.h"
+#include "tests/support/LargePdf.h"
 #include "tests/support/PdfBuilder.h"
 #include "tests/support/TemporaryDirectory.h"
 
@@ -144,27 +146,51 @@ TEST_F(HelperProcessTest, IsReplacedAfterAThousandDocuments) {
     EXPECT_NE(helperProcesses(), helpers);
 }
 
-/// Tells whether the one helper maps the file.
-bool isMappedByHelper(const std::string& path) {
-    std::ifstream file("/proc/" + std::to_string(*helperProcesses().begin()) + "/maps");
-    const std::string text{std::istreambuf_iterator<char>(file), {}};
-    return text.find(path) != std::string::npos;
+/// Tells whether the one helper maps the file or has it open.
+bool isHeldByHelper(const std::string& path) {
+    const std::string process = "/proc/" + std::to_string(*helperProcesses().begin());
+    std::ifstream maps(process + "/maps");
+    if (std::string{std::istreambuf_iterator<char>(maps), {}}.find(path) != std::string::npos)
+        return true;
+    std::error_code problem;
+    const std::filesystem::directory_iterator descriptors(process + "/fd", problem);
+    return std::any_of(begin(descriptors), end(descriptors), [&](const auto& descriptor) {
+        return std::filesystem::read_symlink(descriptor.path(), problem) == path;
+    });
 }
 
 TEST_F(HelperProcessTest, HoldsNoDocumentThatNobodyNeeds) {
     const std::string path = m_folder / "large.pdf";
-    m_folder.write("large.pdf", PdfBuilder{}.page("").bytes());
-    std::filesystem::resize_file(path, reader::longestCopied + 1);
-    auto document = open("large.pdf");
+    for (const std::uint64_t size : {reader::longestCopied, reader::longestMapped}) {
+        if (const std::error_code problem = writeLargePdf(path, size))
+            GTEST_SKIP() << "no files of that size here: " << problem.message();
+        auto document = open("large.pdf");
+        ASSERT_TRUE(document) << size;
+        if (!isHeldByHelper(path))
+            GTEST_SKIP() << "what the helper holds can't be read";
+
+        document.reset();
+
+        for (int i = 0; i < 1000 && isHeldByHelper(path); ++i)
+            ::usleep(1000);
+        EXPECT_FALSE(isHeldByHelper(path)) << size;
+    }
+}
+
+TEST_F(HelperProcessTest, IsTheSameForAllThatIsAskedOfALargeDocument) {
+    if (const std::error_code problem = writeLargePdf(m_folder / "a.pdf", reader::ordinaryInput))
+        GTEST_SKIP() << "no files of that size here: " << problem.message();
+    auto document = open();
     ASSERT_TRUE(document);
-    if (!isMappedByHelper(path))
-        GTEST_SKIP() << "what the helper maps can't be read";
+    const std::set<pid_t> helpers = helperProcesses();
 
+    EXPECT_TRUE(document->firstPage()->draw(10, 10));
+
+    EXPECT_EQ(helperProcesses(), helpers);
     document.reset();
-
-    for (int i = 0; i < 1000 && isMappedByHelper(path); ++i)
-        ::usleep(1000);
-    EXPECT_FALSE(isMappedByHelper(path));
+    m_folder.write("a.pdf", PdfBuilder{}.information("/Author (Ann)").page("").bytes());
+    EXPECT_EQ(authorOf(), "Ann");
+    EXPECT_NE(helperProcesses(), helpers);
 }
 
 TEST_F(HelperProcessTest, HoldsNothingOfASmallDocumentsFile) {
@@ -175,7 +201,7 @@ TEST_F(HelperProcessTest, HoldsNothingOfASmallDocumentsFile) {
 
     ASSERT_TRUE(document);
     EXPECT_EQ(document->author(), "Bob");
-    EXPECT_FALSE(isMappedByHelper(m_folder / "small.pdf"));
+    EXPECT_FALSE(isHeldByHelper(m_folder / "small.pdf"));
     EXPECT_TRUE(document->firstPage()->draw(10, 10));
 }
 

@@ -32,9 +32,14 @@ void keepIdle(std::unique_ptr<HelperProcess> helper) {
         static_cast<void>(helper.release());
 }
 
-/// Nobody's document may stay mapped in a helper that waits: it would keep its file system busy.
+/// Nobody's document may stay open in a helper that waits: it would keep its file system busy.
+/// False where the helper is not to wait any longer, as one that was started for a very long input.
 bool closeForgottenDocument(HelperProcess& helper) {
-    if (!helper.holdsDocument || !helper.openDocument.expired())
+    if (!helper.openDocument.expired())
+        return true;
+    if (helper.means().inputBytes > reader::ordinaryInput)
+        return false;
+    if (!helper.holdsDocument)
         return true;
     reader::Request request;
     request.ask = reader::Ask::CloseDocument;
@@ -70,8 +75,7 @@ HelperLease::HelperLease(const HelperMeans& wanted) : m_helper(takeIdle()) {
 }
 
 HelperLease::~HelperLease() {
-    if (m_helper && m_helper->means().inputBytes <= reader::ordinaryInput &&
-        closeForgottenDocument(*m_helper))
+    if (m_helper && closeForgottenDocument(*m_helper))
         keepIdle(std::move(m_helper));
 }
 

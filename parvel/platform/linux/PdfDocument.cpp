@@ -45,7 +45,8 @@ struct PdfInput {
     }
     [[nodiscard]] HelperMeans means() const {
         HelperMeans means;
-        means.inputBytes = std::max(means.inputBytes, size());
+        if (size() <= reader::longestMapped)
+            means.inputBytes = std::max(means.inputBytes, size());
         return means;
     }
 };
@@ -299,8 +300,6 @@ public:
 
     std::unique_ptr<PdfDocument> openDocument(PdfFile& file, ErrorOut error) override {
         const std::shared_ptr<const PdfInput> input = static_cast<HelperPdfFile&>(file).input();
-        if (input->size() > reader::longestDocument)
-            return fail(error, corruptDocument(input->url));
         HelperLease lease(input->means());
         if (!lease.helper())
             return fail(error, unreadableDocument(input->url));

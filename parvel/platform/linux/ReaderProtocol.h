@@ -112,9 +112,10 @@ inline constexpr int longestWaitMilliseconds = 10000;
 inline constexpr std::uint64_t addressSpace = 256ULL << 20;
 inline constexpr std::uint64_t ordinaryInput = 64ULL << 20;
 /// The longest input that the helper copies at once. Nothing of its file is held then, so that such
-/// a document need not be closed. Anything longer is mapped.
+/// a document need not be closed.
 inline constexpr std::uint64_t longestCopied = 256ULL << 10;
-/// The longest document: the PDF library counts its bytes in an int.
-inline constexpr std::uint64_t longestDocument = 0x7fffffff;
+/// The longest input that is mapped: the PDF library counts mapped bytes in an int. A longer
+/// document is read piece by piece.
+inline constexpr std::uint64_t longestMapped = 0x7fffffff;
 
 }  // namespace parvel::reader

@@ -10,6 +10,7 @@ constexpr std::size_t kMostOpenElements = 200;
 constexpr std::size_t kUsualCount = 8;
 
 constexpr std::string_view kXmlPrefix = "xml";
+constexpr std::string_view kDeclarationsPrefix = "xmlns";
 constexpr std::string_view kXmlNamespace = "http://www.w3.org/XML/1998/namespace";
 constexpr std::string_view kDeclarationsNamespace = "http://www.w3.org/2000/xmlns/";
 
@@ -77,20 +78,20 @@ bool PlainXmlParse::takeStartTag() {
     return true;
 }
 
+/// Read in place: a copy would have to wait for what has just been written.
 bool PlainXmlParse::takeAttribute(const Open& element) {
-    Name name;
+    if (m_attributes.size() == kMostAttributes)
+        return false;
+    auto& [name, namespaceName, value] = m_attributes.emplace_back();
     if (!m_scanner.takeName(name))
         return false;
-    if (name.prefix == "xmlns")
-        return takeNamespace(name.local, element);
-    if (name.prefix.empty() && name.local == "xmlns")
-        return takeNamespace({}, element);
+    const bool isPrefixed = name.prefix == kDeclarationsPrefix;
+    if (!isPrefixed && (!name.prefix.empty() || name.local != kDeclarationsPrefix))
+        return m_scanner.takeAssignment(value);
 
-    std::string_view value;
-    if (m_attributes.size() == kMostAttributes || !m_scanner.takeAssignment(value))
-        return false;
-    m_attributes.push_back({name, {}, value});
-    return true;
+    const std::string_view prefix = isPrefixed ? name.local : std::string_view();
+    m_attributes.pop_back();
+    return takeNamespace(prefix, element);
 }
 
 /// The value of a declaration.

@@ -9,7 +9,7 @@
 namespace parvel {
 namespace {
 
-constexpr std::size_t kLargestForeseen = 16 << 10;
+constexpr std::size_t kLargestForeseen = 64 << 10;
 constexpr std::size_t kUsualDepth = 16;
 
 template <class T>
@@ -45,8 +45,11 @@ public:
     }
 
     /// Of the element that was begun last.
-    void add(const Attribute& attribute) {
-        m_tree.m_attributes.push_back(attribute);
+    void add(std::string_view name, std::string_view namespaceName, std::string_view value) {
+        Attribute& attribute = m_tree.m_attributes.emplace_back();
+        attribute.name = name;
+        attribute.namespaceName = namespaceName;
+        attribute.value = value;
         ++m_tree.m_elements.back().attributesEnd;
     }
 
@@ -83,7 +86,7 @@ private:
     void startElement(const StartTag& tag) override {
         m_builder.begin(tag.name.local, tag.namespaceName);
         for (const PlainXmlParse::Attribute& attribute : tag.attributes)
-            m_builder.add({attribute.name.local, attribute.namespaceName, attribute.value});
+            m_builder.add(attribute.name.local, attribute.namespaceName, attribute.value);
     }
     void endElement() override { m_builder.end(); }
     void text(std::string_view characters) override { m_builder.add(characters); }
@@ -121,8 +124,8 @@ private:
     void addAttribute(std::span<const xmlChar*> slots) {
         const std::string_view value(reinterpret_cast<const char*>(slots[3]),
                                      static_cast<std::size_t>(slots[4] - slots[3]));
-        m_builder.add(
-            {fullName(slots[0], slots[1], slots[2]), textOf(slots[2]), m_values.keep(value)});
+        m_builder.add(fullName(slots[0], slots[1], slots[2]), textOf(slots[2]),
+                      m_values.keep(value));
     }
 
     /// A prefix that is not declared stays part of the name, as in libxml2's tree.

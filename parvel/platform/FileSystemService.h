@@ -43,8 +43,8 @@ public:
     /// An existing item that is not on this device is downloaded before.
     virtual bool replaceItem(const URL& existing, const URL& replacement, ReplaceOptions options,
                              std::optional<URL>* resulting = nullptr, ErrorOut error = nullptr) = 0;
-    /// Copies data, attributes, mode and times; the copy appears whole or not at all. Fails where
-    /// anything stands at the destination.
+    /// Copies data, attributes, owner and group as far as they may be given, access list, mode and
+    /// times; the copy appears whole or not at all. Fails where anything stands at the destination.
     virtual bool copyItem(const URL& source, const URL& destination, ErrorOut error = nullptr) = 0;
     /// Removes a file, a link or a whole folder; links are not followed. What stands for an item
     /// that is not on this device goes without a download. After a failure the item stands as it

@@ -281,7 +281,7 @@ TEST_F(ItemOwners, ACopyHasTheOwnerAndTheAccessListOfItsOriginal) {
     EXPECT_EQ(ownedAt("b"), ownedAt("a"));
 }
 
-class ExpandedBooksOwners : public ItemOwners {
+class BookOwners : public ItemOwners {
 protected:
     int expand(const std::string& archive, const std::string& package) {
         const Dictionary options{{std::string(ArchiveCopier::extractPKZip), Number::boolean(true)}};
@@ -294,7 +294,27 @@ protected:
     }
 };
 
-TEST_F(ExpandedBooksOwners, WhatRootExpandsIsTheArchivesOwners) {
+TEST_F(BookOwners, APackageThatRootCopiesIsItsOwnersLinksIncluded) {
+    m_folder.write("from/OPS/text", "1");
+    fs::create_symlink("OPS/text", m_folder / "from/link");
+    for (const char* member : {"from/link", "from/OPS/text", "from/OPS", "from"})
+        ASSERT_EQ(lchown((m_folder / member).c_str(), kReader, kReaders), 0);
+
+    EXPECT_TRUE(m_service->copyItem(m_folder.url("from"), m_folder.url("copy"), &m_error));
+    EXPECT_EQ(ArchiveCopierFactory::host().makeCopier()->copy(m_folder / "from",
+                                                              m_folder / "package", {}),
+              0);
+
+    for (const char* copy : {"copy", "package"}) {
+        for (const char* member : {"", "/OPS", "/OPS/text", "/link"}) {
+            const std::string name = std::string(copy) + member;
+            EXPECT_EQ(ownedAt(name).owner, kReader) << name;
+            EXPECT_EQ(ownedAt(name).group, kReaders) << name;
+        }
+    }
+}
+
+TEST_F(BookOwners, WhatRootExpandsIsTheArchivesOwners) {
     makeBook("zip");
 
     EXPECT_EQ(expand("zip", "book"), 0);
@@ -305,7 +325,7 @@ TEST_F(ExpandedBooksOwners, WhatRootExpandsIsTheArchivesOwners) {
         EXPECT_EQ(ownedAt(member), (Owned{kReader, kReaders, 0600})) << member;
 }
 
-TEST_F(ExpandedBooksOwners, WhatRootExpandsIsTheArchivesGroupsWhoseverTheFolderIs) {
+TEST_F(BookOwners, WhatRootExpandsIsTheArchivesGroupsWhoseverTheFolderIs) {
     makeBook("of readers", 0, kReaders);
     makeBook("of root", 0, 0);
     fs::create_directory(m_folder / "shelf");

@@ -45,6 +45,7 @@ int copyLink(int fromFolder, const char* fromName, const struct stat& status, in
     target.resize(static_cast<std::size_t>(length));
     if (::symlinkat(target.c_str(), toFolder, toName) != 0)
         return errno;
+    (void)!::fchownat(toFolder, toName, status.st_uid, status.st_gid, AT_SYMLINK_NOFOLLOW);
     const std::array<timespec, 2> times{status.st_atim, status.st_mtim};
     (void)::utimensat(toFolder, toName, times.data(), AT_SYMLINK_NOFOLLOW);
     return 0;

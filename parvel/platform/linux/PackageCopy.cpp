@@ -105,7 +105,7 @@ private:
         if (S_ISDIR(status.st_mode))
             return copyFolder(item);
         if (S_ISLNK(status.st_mode))
-            return copyLink(item);
+            return copyLink(item, status);
         return S_ISREG(status.st_mode) ? copyFile(item) : m_reports.failed(item.path, EOPNOTSUPP);
     }
 
@@ -127,7 +127,7 @@ private:
         return fillFolder(stream, status, to.get(), item.path, item.depth + 1);
     }
 
-    int copyLink(const Item& item) {
+    int copyLink(const Item& item, const struct stat& status) {
         std::string target(PATH_MAX, '\0');
         const ssize_t length =
             ::readlinkat(item.fromFolder, item.name, target.data(), target.size());
@@ -138,6 +138,8 @@ private:
             return m_reports.failed(item.path, ELOOP);
         if (::symlinkat(target.c_str(), item.toFolder, item.name) != 0)
             return m_reports.failed(item.path, errno);
+        (void)!::fchownat(item.toFolder, item.name, status.st_uid, status.st_gid,
+                          AT_SYMLINK_NOFOLLOW);
         m_reports.finished(item.path, ArchiveObjectType::Link, 0);
         return 0;
     }

@@ -198,8 +198,9 @@ std::vector<Finding> findingsOfTrash(FileSystemService& service, const URL& item
     std::optional<URL> place;
     if (service.trashItem(item, &place, &error))
         return {};
-    return {{"noTrash", "it can't be trashed" + (error ? ": " + error->message() : std::string()),
-             "see that you may write to its folder and to the trash, ~/.local/share/Trash"}};
+    return {
+        {"noTrash", "it can't be trashed" + (error ? ": " + error->message() : std::string()),
+         "see that you may write to its folder and to the trash, in $XDG_DATA_HOME or ~/.local/share"}};
 }
 
 }  // namespace parvel::cli

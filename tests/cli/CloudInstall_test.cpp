@@ -1,17 +1,16 @@
 #include <stdio.h>
 
-#include <chrono>
 #include <filesystem>
 #include <map>
 #include <memory>
 #include <random>
-#include <thread>
 
 #include <gtest/gtest.h>
 
 #include "cli/JsonReader.h"
 #include "tests/support/EpubBuilder.h"
 #include "tests/support/SyncthingPair.h"
+#include "tests/support/Waiting.h"
 
 namespace parvel::testing {
 namespace {
@@ -74,17 +73,6 @@ protected:
                     "artistName");
     }
 
-    /// Waits, at most a minute, until it is so.
-    template <class Condition>
-    static bool comesTrue(const Condition& condition) {
-        const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(60);
-        while (!condition()) {
-            if (std::chrono::steady_clock::now() > deadline)
-                return false;
-            std::this_thread::sleep_for(std::chrono::milliseconds(50));
-        }
-        return true;
-    }
     [[nodiscard]] bool becomes(const std::string& device, const std::string& expected) const {
         return comesTrue([&] { return status(device) == expected; });
     }

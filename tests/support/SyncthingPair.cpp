@@ -8,17 +8,14 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <chrono>
-#include <thread>
 #include <vector>
 
 #include "tests/support/TemporaryDirectory.h"
+#include "tests/support/Waiting.h"
 
 namespace parvel::testing {
 
 namespace {
-
-using SteadyClock = std::chrono::steady_clock;
 
 int freePort() {
     sockaddr_in address{};
@@ -163,15 +160,11 @@ void SyncthingPair::start(std::size_t which) {
                      m_folder / (m_names[which] + ".log"));
 }
 
-bool SyncthingPair::waitUntilConnected() {
-    const auto deadline = SteadyClock::now() + std::chrono::seconds(60);
-    while (SteadyClock::now() < deadline) {
-        const std::string reply = restReply(m_guiPorts[1], "GET /rest/system/connections");
-        if (reply.find("\"connected\": true") != std::string::npos)
-            return true;
-        std::this_thread::sleep_for(std::chrono::milliseconds(100));
-    }
-    return false;
+bool SyncthingPair::waitUntilConnected() const {
+    return comesTrue([this] {
+        return restReply(m_guiPorts[1], "GET /rest/system/connections")
+                   .find("\"connected\": true") != std::string::npos;
+    });
 }
 
 }  // namespace parvel::testing

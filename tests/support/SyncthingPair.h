@@ -33,7 +33,7 @@ public:
 private:
     void configure(std::size_t which, Scans scans);
     void start(std::size_t which);
-    bool waitUntilConnected();
+    [[nodiscard]] bool waitUntilConnected() const;
 
     TemporaryDirectory m_folder;  ///< holds "first", "second" and the daemons' homes
     std::array<std::string, 2> m_names{"first", "second"};

@@ -1,7 +1,5 @@
-#include <chrono>
 #include <filesystem>
 #include <random>
-#include <thread>
 
 #include <gtest/gtest.h>
 
@@ -11,23 +9,12 @@
 #include "parvel/platform/CloudStore.h"
 #include "tests/support/EpubBuilder.h"
 #include "tests/support/SyncthingPair.h"
+#include "tests/support/Waiting.h"
 
 namespace parvel::testing {
 namespace {
 
 namespace fs = std::filesystem;
-
-/// Waits, at most a minute, until it is so.
-template <class Condition>
-bool comesTrue(const Condition& condition) {
-    const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(60);
-    while (!condition()) {
-        if (std::chrono::steady_clock::now() > deadline)
-            return false;
-        std::this_thread::sleep_for(std::chrono::milliseconds(50));
-    }
-    return true;
-}
 
 std::string randomBytes(std::size_t length) {
     std::mt19937 random(1);

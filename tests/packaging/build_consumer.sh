@@ -15,7 +15,7 @@ prefix=$scratch/prefix
 mv "$scratch/installed" "$prefix"
 
 echo "== no installed header names another library's types"
-if grep -rnE '\b(zip_t|zip_file|libdeflate_|xml(Doc|Node|Char|SAX)|icu::|U(ErrorCode|Char)|EVP_|sd_)' \
+if grep -rnE '\b(zip_t|zip_file|libdeflate_|xml(Doc|Node|Char|SAX)|icu::|U(ErrorCode|Char)|EVP_|sd_|isal_)' \
     "$prefix/include"; then
     exit 1
 fi

@@ -5,6 +5,7 @@
 
 #include "parvel/platform/linux/Libcrypto.h"
 #include "parvel/platform/linux/Libicui18n.h"
+#include "parvel/platform/linux/Libisal.h"
 #include "parvel/platform/linux/Libsystemd.h"
 #include "parvel/platform/linux/Libzip.h"
 #include "tests/support/AbsentLibrary.h"
@@ -23,6 +24,7 @@ public:
 TEST(LoadedLibrary, EachHasAllOfItsFunctionsHere) {
     EXPECT_TRUE(host::Libcrypto::host().isComplete());
     EXPECT_TRUE(host::Libicui18n::host().isComplete());
+    EXPECT_TRUE(host::Libisal::host().isComplete());
     EXPECT_TRUE(host::Libsystemd::host().isComplete());
     EXPECT_TRUE(host::Libzip::host().isComplete());
 }

@@ -3,6 +3,7 @@
 
 #include "parvel/platform/linux/PNGFile.h"
 #include "tests/reader/images/DecodedImage.h"
+#include "tests/support/AbsentLibrary.h"
 #include "tests/support/Images.h"
 
 namespace parvel::testing {
@@ -74,6 +75,10 @@ TEST(PNGFile, OfAnEmptyOrHugeImageIsNone) {
 
     EXPECT_FALSE(pngFileOfImage(huge));
     EXPECT_FALSE(pngFileOfImage({}));
+}
+
+TEST(PNGFile, IsNotMadeWithoutTheLibraryThatCompresses) {
+    EXPECT_FALSE(pngFileOfImage(plainImage(1, 1, 0xFF102030), absentLibrary<host::Libisal>()));
 }
 
 }  // namespace

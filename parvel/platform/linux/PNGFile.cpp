@@ -10,7 +10,7 @@
 #include <libdeflate.h>
 
 #include "parvel/platform/ImageCodec.h"
-#include "parvel/platform/linux/QuickDeflate.h"
+#include "parvel/platform/linux/ZlibStream.h"
 
 namespace parvel {
 
@@ -56,7 +56,7 @@ std::uint32_t differences(std::uint32_t from, std::uint32_t less) {
 /// Compresses the rows, each behind the byte that names its filter: each sample as its difference
 /// from the one to its left.
 template <std::size_t channels>
-void compressRows(const Image& image, QuickDeflate& stream) {
+void compressRows(const Image& image, ZlibStream& stream) {
     constexpr std::uint8_t filterSub = 1;
     const std::size_t size = std::size_t{image.width} * channels + 1;
     // A pixel is written as four bytes, of which the next one takes back what is too much.
@@ -128,16 +128,16 @@ std::array<std::uint8_t, 13> header(const Image& image, bool opaque) {
 
 }  // namespace
 
-std::optional<Data> pngFileOfImage(const Image& image) {
+std::optional<Data> pngFileOfImage(const Image& image, const host::Libisal& libisal) {
     constexpr std::size_t signatureSize = 8;
     constexpr std::size_t chunkSize = 12;  // beside its content
     constexpr std::array<std::uint8_t, 1> perceptual{0};
     const std::uint64_t pixels = std::uint64_t{image.width} * image.height;
-    if (!image.bytes || pixels < 1 || pixels > ImageCodec::mostPixels)
+    if (!image.bytes || pixels < 1 || pixels > ImageCodec::mostPixels || !libisal.isComplete())
         return std::nullopt;
 
     const bool opaque = isOpaque(image);
-    QuickDeflate stream;
+    ZlibStream stream(libisal);
     if (opaque)
         compressRows<3>(image, stream);
     else

@@ -1,24 +1,20 @@
-#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <cmath>
 #include <random>
 
 #include <zlib.h>
 
-#include "parvel/platform/linux/QuickDeflate.h"
+#include "parvel/platform/linux/ZlibStream.h"
 
 namespace parvel::testing {
 namespace {
 
 using DeflatedBytes = std::vector<std::uint8_t>;
 
-constexpr std::size_t deflateStretch = 60 * 1024;
-
 /// The zlib stream of the bytes, which come in pieces of that size.
-DeflatedBytes quicklyDeflated(const DeflatedBytes& bytes, std::size_t piece = 1000) {
-    QuickDeflate stream;
+DeflatedBytes zlibStreamOf(const DeflatedBytes& bytes, std::size_t piece = 1000) {
+    ZlibStream stream(host::Libisal::host());
     std::span<const std::uint8_t> left = bytes;
     while (!left.empty()) {
         const std::size_t size = std::min(piece, left.size());
@@ -42,7 +38,7 @@ DeflatedBytes inflatedByZlib(const DeflatedBytes& stream, std::size_t size) {
 }
 
 void expectInflatedEqual(const DeflatedBytes& bytes) {
-    EXPECT_TRUE(inflatedByZlib(quicklyDeflated(bytes), bytes.size()) == bytes)
+    EXPECT_TRUE(inflatedByZlib(zlibStreamOf(bytes), bytes.size()) == bytes)
         << bytes.size() << " bytes";
 }
 
@@ -54,48 +50,38 @@ DeflatedBytes bytesAtRandom(std::size_t size, unsigned below = 256) {
     return bytes;
 }
 
-TEST(QuickDeflate, OfNothingIsAnEmptyStream) {
-    EXPECT_TRUE(inflatedByZlib(quicklyDeflated({}), 0).empty());
+TEST(ZlibStream, OfNothingIsAnEmptyStream) {
+    EXPECT_TRUE(inflatedByZlib(zlibStreamOf({}), 0).empty());
 }
 
-TEST(QuickDeflate, OfFewBytesIsReadBackEqual) {
+TEST(ZlibStream, OfFewBytesIsReadBackEqual) {
     for (std::size_t size = 1; size < 600; ++size) {
         expectInflatedEqual(DeflatedBytes(size, 7));
         expectInflatedEqual(bytesAtRandom(size, 3));
     }
 }
 
-TEST(QuickDeflate, OfWhatEndsAroundAStretchIsReadBackEqual) {
-    for (const std::size_t stretches : {1U, 2U}) {
-        for (std::size_t size = stretches * deflateStretch - 5;
-             size <= stretches * deflateStretch + 5; ++size) {
-            expectInflatedEqual(DeflatedBytes(size, 0));
-            expectInflatedEqual(bytesAtRandom(size, 5));
-        }
-    }
-}
-
-TEST(QuickDeflate, TakesPiecesOfAnySize) {
+TEST(ZlibStream, TakesPiecesOfAnySize) {
     const DeflatedBytes bytes = bytesAtRandom(200'000, 9);
 
     for (const std::size_t piece : {1U, 7U, 61'440U, 200'000U})
-        EXPECT_TRUE(inflatedByZlib(quicklyDeflated(bytes, piece), bytes.size()) == bytes) << piece;
+        EXPECT_TRUE(inflatedByZlib(zlibStreamOf(bytes, piece), bytes.size()) == bytes) << piece;
 }
 
-TEST(QuickDeflate, MakesNextToNothingOfWhatRepeats) {
-    EXPECT_LT(quicklyDeflated(DeflatedBytes(1'000'000, 0)).size(), 6'000U);
+TEST(ZlibStream, MakesNextToNothingOfWhatRepeats) {
+    EXPECT_LT(zlibStreamOf(DeflatedBytes(1'000'000, 0)).size(), 10'000U);
 }
 
-TEST(QuickDeflate, StoresWhatDoesNotShrink) {
+TEST(ZlibStream, GrowsLittleOverWhatDoesNotShrink) {
     const DeflatedBytes bytes = bytesAtRandom(1'000'000);
 
-    const DeflatedBytes stream = quicklyDeflated(bytes);
+    const DeflatedBytes stream = zlibStreamOf(bytes);
 
     EXPECT_TRUE(inflatedByZlib(stream, bytes.size()) == bytes);
-    EXPECT_LT(stream.size(), 1'000'000U + 17 * 5 + 16);
+    EXPECT_LT(stream.size(), 1'001'000U);
 }
 
-TEST(QuickDeflate, RepeatsNothingFartherThanTheWindow) {
+TEST(ZlibStream, RepeatsNothingFartherThanTheWindow) {
     for (const std::size_t distance : {32'766U, 32'767U, 32'768U, 32'769U, 40'000U}) {
         DeflatedBytes bytes = bytesAtRandom(distance);
         bytes.insert(bytes.end(), bytes.begin(), bytes.begin() + 5'000);
@@ -104,7 +90,7 @@ TEST(QuickDeflate, RepeatsNothingFartherThanTheWindow) {
     }
 }
 
-TEST(QuickDeflate, RepeatsAtEveryLengthAndDistance) {
+TEST(ZlibStream, RepeatsAtEveryLengthAndDistance) {
     std::mt19937 generator(1);
     DeflatedBytes bytes = bytesAtRandom(40'000);
     while (bytes.size() < 600'000) {
@@ -114,16 +100,6 @@ TEST(QuickDeflate, RepeatsAtEveryLengthAndDistance) {
             bytes.push_back(bytes[bytes.size() - distance]);
         bytes.push_back(static_cast<std::uint8_t>(generator()));
     }
-
-    expectInflatedEqual(bytes);
-}
-
-TEST(QuickDeflate, LimitsTheCodesOfVeryUnevenBytes) {
-    DeflatedBytes bytes;
-    double count = 1;
-    for (std::uint8_t value = 0; value < 22; ++value, count *= 1.6)
-        bytes.insert(bytes.end(), static_cast<std::size_t>(std::ceil(count)), value);
-    std::shuffle(bytes.begin(), bytes.end(), std::mt19937(1));
 
     expectInflatedEqual(bytes);
 }

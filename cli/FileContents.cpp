@@ -11,17 +11,24 @@
 namespace parvel::cli {
 namespace {
 
+/// Standard input may be shared with others, and blocks.
+int openedForReading(const std::string& path, bool& blocks) {
+    blocks = path == "-";
+    return blocks ? fcntl(STDIN_FILENO, F_DUPFD_CLOEXEC, STDERR_FILENO + 1)
+                  : open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY);
+}
+
 /// As `read`, but waits for a pipe's writer, and no longer than until an interrupt.
-ssize_t readWaiting(int descriptor, char* bytes, std::size_t size) {
-    for (;;) {
+ssize_t readWaiting(int descriptor, bool blocks, char* bytes, std::size_t size) {
+    bool mayRead = !blocks || waitForInput(descriptor);
+    while (mayRead) {
         const ssize_t count = read(descriptor, bytes, size);
         if (count >= 0 || (errno != EAGAIN && errno != EINTR))
             return count;
-        if (!waitForInput(descriptor)) {
-            errno = EINTR;
-            return -1;
-        }
+        mayRead = waitForInput(descriptor);
     }
+    errno = EINTR;
+    return -1;
 }
 
 }  // namespace
@@ -30,7 +37,8 @@ ssize_t readWaiting(int descriptor, char* bytes, std::size_t size) {
 std::optional<std::string> contentsOfFile(const std::string& path, std::size_t longest,
                                           std::string& problem) {
     static constexpr std::size_t piece = 256 * 1024;
-    const int descriptor = open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY);
+    bool blocks = false;
+    const int descriptor = openedForReading(path, blocks);
     if (descriptor < 0) {
         problem = strerrordesc_np(errno);
         return std::nullopt;
@@ -40,7 +48,7 @@ std::optional<std::string> contentsOfFile(const std::string& path, std::size_t l
     do {
         const std::size_t size = contents.size();
         contents.resize(size + piece);
-        count = readWaiting(descriptor, contents.data() + size, piece);
+        count = readWaiting(descriptor, blocks, contents.data() + size, piece);
         contents.resize(size + (count > 0 ? static_cast<std::size_t>(count) : 0));
         if (contents.size() > longest) {
             count = -1;

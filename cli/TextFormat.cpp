@@ -224,7 +224,8 @@ void TextFormat::append(const Result& result, std::string& out) const {
     }
     appendField("Marks", flagsText(record), out);
     appendField("On the file", attributesText(urlOfPath(result.path)), out);
-    appendField("File", fileText(result), out);
+    // As it is, spaces too, so that it can be copied.
+    out += "  File" + std::string(kLabelWidth - 4, ' ') + safeText(fileText(result)) + "\n";
 }
 
 }  // namespace

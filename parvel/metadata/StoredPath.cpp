@@ -17,7 +17,9 @@ std::string pathWithLowercasedExtension(std::string_view path) {
     const std::string_view extension = extensionOfPath(path);
     if (extension.empty())
         return std::string(path);
-    std::string result(path.substr(0, static_cast<std::size_t>(extension.data() - path.data())));
+    std::string result;
+    result.reserve(path.size());
+    result.append(path.substr(0, static_cast<std::size_t>(extension.data() - path.data())));
     return result.append(Service<TextRules>::current().lowercased(extension));
 }
 

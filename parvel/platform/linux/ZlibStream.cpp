@@ -19,6 +19,9 @@ ZlibStream::ZlibStream(const host::Libisal& library)
       m_stream(std::make_unique_for_overwrite<isal_zstream>()),
       m_levelBuffer(std::make_unique_for_overwrite<std::uint8_t[]>(ISAL_DEF_LVL1_DEFAULT)) {
     m_library.isal_deflate_init(m_stream.get());
+    // What was there before is left by that.
+    m_stream->next_in = nullptr;
+    m_stream->avail_in = 0;
     m_stream->gzip_flag = IGZIP_ZLIB;
     m_stream->level = kLevel;
     m_stream->level_buf = m_levelBuffer.get();

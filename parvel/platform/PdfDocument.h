@@ -75,8 +75,8 @@ public:
     [[nodiscard]] virtual std::unique_ptr<PdfFile> openFile(const URL& url,
                                                             ErrorOut error = nullptr) = 0;
     /// Opens the document in the file; the file is no longer needed afterwards. Null for what is no
-    /// document that can be read within the limits, with the general error of a corrupt file and the
-    /// URL. Where the confined process could not be had, the error's failure reason says so.
+    /// document that can be read within the limits, with the general error of a corrupt file and
+    /// the URL. Where the confined process could not be had, the error's failure reason says so.
     [[nodiscard]] virtual std::unique_ptr<PdfDocument> openDocument(PdfFile& file,
                                                                     ErrorOut error = nullptr) = 0;
 

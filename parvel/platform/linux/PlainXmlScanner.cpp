@@ -96,7 +96,8 @@ bool PlainXmlScanner::takeProlog() {
 bool PlainXmlScanner::takeDeclaration() {
     const auto takeOneOf = [this](std::initializer_list<std::string_view> values) {
         std::string_view value;
-        return takeAssignment(value) &&
+        // It stands there as it reads: a declaration holds no references.
+        return takeAssignment(value) && value.data() + value.size() + 1 == m_at &&
                std::find(values.begin(), values.end(), value) != values.end();
     };
     if (!takeSpace() || !take("version") || !takeOneOf({"1.0"}))

@@ -126,7 +126,8 @@ int run(const std::vector<std::string>& arguments) {
         command = entry.name;
         return runCommand(entry, all.subspan(index + 1));
     } catch (const UsageError& error) {
-        return reportUsage(command, error);
+        // What an interrupt kept from being read is nobody's slip.
+        return interrupted() ? kInterruptedExit : reportUsage(command, error);
     }
 }
 

@@ -14,9 +14,10 @@ class TextArena {
 public:
     [[nodiscard]] std::string_view keep(std::string_view text) {
         if (text.size() > m_room) {
-            m_room = std::max(kBlock, text.size());
-            m_blocks.push_back(std::make_unique_for_overwrite<char[]>(m_room));
+            const std::size_t size = std::max(kBlock, text.size());
+            m_blocks.push_back(std::make_unique_for_overwrite<char[]>(size));
             m_next = m_blocks.back().get();
+            m_room = size;
         }
         char* const copy = m_next;
         std::copy(text.begin(), text.end(), copy);

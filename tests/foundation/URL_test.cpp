@@ -132,6 +132,17 @@ TEST(URL, EqualsByTextWhereItIsNoFiles) {
     EXPECT_NE(*URL::fromString("x:/a"), file("/a"));
 }
 
+TEST(URL, KeepsItsTextWhenItIsMovedFrom) {
+    URL url = URL::fileURLWithPath("/a/b");
+    const URL made(std::move(url));
+    URL assigned = URL::fileURLWithPath("/c");
+    assigned = std::move(url);
+
+    EXPECT_EQ(made.path(), "/a/b");
+    EXPECT_EQ(assigned.path(), "/a/b");
+    EXPECT_EQ(url.path(), "/a/b");  // NOLINT(bugprone-use-after-move)
+}
+
 TEST(URL, HasALastComponentAndAnExtension) {
     EXPECT_EQ(file("/a/b.epub").lastPathComponent(), "b.epub");
     EXPECT_EQ(file("/a/b.epub/").pathExtension(), "epub");

@@ -8,12 +8,14 @@
 
 #include "cli/CommandLine.h"
 #include "cli/MarkedValues.h"
+#include "cli/Utf8.h"
 #include "parvel/metadata/PVAssetMetadataKeys.h"
 
 namespace parvel::cli {
 namespace {
 
-enum class Type { Text, Flag, Count, WholeNumber, Real, Number, Date, DateAsSeconds, Bytes };
+/// A text is UTF-8, a path any bytes.
+enum class Type { Text, Path, Flag, Count, WholeNumber, Real, Number, Date, DateAsSeconds, Bytes };
 
 struct Property {
     std::string_view name;  ///< the property's own, where it is not the key
@@ -24,10 +26,10 @@ struct Property {
 /// Properties whose key says nothing of their type, or that have a name beside it. All others store
 /// a string under their name.
 constexpr std::array kProperties{
-    Property{"url", key::path, Type::Text},
-    Property{"sourceURL", key::sourcePath, Type::Text},
-    Property{"previousURL", key::previousPath, Type::Text},
-    Property{"trashedURL", key::trashedPath, Type::Text},
+    Property{"url", key::path, Type::Path},
+    Property{"sourceURL", key::sourcePath, Type::Path},
+    Property{"previousURL", key::previousPath, Type::Path},
+    Property{"trashedURL", key::trashedPath, Type::Path},
     Property{"generatedID", key::generatedID, Type::Text},
     Property{"displayName", key::displayName, Type::Text},
     Property{"format", key::format, Type::Text},
@@ -77,6 +79,16 @@ std::optional<T> parsed(std::string_view text) {
     return isWhole ? std::optional(number) : std::nullopt;
 }
 
+std::optional<Value> utf8OfText(std::string_view text) {
+    for (std::size_t at = 0; at < text.size();) {
+        const std::optional<Character> character = characterAt(text, at);
+        if (!character)
+            return std::nullopt;
+        at += character->length;
+    }
+    return Value(text);
+}
+
 std::optional<Value> flagOfText(std::string_view text) {
     if (text == "true" || text == "yes" || text == "1")
         return Number::boolean(true);
@@ -118,7 +130,9 @@ std::optional<Value> secondsOfText(std::string_view text) {
 std::optional<Value> valueOfText(Type type, std::string_view text) {
     switch (type) {
         case Type::Text:
-            return Value(String(text));
+            return utf8OfText(text);
+        case Type::Path:
+            return Value(text);
         case Type::Flag:
             return flagOfText(text);
         case Type::Count:
@@ -148,7 +162,9 @@ std::optional<Value> valueOfText(Type type, std::string_view text) {
 std::string_view wordsFor(Type type) {
     switch (type) {
         case Type::Text:
-            return "a text";
+            return "a text in UTF-8";
+        case Type::Path:
+            return "a path";
         case Type::Flag:
             return "true or false";
         case Type::Count:

@@ -46,6 +46,17 @@ TEST(PropertyValue, ValuesTakeTheTypeThatThePropertyStores) {
     EXPECT_EQ(changesOf("itemId=42"), (Dictionary{{"itemId", "42"}}));
 }
 
+TEST(PropertyValue, ATextIsUTF8) {
+    EXPECT_EQ(changesOf("title=\xC3\xA9\xF0\x9F\x93\x96"),
+              (Dictionary{{"itemName", "\xC3\xA9\xF0\x9F\x93\x96"}}));
+    EXPECT_EQ(problemOf("title=a\xFF"), "--set title=a\xFF: title is a text in UTF-8");
+    EXPECT_EQ(problemOf("other=\xC3"), "--set other=\xC3: other is a text in UTF-8");
+}
+
+TEST(PropertyValue, APathIsAnyBytes) {
+    EXPECT_EQ(changesOf("sourceURL=/a\xFF"), (Dictionary{{"sourcePath", "/a\xFF"}}));
+}
+
 TEST(PropertyValue, FlagsAreBooleans) {
     for (const char* text : {"true", "yes", "1"}) {
         const Dictionary changes = changesOf("isExplicit=" + std::string(text));

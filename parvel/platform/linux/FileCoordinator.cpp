@@ -31,18 +31,18 @@ constexpr const char* kFolderName = "parvel-coord";
 constexpr std::size_t kMaximumNote = 1 << 16;
 
 /// An item that this thread holds.
-struct HeldItem {
+struct CoordinatedItem {
     std::string lockPath;
     int lock;
     bool hasNote;
 };
-thread_local std::vector<HeldItem> t_held;
+thread_local std::vector<CoordinatedItem> t_coordinated;
 
-HeldItem* findHeld(const std::string& lockPath) {
-    const auto found = std::find_if(t_held.begin(), t_held.end(), [&](const HeldItem& item) {
-        return item.lockPath == lockPath;
-    });
-    return found == t_held.end() ? nullptr : &*found;
+CoordinatedItem* findCoordinated(const std::string& lockPath) {
+    const auto found =
+        std::find_if(t_coordinated.begin(), t_coordinated.end(),
+                     [&](const CoordinatedItem& item) { return item.lockPath == lockPath; });
+    return found == t_coordinated.end() ? nullptr : &*found;
 }
 
 bool isPrivateFolder(const std::string& path) {
@@ -145,7 +145,7 @@ public:
         if (folder.empty())
             return fail(error, makeServiceError(errno, url));
         const std::string path = pathAppending(folder, lockName(url));
-        if (findHeld(path)) {
+        if (findCoordinated(path)) {
             accessor(placeToUse(url, {}));
             return true;
         }
@@ -159,7 +159,7 @@ public:
 
     void itemDidMove(const URL& from, const URL& to) override {
         const std::string path = pathAppending(lockFolder(), lockName(from));
-        HeldItem* held = findHeld(path);
+        CoordinatedItem* held = findCoordinated(path);
         if (held)
             held->hasNote = writeNote(held->lock, to.standardized().path());
     }
@@ -171,12 +171,12 @@ private:
                      const Accessor& accessor) {
         struct Holding {
             Holding(const std::string& lockPath, int descriptor, bool hasNote) {
-                t_held.push_back({lockPath, descriptor, hasNote});
+                t_coordinated.push_back({lockPath, descriptor, hasNote});
             }
             ~Holding() {
-                if (!t_held.back().hasNote)
-                    ::unlink(t_held.back().lockPath.c_str());
-                t_held.pop_back();
+                if (!t_coordinated.back().hasNote)
+                    ::unlink(t_coordinated.back().lockPath.c_str());
+                t_coordinated.pop_back();
             }
         };
         std::string note = readNote(lock);

@@ -344,7 +344,7 @@ public:
     std::unique_ptr<MediaAsset> open(const URL& url) override {
         if (!url.isFileURL())
             return nullptr;
-        auto file = host::openItem(url.path());
+        auto file = host::heldOrOpened(url.path());
         if (!file || !S_ISREG(file->status.st_mode))
             return nullptr;
         WindowedFile window(std::move(file));

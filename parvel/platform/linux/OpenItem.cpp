@@ -26,7 +26,7 @@ std::shared_ptr<const host::OpenItem> openAnew(const std::string& path) {
 
 HeldItem::HeldItem(const URL& url)
     : m_url(url),
-      m_item(url.isFileURL() ? host::openItem(url.path()) : nullptr),
+      m_item(url.isFileURL() ? host::heldOrOpened(url.path()) : nullptr),
       m_outer(std::exchange(innermost, this)) {}
 
 HeldItem::~HeldItem() {
@@ -42,7 +42,7 @@ const std::shared_ptr<const host::OpenItem>& HeldItem::at(const std::string& pat
     return nothing;
 }
 
-std::shared_ptr<const host::OpenItem> host::openItem(const std::string& path) {
+std::shared_ptr<const host::OpenItem> host::heldOrOpened(const std::string& path) {
     const auto& held = HeldItem::at(path);
     return held ? held : openAnew(path);
 }

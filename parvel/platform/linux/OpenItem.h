@@ -18,6 +18,6 @@ struct OpenItem {
 
 /// What this thread holds at the path, else the item opened anew, links followed. Opening never
 /// waits, not for a FIFO's writer either. Null, with errno set, where it can't be opened.
-[[nodiscard]] std::shared_ptr<const OpenItem> openItem(const std::string& path);
+[[nodiscard]] std::shared_ptr<const OpenItem> heldOrOpened(const std::string& path);
 
 }  // namespace parvel::host

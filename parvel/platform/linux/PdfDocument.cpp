@@ -289,7 +289,7 @@ public:
     std::unique_ptr<PdfFile> openFile(const URL& url, ErrorOut error) override {
         if (!url.isFileURL())
             return fail(error, makeServiceError(ENOENT, url));
-        PdfInput input{url, host::openItem(url.path())};
+        PdfInput input{url, host::heldOrOpened(url.path())};
         if (!input.file)
             return fail(error, makeServiceError(fileErrno(errno), url));
         const mode_t mode = input.file->status.st_mode;

@@ -54,7 +54,7 @@ public:
     std::unique_ptr<ZipArchive> open(const URL& url, ErrorOut error) override {
         if (!url.isFileURL())
             return fail(error, makeServiceError(ENOENT, url));
-        auto file = host::openItem(url.path());
+        auto file = host::heldOrOpened(url.path());
         if (!file)
             return fail(error, makeServiceError(errno, url));
         if (S_ISDIR(file->status.st_mode))
